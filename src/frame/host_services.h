@@ -1,0 +1,49 @@
+#pragma once
+#include "frame/declaration.h"
+#include "frame/records.h"
+#include "frame/types.h"
+
+namespace zor {
+
+/// The address of a service of the host; null when the host doesn't know the name, or before load.
+void* Resolve(const char* name);
+
+/// From now on services are asked for through `resolver`, or not at all when it is null.
+void SetResolver(Resolver resolver);
+
+/// A service of the host, called like a function. Its address is looked up at the first call and kept; while
+/// the name doesn't resolve a call gives 0 and the next one tries again. For host threads only.
+template <Text Name, class Signature>
+struct Service;
+
+template <Text Name, class Result, class... Arguments>
+struct Service<Name, Result(Arguments...)> {
+  Result operator()(Arguments... arguments) const {
+    static Result (*slot)(Arguments...) = nullptr;
+    if (!slot) slot = reinterpret_cast<Result (*)(Arguments...)>(Resolve(Name.Characters));
+    return slot ? slot(arguments...) : Result();
+  }
+};
+
+inline constexpr Service<"RegisterPluginVersion", void(std::int32_t)> RegisterPluginVersion;
+inline constexpr Service<"REALGetRBVersion", double()> REALGetRBVersion;
+inline constexpr Service<"PluginRegisterClass", void(void*)> PluginRegisterClass;
+inline constexpr Service<"PluginNewInstance", void*(const char*)> PluginNewInstance;
+inline constexpr Service<"REALLockObject", void(void*)> REALLockObject;
+inline constexpr Service<"REALUnlockObject", void(void*)> REALUnlockObject;
+inline constexpr Service<"GetEventInstancePPC", void*(void*, Word)> GetEventInstancePPC;
+inline constexpr Service<"REALBuildString", HostString*(const void*, std::int32_t)> REALBuildString;
+inline constexpr Service<"REALSetStringEncoding", void(HostString*, std::uint32_t)> REALSetStringEncoding;
+inline constexpr Service<"REALConvertString", HostString*(HostString*, std::uint32_t)> REALConvertString;
+inline constexpr Service<"REALUnlockString", void(HostString*)> REALUnlockString;
+inline constexpr Service<"RuntimeRaiseException", void(void*)> RuntimeRaiseException;
+inline constexpr Service<"REALSetPropValueString", unsigned char(void*, const char*, HostString*)>
+    REALSetPropValueString;
+inline constexpr Service<"newMemoryBlock", MemoryBlock*(std::int32_t)> newMemoryBlock;
+inline constexpr Service<"memoryBlockGetPtr", void*(MemoryBlock*)> memoryBlockGetPtr;
+inline constexpr Service<"PtrToMemoryBlock", MemoryBlock*(void*)> PtrToMemoryBlock;
+inline constexpr Service<"REALYieldToRB", void()> REALYieldToRB;
+inline constexpr Service<"REALFSRefFromFolderItem", unsigned char(FolderItem*, void*, void*)>
+    REALFSRefFromFolderItem;
+
+}
