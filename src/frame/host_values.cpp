@@ -20,7 +20,7 @@ HostString* UTF8FromUTF16(const void* units, std::int32_t length) {
 HostString* UTF8FromUTF32(const void* bytes, std::int32_t length) {
   constexpr std::int32_t UnitsOnStack = 199;
   const std::int32_t count = length / 4;
-  std::uint16_t onStack[UnitsOnStack + 1];
+  std::uint16_t onStack[UnitsOnStack + 1] = {};
   std::uint16_t* units = onStack;
   if (count > UnitsOnStack) units = static_cast<std::uint16_t*>(std::calloc(std::size_t(count) + 2, 2));
   if (!units) return nullptr;

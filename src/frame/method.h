@@ -25,10 +25,10 @@ constexpr MethodRow Method{Number, [](MethodRecord& record) {
 
 /// A row of the shared methods, which have no object.
 template <int Number, Text Declaration, SharedFunctionOf<Declaration>* Function>
-constexpr MethodRow SharedMethod{Number, [](MethodRecord& record) {
-                                   record = {reinterpret_cast<Word>(Function), 0, Declaration.Characters,
-                                             PlainFlags};
-                                 }};
+constexpr MethodRow SharedMethod{
+    Number, [](MethodRecord& record) {
+      record = {reinterpret_cast<Word>(Function), 0, Declaration.Characters, PlainFlags};
+    }};
 
 void ARowNumberIsUsedTwice();  // never defined: a call of it stops the compiler
 

@@ -1,0 +1,55 @@
+#pragma once
+#include <utility>
+
+#include "image/groups.h"
+#include "image/lifecycle.h"
+#include "image/stores.h"
+
+namespace zor {
+
+/// What a method with a `dest` asks of it.
+struct FilterRules {
+  enum GroupsServed { EveryGroup, GrayAndRGB } Groups = EveryGroup;
+  bool WritesAlpha = true;
+  /// Whether `dest` may be the source itself.
+  bool InPlace = true;
+  /// Whether the result is as wide as the source is high.
+  bool Turned = false;
+};
+
+/// A filter's two pictures, both usable, with the planes of the source's group in each.
+struct FilterCall {
+  PictureData &Source, &Dest;
+  Group Of;
+  PlaneList In, Out;
+  /// Whether what is written may show in the source. Then the order of reading and writing, pixel by pixel,
+  /// makes the result, and a form with another order steps aside.
+  bool SharesPixels;
+};
+
+/// The way into every method with a `dest`. Takes `dest`, or makes a picture of the source's size and format,
+/// and runs body once if the source's group is served. The result is the destination with a reference for the
+/// caller. Nil when a picture isn't usable, when `dest` is smaller than the result or lacks a plane that
+/// would be written, or when it is the source and may not be.
+template <class Body>
+PictureZOR* RunFilter(PictureZOR* self, PictureZOR* dest, const FilterRules& rules, Body&& body) {
+  PictureData& source = DataOf(self);
+  if (!Usable(source) || (dest == self && !rules.InPlace)) return nullptr;
+  MayYield(source);
+  const std::int32_t width = rules.Turned ? source.Height : source.Width;
+  const std::int32_t height = rules.Turned ? source.Width : source.Height;
+  Held result{dest ? Locked(dest) : CreatePictureThroughFactory(&source, width, height, source.ImageFormat)};
+  if (!result) return nullptr;
+  PictureData& into = result.Data();
+  if (!Usable(into) || into.Width < width || into.Height < height) return nullptr;
+  Group group = GroupOf(source);
+  if (rules.Groups == FilterRules::GrayAndRGB && group >= Group::CMYK) group = Group::None;
+  if (!HasPlanes(group, into, rules.WritesAlpha)) return nullptr;
+  MayYield(into);
+  if (group != Group::None)
+    body(FilterCall{source, into, group, PlanesOf(group, source), PlanesOf(group, into),
+                    SharePixels(source, into)});
+  return result.HandOn();
+}
+
+}

@@ -1,0 +1,64 @@
+#include "image/groups.h"
+
+namespace zor {
+namespace {
+
+/// A plane's fields in the record.
+struct PlaneFields {
+  bool PictureData::*Has;
+  std::int32_t PictureData::*Offset;
+};
+
+using P = PictureData;
+constexpr PlaneFields Gray{&P::HasGray, &P::GrayOffset}, Alpha{&P::HasAlpha, &P::AlphaOffset},
+    Red{&P::HasRed, &P::RedOffset}, Green{&P::HasGreen, &P::GreenOffset}, Blue{&P::HasBlue, &P::BlueOffset},
+    Cyan{&P::HasCyan, &P::CyanOffset}, Magenta{&P::HasMagenta, &P::MagentaOffset},
+    Yellow{&P::HasYellow, &P::YellowOffset}, Black{&P::HasBlack, &P::BlackOffset};
+
+struct GroupPlanes {
+  int Count;
+  PlaneFields Plane[5];
+};
+
+constexpr GroupPlanes PlanesOfGroup[] = {
+    {0, {}},
+    {1, {Gray}},
+    {2, {Gray, Alpha}},
+    {3, {Red, Green, Blue}},
+    {4, {Red, Green, Blue, Alpha}},
+    {4, {Cyan, Magenta, Yellow, Black}},
+    {5, {Cyan, Magenta, Yellow, Black, Alpha}},
+};
+
+}
+
+Family FamilyOf(const PictureData& picture) {
+  return picture.IsGray   ? Family::Gray
+         : picture.IsRGB  ? Family::RGB
+         : picture.IsCMYK ? Family::CMYK
+                          : Family::None;
+}
+
+Group GroupOf(const PictureData& picture) {
+  const int alpha = picture.HasAlpha ? 1 : 0;
+  if (picture.IsGray) return Group(int(Group::Gray) + alpha);
+  if (picture.IsRGB) return Group(int(Group::RGB) + alpha);
+  if (picture.IsCMYK) return Group(int(Group::CMYK) + alpha);
+  return Group::None;
+}
+
+bool HasPlanes(Group group, const PictureData& picture, bool withAlpha) {
+  const GroupPlanes& row = PlanesOfGroup[int(group)];
+  return std::all_of(row.Plane, row.Plane + row.Count, [&](const PlaneFields& plane) {
+    return picture.*plane.Has || (plane.Has == Alpha.Has && !withAlpha);
+  });
+}
+
+PlaneList PlanesOf(Group group, const PictureData& picture, std::int32_t x) {
+  const GroupPlanes& row = PlanesOfGroup[int(group)];
+  PlaneList planes{row.Count, picture.PixelSize, {}};
+  for (int c = 0; c < row.Count; ++c) planes.Offset[c] = picture.*row.Plane[c].Offset + x * picture.PixelSize;
+  return planes;
+}
+
+}

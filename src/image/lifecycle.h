@@ -1,0 +1,43 @@
+#pragma once
+#include <utility>
+
+#include "frame/host_services.h"
+#include "image/picture_data.h"
+
+namespace zor {
+
+/// One more reference to a host object; the object again. Nil stays nil.
+template <class Object>
+Object* Locked(Object* object) {
+  if (object) REALLockObject(object);
+  return object;
+}
+/// Gives a reference back. Nil is ignored.
+inline void Unlock(void* object) {
+  if (object) REALUnlockObject(object);
+}
+
+/// A new, empty object of the class with a reference for the caller; nil when the host has none to give.
+PictureZOR* NewPictureObject();
+
+/// A new picture of at least the given size, with a reference for the caller: from the picture's own factory,
+/// from the global one, or else in plain memory. A factory may give a larger picture, or another format. Nil
+/// when there is none. `data` may be null.
+PictureZOR* CreatePictureThroughFactory(const PictureData* data, std::int32_t width, std::int32_t height,
+                                        std::int32_t format);
+
+/// One reference to a picture, given back at the end of the scope unless it is handed on.
+class Held {
+ public:
+  explicit Held(PictureZOR* object) : Of(object) {}
+  Held(Held&& other) : Of(other.HandOn()) {}
+  ~Held() { Unlock(Of); }
+  explicit operator bool() const { return Of != nullptr; }
+  PictureData& Data() const { return DataOf(Of); }
+  PictureZOR* HandOn() { return std::exchange(Of, nullptr); }
+
+ private:
+  PictureZOR* Of;
+};
+
+}

@@ -1,0 +1,234 @@
+#include "image/stores.h"
+
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdlib>
+#include <limits>
+
+#include "frame/host_services.h"
+#include "image/formats.h"
+
+namespace zor {
+
+std::int32_t PageSize = 4096;
+
+void InitPageSize() { PageSize = std::max(getpagesize(), 4096); }
+
+namespace {
+
+constexpr std::int64_t Int32Max = std::numeric_limits<std::int32_t>::max();
+
+/// The bytes that follow the last row of a file, so that its end is backed before anything is mapped.
+constexpr std::size_t TailSize = 4096;
+
+Store* NewStore(PictureData& data) {
+  auto* store = static_cast<Store*>(std::calloc(1, sizeof(Store)));
+  if (!store) return nullptr;
+  store->Pictures = 1;
+  store->FileDescriptor = -1;
+  data.Samples = store;
+  return store;
+}
+
+void EndFile(int fileDescriptor, char* path) {
+  // Where the file can't be cut, removing it frees its blocks all the same.
+  if (ftruncate(fileDescriptor, 0) != 0) errno = 0;
+  close(fileDescriptor);
+  unlink(path);
+  std::free(path);
+}
+
+void EndStore(Store* store) {
+  std::free(store->Memory);
+  if (store->Path) EndFile(store->FileDescriptor, store->Path);
+  if (store->Keeper) REALUnlockObject(store->Keeper);
+  std::free(store);
+}
+
+/// Gives the file its size, with every block reserved: a sparse page that can't be backed later would end the
+/// process in the middle of a row.
+bool ReserveFile(int fileDescriptor, std::int64_t total) {
+  if (ftruncate(fileDescriptor, off_t(total + PageSize)) != 0) return false;
+  if (lseek(fileDescriptor, off_t(total), SEEK_SET) != off_t(total)) return false;
+  static constexpr char zeros[TailSize] = {};
+  if (write(fileDescriptor, zeros, TailSize) != ssize_t(TailSize)) return false;
+  int error;
+  do error = posix_fallocate(fileDescriptor, 0, off_t(total + PageSize));
+  while (error == EINTR);
+  return error == 0;
+}
+
+void DropWindow(PictureData& data) {
+  if (!data.WindowMapped) return;
+  data.WindowMapped = false;
+  if (data.PixelBase) munmap(data.PixelBase, std::size_t(data.MappingBlockSize));
+  data.PixelBase = nullptr;
+  data.WindowFirstRow = data.WindowLastRow = -1;
+}
+
+/// Moves the window so that it starts two rows above the asked one, where the file allows.
+/// The window of a picture that lacks the rows for one can't be placed.
+void PlaceWindow(PictureData& data, std::int64_t storeRow) {
+  const std::int64_t limit = data.TotalSize / data.RowSize - data.RowsPerBlock;
+  const std::int64_t first = std::min(storeRow > 1 ? storeRow - 2 : storeRow, limit);
+  DropWindow(data);
+  data.PixelBase = nullptr;
+  if (first < 0) return;
+  void* window = mmap(nullptr, std::size_t(data.MappingBlockSize), PROT_READ | PROT_WRITE, MAP_SHARED,
+                      data.Samples->FileDescriptor, off_t(first * data.RowSize));
+  if (window == MAP_FAILED) return;
+  data.PixelBase = static_cast<Sample*>(window);
+  data.WindowMapped = true;
+  data.WindowFirstRow = std::int32_t(first);
+  data.WindowLastRow = std::int32_t(first + data.RowsPerBlock - 1);
+}
+
+bool InWindow(const PictureData& data, std::int64_t storeRow) {
+  return data.WindowMapped && storeRow >= data.WindowFirstRow && storeRow <= data.WindowLastRow;
+}
+
+Sample* WindowRow(PictureData& data, std::int64_t storeRow) {
+  if (!InWindow(data, storeRow)) PlaceWindow(data, storeRow);
+  if (!InWindow(data, storeRow)) return nullptr;
+  return data.PixelBase + std::ptrdiff_t(storeRow - data.WindowFirstRow) * data.RowSize;
+}
+
+std::int64_t StoreRow(const PictureData& data, std::int32_t row) {
+  return std::int64_t{row} + data.RowOffset;
+}
+std::int64_t MirroredStoreRow(const PictureData& data, std::int32_t row) {
+  return std::int64_t{data.Height} - row - 1 + data.RowOffset;
+}
+
+Sample* PlainRowMirrored(PictureData* data, std::int32_t row) {
+  return data->PixelBase + std::ptrdiff_t(MirroredStoreRow(*data, row)) * data->RowSize;
+}
+Sample* MappedRow(PictureData* data, std::int32_t row) { return WindowRow(*data, StoreRow(*data, row)); }
+Sample* MappedRowMirrored(PictureData* data, std::int32_t row) {
+  return WindowRow(*data, MirroredStoreRow(*data, row));
+}
+
+}
+
+Sample* PlainRow(PictureData* data, std::int32_t row) {
+  return data->PixelBase + std::ptrdiff_t(StoreRow(*data, row)) * data->RowSize;
+}
+
+PictureData::RowFunction Mirrored(PictureData::RowFunction getter) {
+  if (getter == PlainRow) return PlainRowMirrored;
+  if (getter == PlainRowMirrored) return PlainRow;
+  if (getter == MappedRow) return MappedRowMirrored;
+  if (getter == MappedRowMirrored) return MappedRow;
+  return getter;
+}
+
+std::int32_t RoundedRowSize(const PictureData& data, std::int32_t unit) {
+  const std::int64_t rounded = (PackedRowBytes(data) + unit - 1) / unit * unit;
+  return rounded <= Int32Max ? std::int32_t(rounded) : 0;
+}
+
+bool UseOwnMemory(PictureData& data) {
+  if (data.TotalSize > Int32Max) return false;
+  auto* memory = static_cast<Sample*>(std::calloc(1, std::size_t(data.TotalSize)));
+  if (!memory) return false;
+  Store* store = NewStore(data);
+  if (!store) {
+    std::free(memory);
+    return false;
+  }
+  store->Memory = data.PixelBase = memory;
+  data.RowsPerBlock = data.Height;
+  data.RowGetter = PlainRow;
+  return true;
+}
+
+bool UseHostMemory(PictureData& data, void* base, void* keeper) {
+  Store* store = base ? NewStore(data) : nullptr;
+  if (!store) return false;
+  REALLockObject(keeper);
+  store->Keeper = keeper;
+  data.PixelBase = static_cast<Sample*>(base);
+  data.RowsPerBlock = data.Height;
+  data.RowGetter = PlainRow;
+  return true;
+}
+
+bool UseMappedFile(PictureData& data, char* path, std::int32_t blockSize) {
+  const int fileDescriptor = open(path, O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, S_IRUSR | S_IWUSR);
+  if (fileDescriptor < 0) {
+    std::free(path);
+    return false;
+  }
+  Store* store = ReserveFile(fileDescriptor, data.TotalSize) ? NewStore(data) : nullptr;
+  if (!store) {
+    EndFile(fileDescriptor, path);
+    return false;
+  }
+  store->FileDescriptor = fileDescriptor;
+  store->Path = path;
+  data.WindowFirstRow = data.WindowLastRow = -1;
+  data.PixelBase = nullptr;
+  data.IsMapping = true;
+  data.RowGetter = MappedRow;
+  ComputeBlockSize(data, blockSize);
+  return data.RowGetter(&data, 0) != nullptr;
+}
+
+void ShareStore(PictureData& view, const PictureData& parent) {
+  view.Samples = parent.Samples;
+  if (view.Samples) ++view.Samples->Pictures;
+  if (!parent.IsMapping) {
+    view.PixelBase = parent.PixelBase;
+    return;
+  }
+  view.IsMapping = true;
+  view.RowsPerBlock = parent.RowsPerBlock;
+  view.MappingBlockSize = parent.MappingBlockSize;
+  view.WindowFirstRow = view.WindowLastRow = -1;
+  if (view.RowGetter) view.RowGetter(&view, 0);
+}
+
+void LeaveStore(PictureData& data) {
+  DropWindow(data);
+  data.PixelBase = nullptr;
+  data.RowGetter = nullptr;
+  Store* store = data.Samples;
+  data.Samples = nullptr;
+  if (store && --store->Pictures == 0) EndStore(store);
+}
+
+void ComputeBlockSize(PictureData& data, std::int32_t requested) {
+  const std::int64_t page = PageSize;
+  std::int64_t block = std::max(requested / page, page) * page;
+  block = std::min(block, data.TotalSize);
+  block = std::max(block, std::int64_t{5} * data.RowSize);
+  block = std::min((block + page - 1) / page * page, Int32Max / page * page);
+  data.MappingBlockSize = std::int32_t(block);
+  data.RowsPerBlock = data.RowSize > 0 ? std::int32_t(block / data.RowSize) : data.Height;
+}
+
+void SetMappingBlockSize(PictureZOR* self, Word, Integer value) {
+  PictureData& data = DataOf(self);
+  if (!data.RowGetter) return;
+  DropWindow(data);
+  ComputeBlockSize(data, value);
+  data.RowGetter(&data, 0);
+}
+
+bool SharePixels(const PictureData& a, const PictureData& b) {
+  const Store *first = a.Samples, *second = b.Samples;
+  if (!first || !second) return false;
+  if (first == second || (first->Keeper && first->Keeper == second->Keeper)) return true;
+  if (a.IsMapping || b.IsMapping) return false;
+  const auto begin = [](const PictureData& data) { return reinterpret_cast<Word>(data.PixelBase); };
+  const auto end = [&](const PictureData& data) {
+    return begin(data) + Word(std::max(data.TotalSize, std::int64_t{data.RowSize}));
+  };
+  return begin(a) < end(b) && begin(b) < end(a);
+}
+
+}

@@ -1,0 +1,69 @@
+#pragma once
+#include "image/picture_data.h"
+
+namespace zor {
+
+// A picture promises no address range but a function, `RowGetter`, which gives the address of one row at a
+// time. Behind it stands a store: memory of our own, memory of a host object, or a file of which only a
+// window of rows is mapped, and the window follows the rows that are asked for.
+//
+// A store is shared by the picture that made it and all views on it, and ends with the last of them. So
+// closing a picture never takes the samples from under a view. Pictures of one store are used by one host
+// thread at a time, which is why the count is a plain one.
+struct Store {
+  std::int32_t Pictures;
+  /// `calloc`ed samples, or null.
+  Sample* Memory;
+  /// The host object that the samples belong to, with a reference; or null.
+  void* Keeper;
+  /// The mapped file with its `calloc`ed path, or a null path.
+  char* Path;
+  int FileDescriptor;
+};
+
+/// Bytes of a page as the stores count them: the system's, but at least 4096.
+extern std::int32_t PageSize;
+void InitPageSize();
+
+/// The bytes of a row of `Width` pixels rounded up to a multiple of `unit`; 0 when they pass 32 bits.
+std::int32_t RoundedRowSize(const PictureData& data, std::int32_t unit);
+
+/// Puts the picture on zeroed memory of its own, with `RowSize` and `TotalSize` as they stand in the record.
+/// False without memory, or for 2 GiB and more.
+bool UseOwnMemory(PictureData& data);
+
+/// Puts the picture on the memory of a host object, which the store keeps alive. False without memory for
+/// the store itself, or with a null base.
+bool UseHostMemory(PictureData& data, void* base, void* keeper);
+
+/// Puts the picture on a new file, whose `calloc`ed path it takes over, and maps the first window, of about
+/// `blockSize` bytes. An existing file is overwritten. False when the file can't be made at its full size:
+/// then it is removed. When only the window fails, the file stays until `LeaveStore`.
+bool UseMappedFile(PictureData& data, char* path, std::int32_t blockSize);
+
+/// Puts a view, whose size, layout and `RowGetter` stand, on its parent's store. On a mapped store it gets a
+/// window of its own, at its row 0.
+void ShareStore(PictureData& view, const PictureData& parent);
+
+/// Takes the picture off its store, which ends if it was the last one there: memory is freed, a file is cut
+/// to nothing and removed.
+void LeaveStore(PictureData& data);
+
+/// Sets `MappingBlockSize` and `RowsPerBlock` for the bytes asked for: whole pages, at least five rows, no
+/// more than the file if five rows fit in it.
+void ComputeBlockSize(PictureData& data, std::int32_t requested);
+
+/// The setter of `MappingBlockSize`. On a mapped store the window moves to the top, so row addresses taken
+/// before are void. A picture without a `RowGetter` ignores it.
+void SetMappingBlockSize(PictureZOR* self, Word, Integer value);
+
+/// The getter that shows the same store upside down; null stays null.
+PictureData::RowFunction Mirrored(PictureData::RowFunction getter);
+
+/// The getter of every memory store.
+Sample* PlainRow(PictureData* data, std::int32_t row);
+
+/// Whether a write to one picture can show in the other: one store, one host object, or overlapping memory.
+bool SharePixels(const PictureData& a, const PictureData& b);
+
+}
