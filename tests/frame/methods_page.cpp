@@ -1,0 +1,56 @@
+#include "frame/methods_page.h"
+
+#include <sstream>
+
+#include "frame/classes.h"
+#include "frame/load.h"
+
+namespace zor {
+namespace {
+
+void PrintMethods(std::ostream& out, const char* title, const MethodRecord* rows, Word count) {
+  out << "\n## " << title << "\n\n| Row | Declaration | Flags | Assignment |\n|---|---|---|---|\n";
+  for (Word i = 0; i < count; ++i)
+    out << "| " << i + 1 << " | `" << rows[i].Declaration << "` | " << std::hex << "0x" << rows[i].Flags
+        << std::dec << " | " << (rows[i].Setter ? "yes" : "") << " |\n";
+}
+
+void PrintProperties(std::ostream& out, const ClassRecord& record) {
+  out << "\n## Properties\n\n| Row | Name | Type | Read | Written | Flags |\n|---|---|---|---|---|---|\n";
+  const auto access = [](Word function) {
+    return function == 0 ? "" : function == DirectField ? "in the record" : "by a function";
+  };
+  for (Word i = 0; i < record.PropertyCount; ++i) {
+    const PropertyRecord& row = record.Properties[i];
+    out << "| " << i + 1 << " | `" << row.Name << "` | " << row.Type << " | " << access(row.Getter) << " | "
+        << access(row.Setter) << " | 0x" << std::hex << row.Flags << std::dec << " |\n";
+  }
+}
+
+void PrintConstants(std::ostream& out, const ClassRecord& record) {
+  out << "\n## Constants\n\n```\n";
+  for (Word i = 0; i < record.ConstantCount; ++i) out << record.Constants[i].Declaration << "\n";
+  out << "```\n";
+}
+
+}
+
+std::string MethodsPage() {
+  WritePictureClass();
+  WriteFactoryClass();
+  BuildConstantDeclarations(&PictureClass, 0, 0, 0);
+  std::ostringstream out;
+  out << "# The classes as a host sees them\n\n"
+         "Printed by `scripts/methods` from the tables of the module; a test compares.\n\n"
+         "# PictureZOR\n";
+  PrintMethods(out, "Methods", PictureClass.Methods, PictureClass.MethodCount);
+  PrintMethods(out, "Shared methods", PictureClass.SharedMethods, PictureClass.SharedMethodCount);
+  PrintProperties(out, PictureClass);
+  PrintConstants(out, PictureClass);
+  out << "\n# PictureFactoryZOR\n";
+  PrintMethods(out, "Shared methods", FactoryClass.SharedMethods, FactoryClass.SharedMethodCount);
+  out << "\n## Events\n\n- `" << FactoryClass.Events[0].Declaration << "`\n";
+  return out.str();
+}
+
+}

@@ -1,0 +1,5 @@
+#include <iostream>
+
+#include "frame/methods_page.h"
+
+int main() { std::cout << zor::MethodsPage(); }
