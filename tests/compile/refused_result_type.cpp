@@ -1,4 +1,4 @@
-// refused: could not convert template argument|no matches converting
+// refused: converted constant expression
 #include "frame/method.h"
 
 namespace zor {
