@@ -1,0 +1,89 @@
+#pragma once
+#include <cstdint>
+#include <exception>
+#include <filesystem>
+#include <functional>
+#include <stdexcept>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace picturezor {
+
+/// The module can't be loaded, or lacks a method that was asked for.
+class ModuleError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+/// An exception that the module raised in the host.
+class HostException : public std::runtime_error {
+ public:
+  HostException(std::string className, const std::string& message)
+      : std::runtime_error(message), Name(std::move(className)) {}
+  /// "OutOfBoundsException" or "NilObjectException".
+  const std::string& ClassName() const { return Name; }
+
+ private:
+  std::string Name;
+};
+
+/// The host that the module runs in: object model, strings, memory blocks, events, exceptions and services.
+///
+/// There is one a process, since the module keeps process-wide state and stays loaded. All calls come from
+/// one thread at a time.
+class Host {
+ public:
+  /// What the module finds at load, and for good.
+  struct Options {
+    /// The version that the host says it has.
+    double Version = 2011.01;
+    /// Names of services that this host doesn't know.
+    std::vector<std::string> Hidden;
+  };
+
+  /// Loads the module; once more with the same path does nothing. Throws ModuleError.
+  static void Load(const std::filesystem::path& module, const Options& options);
+  static void Load(const std::filesystem::path& module) { Load(module, Options()); }
+  static bool IsLoaded();
+
+  /// Called when the module lets other host threads run; empty for nothing. An exception that it throws comes
+  /// out of the call that yielded, once the module has returned.
+  static void OnYield(std::function<void()> hook);
+
+  /// Hides a service from now on, or shows it again. What the module has looked up already it keeps.
+  static void Hide(const std::string& service, bool hidden = true);
+  /// Makes services that create something fail: the next `successes` creations of objects, strings and blocks
+  /// work, all later ones give null. A negative number ends it.
+  static void FailCreationsAfter(int successes);
+
+  /// What is alive now. A program that has dropped all it holds sees zeros.
+  struct Alive {
+    int Objects = 0, Strings = 0, MemoryBlocks = 0;
+    bool operator==(const Alive&) const = default;
+  };
+  static Alive Count();
+  /// Objects of one class that are alive.
+  static int CountOf(std::string_view className);
+
+  /// A row as the module declares it.
+  struct MethodInfo {
+    std::string Declaration;
+    std::uintptr_t Flags;
+    bool Assignable;
+  };
+  struct PropertyInfo {
+    std::string Name, Type;
+    std::uintptr_t Flags;
+    bool Writable;
+  };
+  /// The vocabulary of a class, in the order of its tables. Throws ModuleError for an unknown class.
+  static std::vector<MethodInfo> Methods(std::string_view className);
+  static std::vector<MethodInfo> SharedMethods(std::string_view className);
+  static std::vector<PropertyInfo> Properties(std::string_view className);
+  /// The value of a constant, as its declaration says. Throws ModuleError for an unknown one.
+  static std::int64_t Constant(std::string_view className, std::string_view name);
+  static std::vector<std::string> ConstantDeclarations(std::string_view className);
+};
+
+}

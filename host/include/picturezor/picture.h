@@ -1,0 +1,340 @@
+#pragma once
+#include <functional>
+#include <optional>
+
+#include "picturezor/host.h"
+#include "picturezor/object.h"
+
+namespace picturezor {
+
+/// The 39 pixel formats and the other names of some of them. One byte a sample, always.
+enum class Format : std::int32_t {
+  Unknown = 0,
+  RGB = 1,
+  RGBA,
+  RGBX,
+  ARGB,
+  XRGB,
+  BGR,
+  BGRA,
+  BGRX,
+  ABGR,
+  XBGR,
+  G = 11,
+  GA,
+  AG,
+  // One plane of pixels of 3 or 4 bytes.
+  OneOf3 = 15,
+  TwoOf3,
+  ThreeOf3,
+  OneOf4,
+  TwoOf4,
+  ThreeOf4,
+  FourOf4,
+  RofRGB = 15,
+  GofRGB,
+  BofRGB,
+  RofRGBA = 18,
+  GofRGBA,
+  BofRGBA,
+  AofRGBA,
+  AofARGB = 18,
+  RofARGB,
+  GofARGB,
+  BofARGB,
+  BofBGR = 15,
+  GofBGR,
+  RofBGR,
+  BofBGRA = 18,
+  GofBGRA,
+  RofBGRA,
+  AofBGRA,
+  AofABGR = 18,
+  BofABGR,
+  GofABGR,
+  RofABGR,
+  Buffer = 22,
+  CMYK = 23,
+  CMYKA,
+  ACMYK,
+  CMYKX,
+  XCMYK,
+  KYMC,
+  KYMCA,
+  AKYMC,
+  KYMCX,
+  XKYMC,
+  // Raw pixels of 1 to 8 bytes.
+  Scaling1 = 33,
+  Scaling2,
+  Scaling3,
+  Scaling4,
+  Scaling5,
+  Scaling6,
+  Scaling7,
+  Scaling8,
+};
+
+/// Bytes of a pixel, 1 to 8; 0 for a code that isn't a format.
+int BytesPerPixel(Format format);
+
+enum class Kernel : std::int32_t { Triangle = 1, Box, Lanczos3, Lanczos8, Mitchell, Poly3, Cubic };
+
+enum class DitherMatrix : std::int32_t {
+  Magic2x2 = 1,
+  Magic4x4,
+  Ordered4x4,
+  Lines4x4,
+  Halftone90_6x6,
+  Ordered6x6,
+  Ordered8x8,
+  Cluster3,
+  Cluster4,
+  Cluster8,
+};
+
+struct Color {
+  std::uint8_t Red = 0, Green = 0, Blue = 0;
+  std::int32_t Packed() const { return Red << 16 | Green << 8 | Blue; }
+};
+
+/// A rectangle of pixels. A negative width or height means to the left or upwards; what lies outside a
+/// picture is left out.
+struct Rect {
+  std::int32_t X = 0, Y = 0, Width = 0, Height = 0;
+};
+
+class PictureFactory;
+struct CombineOptions;
+
+/// An image: a reference to an object of the class PictureZOR.
+///
+/// Copies refer to the same image; `Clone` copies the samples. An empty Picture is nil: what a method gives
+/// where it fails, and what can be given for an optional `dest`. Calling a method on it throws ModuleError.
+/// Constructors don't throw for sizes or formats that can't be had: look at `Valid`. What the module raises
+/// comes as HostException. Where a method trusts its caller with the length of some bytes, it is checked here
+/// first, and std::invalid_argument is thrown.
+class Picture : public Object {
+ public:
+  Picture() = default;
+  explicit Picture(Object object) : Object(std::move(object)) {}
+  /// Zeroed samples in memory, below 2 GiB.
+  Picture(std::int32_t width, std::int32_t height, Format format);
+  /// Over somebody's memory, `rowSize` bytes from row to row. Throws std::invalid_argument where the block is
+  /// too small for it.
+  Picture(const MemoryBlock& block, std::int32_t width, std::int32_t height, Format format,
+          std::int32_t rowSize);
+  /// In a temporary file, which is created or overwritten and goes away with the last picture using it. About
+  /// `blockSize` bytes of it, at least 16 MiB and five rows, are in the address space at a time. Needs 5
+  /// rows.
+  static Picture Mapped(const std::filesystem::path& file, std::int32_t width, std::int32_t height,
+                        Format format, std::int32_t blockSize = 0);
+
+  /// A new picture through the global factory, or in memory.
+  static Picture Create(std::int32_t width, std::int32_t height, Format format);
+  /// A new picture through this picture's factory.
+  Picture CreatePicture(std::int32_t width, std::int32_t height, Format format) const;
+  /// Bytes that a picture in memory takes; 0 for a size or format that is refused.
+  static std::int64_t CalculateMemory(std::int32_t width, std::int32_t height, Format format);
+  static bool CanAllocate(std::int32_t width, std::int32_t height, Format format);
+
+  /// Ends the picture now. Views on it go on working.
+  void Close() const;
+  /// A copy in memory; nil for a mapped picture.
+  Picture Clone() const;
+
+  // Properties.
+  bool Valid() const;
+  std::int32_t Width() const;
+  std::int32_t Height() const;
+  Format ImageFormat() const;
+  /// Empty for a format without a name.
+  std::string ImageFormatString() const;
+  /// Bytes of a pixel, and from row to row.
+  std::int32_t PixelSize() const;
+  std::int32_t RowSize() const;
+  std::int32_t RowOffset() const;
+  std::int64_t TotalSize() const;
+  std::int32_t ChannelCount() const;
+  bool IsGray() const;
+  bool IsRGB() const;
+  bool IsCMYK() const;
+  bool IsMapping() const;
+  bool HasAlpha() const;
+  /// Any property by its name, for those that have no member of their own.
+  std::int32_t IntegerProperty(std::string_view name) const;
+  bool BooleanProperty(std::string_view name) const;
+  /// The bytes of a window of a mapped picture, as rounded by the module.
+  std::int32_t MappingBlockSize() const;
+  void SetMappingBlockSize(std::int32_t bytes) const;
+  /// Least sixtieths of a second between two yields to the host; 0 is never.
+  std::int32_t YieldTicks() const;
+  void SetYieldTicks(std::int32_t ticks) const;
+  PictureFactory Factory() const;
+  void SetFactory(const PictureFactory& factory) const;
+  Picture Parent() const;
+  MemoryBlock MemoryTarget() const;
+  /// The start of the store, or of the window of a mapped one; nil without either. It has no size of its own.
+  MemoryBlock Memory() const;
+
+  // Rows and whole pictures as bytes. An index outside the picture throws HostException.
+  /// The stored row itself, `RowSize` bytes of it. On a mapped picture good until another row is asked for.
+  MemoryBlock RawRow(std::int32_t index) const;
+  /// A copy of the stored row, filler and padding included.
+  Bytes Row(std::int32_t index) const;
+  void SetRow(std::int32_t index, std::span<const std::uint8_t> bytes) const;
+  /// A row as packed pixels of a format. Empty where there is no way to that format; between RGB and CMYK
+  /// HostException.
+  Bytes RowInFormat(std::int32_t index, Format format) const;
+  Bytes RowInFormat(std::int32_t index, Format format, bool invertAlpha) const;
+  void SetRowInFormat(std::int32_t index, Format format, std::span<const std::uint8_t> bytes) const;
+  void SetRowInFormat(std::int32_t index, Format format, bool invertAlpha,
+                      std::span<const std::uint8_t> bytes) const;
+  Bytes RowStringInFormat(std::int32_t index, Format format) const;
+  void SetRowStringInFormat(std::int32_t index, Format format, std::span<const std::uint8_t> bytes) const;
+  /// All rows, one after the other, below 2 GiB.
+  Bytes DataStringInFormat(Format format) const;
+  void SetDataStringInFormat(Format format, std::span<const std::uint8_t> bytes) const;
+
+  // Views: they show and write this picture's samples.
+  Picture AlphaChannel() const;
+  Picture RedChannel() const;
+  Picture GreenChannel() const;
+  Picture BlueChannel() const;
+  Picture GrayChannel() const;
+  Picture CyanChannel() const;
+  Picture MagentaChannel() const;
+  Picture YellowChannel() const;
+  Picture BlackChannel() const;
+  /// By its place in the pixel; outside of them HostException.
+  Picture Channel(std::int32_t index) const;
+  Picture RGBChannels() const;
+  Picture CMYKChannels() const;
+  Picture ClipImage() const;
+  Picture ClipImage(const Rect& rect) const;
+  Picture MirroredView() const;
+
+  // Scaling: `source`, resampled, into the top left width x height pixels of this picture. False where the
+  // formats have no way to each other, or the size doesn't fit.
+  bool Scale(const Picture& source, const Picture& temp, Kernel kernel, std::int32_t width,
+             std::int32_t height) const;
+  /// The same on a number of threads, 0 for one a processor.
+  bool ScaleMT(std::int32_t threads, const Picture& source, const Picture& temp, Kernel kernel,
+               std::int32_t width, std::int32_t height) const;
+  /// By nearest neighbour.
+  bool ScaleFast(const Picture& source, std::int32_t width, std::int32_t height) const;
+
+  // Geometry. A nil `dest` makes a new picture; nil comes back where it fails.
+  void HMirror() const;
+  void VMirror() const;
+  void Rotate180() const;
+  Picture Rotate180(const Picture& dest) const;
+  Picture Rotate90(const Picture& dest = {}) const;
+  Picture Rotate270(const Picture& dest = {}) const;
+  Picture Rotate90slow(const Picture& dest = {}) const;
+  Picture Rotate270slow(const Picture& dest = {}) const;
+  /// The samples that fill the corners of a turned picture.
+  struct Background {
+    std::int32_t Red = 0, Green = 0, Blue = 0, Alpha = 0, Gray = 0, Cyan = 0, Magenta = 0, Yellow = 0,
+                 Black = 0;
+  };
+  /// By degrees.
+  Picture Rotate(double angle) const;
+  Picture Rotate(double angle, const Background& background) const;
+
+  // Filters. A nil `dest` makes a new picture; nil comes back where it fails.
+  void Invert() const;
+  void Invert(const Rect& rect) const;
+  bool AutoLevel() const;
+  bool AutoLevel(const Rect& rect) const;
+  Picture SolarizeFilter(const Picture& dest = {}) const;
+  Picture GammaFilter(const Picture& dest, double gamma) const;
+  Picture GammaFilter(const Picture& dest, double gamma, double alphaGamma) const;
+  Picture GammaFilter(const Picture& dest, double redGamma, double greenGamma, double blueGamma) const;
+  Picture GammaFilter(const Picture& dest, double redGamma, double greenGamma, double blueGamma,
+                      double alphaGamma) const;
+  Picture GainFilter(const Picture& dest, double gain, double bias) const;
+  Picture TransferFilter(const Picture& dest, const IntegerArray& gray) const;
+  Picture TransferFilter(const Picture& dest, const IntegerArray& gray, const IntegerArray& alpha) const;
+  Picture TransferFilter(const Picture& dest, const IntegerArray& red, const IntegerArray& green,
+                         const IntegerArray& blue) const;
+  Picture TransferFilter(const Picture& dest, const IntegerArray& red, const IntegerArray& green,
+                         const IntegerArray& blue, const IntegerArray& alpha) const;
+  Picture ApplyMatrix(const Picture& dest, std::int32_t dimension, const IntegerArray& matrix) const;
+  Picture ApplyMatrix(const Picture& dest, std::int32_t dimension, const IntegerArray& matrix,
+                      std::int32_t delta) const;
+  Picture ApplyMatrix(const Picture& dest, std::int32_t dimension, const IntegerArray& matrix,
+                      std::int32_t delta, double scaleFactor) const;
+  Picture BoxBlurFilter(const Picture& dest, double radius) const;
+  Picture BoxBlurFilter(const Picture& dest, double radius, bool vertical, bool horizontal) const;
+  Picture BoxBlurFilter(const Picture& dest, double radius, std::int32_t iterations) const;
+  Picture BoxBlurFilter(const Picture& dest, double radius, std::int32_t iterations, bool vertical,
+                        bool horizontal) const;
+  Picture BoxBlurFractionalFilter(const Picture& dest, double radius) const;
+  Picture StampFilter(const Picture& dest, double radius, double threshold, double softness, Color black,
+                      Color white) const;
+  bool UnsharpFilter(const Picture& original, double amount, std::int32_t threshold) const;
+  Picture OilFilter(const Picture& dest, std::int32_t levels, std::int32_t range) const;
+  Picture DiffuseFilter(const Picture& dest, std::int32_t level) const;
+  Picture EngraveFilter(const Picture& dest, std::int32_t level) const;
+  Picture NeonFilter(const Picture& dest = {}) const;
+  Picture DitherFilter(const Picture& dest, DitherMatrix matrix, std::int32_t levels) const;
+
+  // Composition.
+  void FillRect(std::int32_t value) const;
+  void FillRect(const Rect& rect, std::int32_t value) const;
+  void FillRectRGB(std::int32_t red, std::int32_t green, std::int32_t blue) const;
+  void FillRectRGB(std::int32_t red, std::int32_t green, std::int32_t blue, std::int32_t alpha) const;
+  void FillRectRGB(const Rect& rect, std::int32_t red, std::int32_t green, std::int32_t blue) const;
+  void FillRectRGB(const Rect& rect, std::int32_t red, std::int32_t green, std::int32_t blue,
+                   std::int32_t alpha) const;
+  void FillRectRGB(Color color) const;
+  void FillRectRGB(Color color, std::int32_t alpha) const;
+  void FillRectRGB(const Rect& rect, Color color) const;
+  void FillRectRGB(const Rect& rect, Color color, std::int32_t alpha) const;
+  void FillRectRandom() const;
+  void FillRectRandom(const Rect& rect) const;
+  void ClearRect() const;
+  void ClearRect(const Rect& rect) const;
+  /// The sum of the absolute differences of all samples; -1 when the two can't be compared.
+  std::int64_t CompareImages(const Picture& other) const;
+  bool CopyPixels(const Picture& source) const;
+  bool CopyPixels(const Picture& source, const Rect& dest) const;
+  bool CopyPixels(const Picture& source, const Rect& dest, std::int32_t sourceX, std::int32_t sourceY) const;
+
+  /// Lays a block of `image` over this picture, at dest's origin and size.
+  bool Combine(const Picture& image, const Rect& dest, std::int32_t sourceX, std::int32_t sourceY,
+               const CombineOptions& options) const;
+};
+
+/// What decides how much of the destination stays where an image is laid over it: 255 keeps it, 0 takes the
+/// image.
+struct CombineOptions {
+  /// The image's samples have been scaled by their coverage already, so they are added.
+  bool PreMultipliedSource = false;
+  /// As large as the image; decides alone where it is given.
+  Picture Mask{};
+  /// Whether `MaskColour` counts; otherwise it stands for 0.
+  bool UseColours = false;
+  /// A flat colour that the image is the mask for, where there is no `MaskColour`.
+  std::optional<Color> ForeColour{};
+  /// One mask value a channel.
+  std::optional<Color> MaskColour{};
+};
+
+/// Makes the pictures that operations need, in the program's own way.
+class PictureFactory : public Object {
+ public:
+  /// Gives a picture of at least the size asked for; an empty one lets the next way be tried.
+  using Handler = std::function<Picture(std::int32_t width, std::int32_t height, Format format)>;
+
+  PictureFactory() = default;
+  explicit PictureFactory(Object object) : Object(std::move(object)) {}
+  /// A factory without a handler is as good as none.
+  explicit PictureFactory(Handler handler);
+
+  /// The factory that all new pictures of the process are asked from; an empty one for none.
+  static void SetFactory(const PictureFactory& factory);
+};
+
+}

@@ -1,0 +1,98 @@
+#include "picturezor/host.h"
+
+#include <dlfcn.h>
+
+#include <algorithm>
+
+#include "object_model.h"
+
+namespace picturezor {
+
+using namespace model;
+
+namespace {
+
+std::filesystem::path& LoadedModule() {
+  static std::filesystem::path module;
+  return module;
+}
+
+std::vector<Host::MethodInfo> InfosOf(const std::vector<MethodEntry>& rows) {
+  std::vector<Host::MethodInfo> infos;
+  for (const MethodEntry& row : rows)
+    infos.push_back({row.Record->Declaration, row.Record->Flags, row.Record->Setter != 0});
+  return infos;
+}
+
+}
+
+void Host::Load(const std::filesystem::path& module, const Options& options) {
+  const std::filesystem::path path = std::filesystem::absolute(module);
+  if (IsLoaded()) {
+    if (path == LoadedModule()) return;
+    throw ModuleError("a module is loaded already: " + LoadedModule().string());
+  }
+  void* library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+  if (!library) throw ModuleError(std::string("the module can't be loaded: ") + dlerror());
+  const auto entry = reinterpret_cast<zor::PluginMain>(dlsym(library, "REALPluginMain"));
+  if (!entry) throw ModuleError(path.string() + " isn't a module: it has no REALPluginMain");
+  Runtime& runtime = TheRuntime();
+  runtime.Version = options.Version;
+  runtime.Hidden = options.Hidden;
+  entry([](const char* name) { return ServiceNamed(name); });
+  ThrowPending();
+  LoadedModule() = path;
+}
+
+bool Host::IsLoaded() { return !LoadedModule().empty(); }
+
+void Host::OnYield(std::function<void()> hook) { TheRuntime().OnYield = std::move(hook); }
+
+void Host::Hide(const std::string& service, bool hidden) {
+  auto& names = TheRuntime().Hidden;
+  std::erase(names, service);
+  if (hidden) names.push_back(service);
+}
+
+void Host::FailCreationsAfter(int successes) { TheRuntime().CreationsLeft = successes; }
+
+Host::Alive Host::Count() { return TheRuntime().Alive; }
+
+int Host::CountOf(std::string_view className) {
+  const Class* of = FindClass(className);
+  const auto& counts = TheRuntime().AliveOf;
+  const auto found = counts.find(of);
+  return found == counts.end() ? 0 : found->second;
+}
+
+std::vector<Host::MethodInfo> Host::Methods(std::string_view className) {
+  return InfosOf(ClassNamed(className).Methods);
+}
+
+std::vector<Host::MethodInfo> Host::SharedMethods(std::string_view className) {
+  return InfosOf(ClassNamed(className).SharedMethods);
+}
+
+std::vector<Host::PropertyInfo> Host::Properties(std::string_view className) {
+  std::vector<PropertyInfo> infos;
+  for (const PropertyEntry& row : ClassNamed(className).Properties)
+    infos.push_back({row.Name, row.Type, row.Record->Flags, row.Record->Setter != 0});
+  return infos;
+}
+
+std::int64_t Host::Constant(std::string_view className, std::string_view name) {
+  const auto& constants = ClassNamed(className).Constants;
+  const auto found = constants.find(Lower(name));
+  if (found == constants.end()) throw ModuleError("there is no constant " + std::string(name));
+  return found->second;
+}
+
+std::vector<std::string> Host::ConstantDeclarations(std::string_view className) {
+  const zor::ClassRecord* record = ClassNamed(className).Record;
+  std::vector<std::string> declarations;
+  for (std::size_t i = 0; record && i < record->ConstantCount; ++i)
+    declarations.emplace_back(record->Constants[i].Declaration);
+  return declarations;
+}
+
+}

@@ -1,0 +1,45 @@
+#include "invoke.h"
+
+#include <algorithm>
+
+namespace picturezor::model {
+namespace {
+
+/// Whether the row takes arguments of these types, as its first ones, and can do without the others.
+bool Takes(const MethodEntry& row, const std::string& lowerName, const std::vector<TypeName>& types) {
+  const auto& parameters = row.Of.Parameters;
+  if (Lower(row.Of.Name) != lowerName || types.size() > parameters.size()) return false;
+  for (std::size_t i = 0; i < types.size(); ++i)
+    if (parameters[i].Type != types[i]) return false;
+  return types.size() == parameters.size() || parameters[types.size()].Optional;
+}
+
+std::string Listed(std::string_view name, const std::vector<TypeName>& types) {
+  std::string text = std::string(name) + "(";
+  for (const TypeName& type : types) text += (text.back() == '(' ? "" : ", ") + type;
+  return text + ")";
+}
+
+}
+
+Found FindMethod(const std::vector<MethodEntry>& rows, std::string_view name,
+                 const std::vector<TypeName>& types) {
+  const std::string lowerName = Lower(name);
+  const MethodEntry* best = nullptr;
+  for (const MethodEntry& row : rows)
+    if (Takes(row, lowerName, types) && (!best || row.Of.Parameters.size() < best->Of.Parameters.size()))
+      best = &row;
+  if (!best) throw ModuleError("the class has no method " + Listed(name, types));
+  const auto& parameters = best->Of.Parameters;
+  return {best, {parameters.begin() + std::ptrdiff_t(types.size()), parameters.end()}};
+}
+
+const zor::PropertyRecord& FindProperty(const Object& self, std::string_view name, std::string_view type) {
+  if (!self) throw ModuleError(std::string(name) + ": read on nil");
+  const std::string lowerName = Lower(name);
+  for (const PropertyEntry& row : HeaderOf(self.Address()).Of->Properties)
+    if (Lower(row.Name) == lowerName && Lower(row.Type) == type) return *row.Record;
+  throw ModuleError("the class has no property " + std::string(name) + " as " + std::string(type));
+}
+
+}

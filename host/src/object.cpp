@@ -1,0 +1,69 @@
+#include "picturezor/object.h"
+
+#include <algorithm>
+
+#include "object_model.h"
+
+namespace picturezor {
+
+using namespace model;
+
+namespace {
+
+void* NewBlock(std::size_t size) {
+  auto payload = std::make_unique<BlockPayload>();
+  payload->Own.resize(size);
+  payload->Start = payload->Own.data();
+  payload->Size = size;
+  return NewObject(ClassNamed("MemoryBlock"), std::move(payload));
+}
+
+}
+
+Object::Object(const Object& other) : At(other.At) { Lock(At); }
+
+Object::~Object() { Unlock(At); }
+
+Object Object::Adopt(void* address) {
+  Object object;
+  object.At = address;
+  return object;
+}
+
+Object Object::Share(void* address) {
+  Lock(address);
+  return Adopt(address);
+}
+
+int Object::References() const { return At ? HeaderOf(At).References : 0; }
+
+MemoryBlock::MemoryBlock(std::size_t size) : Object(Adopt(NewBlock(size))) {}
+
+MemoryBlock::MemoryBlock(std::span<const std::uint8_t> bytes) : MemoryBlock(bytes.size()) {
+  std::ranges::copy(bytes, Start());
+}
+
+std::span<std::uint8_t> MemoryBlock::Data() const {
+  const auto* payload = HeldBy<BlockPayload>(Address());
+  return payload ? std::span(payload->Start, payload->Size) : std::span<std::uint8_t>();
+}
+
+std::uint8_t* MemoryBlock::Start() const { return Data().data(); }
+
+void MemoryBlock::Limit(std::size_t size) {
+  if (auto* payload = HeldBy<BlockPayload>(Address())) payload->Size = size;
+}
+
+FolderItem::FolderItem(const std::filesystem::path& path) {
+  auto payload = std::make_unique<FilePayload>();
+  payload->Path = std::filesystem::absolute(path).string();
+  static_cast<Object&>(*this) = Adopt(NewObject(ClassNamed("FolderItem"), std::move(payload)));
+}
+
+IntegerArray::IntegerArray(std::vector<std::int32_t> values) {
+  auto payload = std::make_unique<ArrayPayload>();
+  payload->Values = std::move(values);
+  static_cast<Object&>(*this) = Adopt(NewObject(ClassNamed("IntegerArray"), std::move(payload)));
+}
+
+}

@@ -1,0 +1,121 @@
+#include "object_model.h"
+
+#include <algorithm>
+#include <cctype>
+#include <cstring>
+#include <new>
+#include <utility>
+
+namespace picturezor::model {
+namespace {
+
+Runtime* MakeRuntime() {
+  auto* runtime = new Runtime;
+  for (const char* name :
+       {"OutOfBoundsException", "NilObjectException", "MemoryBlock", "FolderItem", "IntegerArray"})
+    runtime->Classes[Lower(name)] = {.Name = name};
+  return runtime;
+}
+
+std::vector<MethodEntry> EntriesOf(const zor::MethodRecord* rows, std::size_t count) {
+  std::vector<MethodEntry> entries;
+  for (std::size_t i = 0; i < count; ++i)
+    entries.push_back({&rows[i], ParseDeclaration(rows[i].Declaration)});
+  return entries;
+}
+
+}
+
+// Never destroyed, since objects may outlive the end of main().
+Runtime& TheRuntime() {
+  static Runtime* const runtime = MakeRuntime();
+  return *runtime;
+}
+
+std::string Lower(std::string_view text) {
+  std::string lower(text);
+  std::ranges::transform(lower, lower.begin(), [](unsigned char c) { return char(std::tolower(c)); });
+  return lower;
+}
+
+const Class* FindClass(std::string_view name) {
+  const auto& classes = TheRuntime().Classes;
+  const auto found = classes.find(Lower(name));
+  return found == classes.end() ? nullptr : &found->second;
+}
+
+const Class& ClassNamed(std::string_view name) {
+  if (const Class* found = FindClass(name)) return *found;
+  throw ModuleError("there is no class " + std::string(name));
+}
+
+void Register(zor::ClassRecord* record) {
+  record->InstanceOffsetSlot = InstanceOffset;
+  for (std::size_t i = 0; i < record->EventCount; ++i) record->Events[i].EventWord = i + 1;
+
+  Class added;
+  added.Name = record->ClassName;
+  added.DataSize = record->DataSize;
+  added.Destructor = reinterpret_cast<void (*)(void*)>(record->DestructorFunction);
+  added.Record = record;
+  added.Methods = EntriesOf(record->Methods, record->MethodCount);
+  added.SharedMethods = EntriesOf(record->SharedMethods, record->SharedMethodCount);
+  for (std::size_t i = 0; i < record->PropertyCount; ++i)
+    added.Properties.push_back(
+        {&record->Properties[i], record->Properties[i].Name, record->Properties[i].Type});
+  for (std::size_t i = 0; i < record->ConstantCount; ++i) {
+    const auto [name, value] = ParseConstant(record->Constants[i].Declaration);
+    added.Constants[Lower(name)] = value;
+  }
+  TheRuntime().Classes[Lower(added.Name)] = std::move(added);
+}
+
+bool MayCreate() {
+  int& left = TheRuntime().CreationsLeft;
+  if (left == 0) return false;
+  if (left > 0) --left;
+  return true;
+}
+
+void* NewObject(const Class& of, std::unique_ptr<Payload> holds) {
+  void* memory = ::operator new (InstanceOffset + of.DataSize, std::align_val_t{InstanceOffset});
+  new (memory) ObjectHeader{&of, 1, std::move(holds)};
+  std::memset(InstanceOf(memory), 0, of.DataSize);
+  ++TheRuntime().Alive.Objects;
+  ++TheRuntime().AliveOf[&of];
+  return memory;
+}
+
+void Lock(void* object) {
+  if (object) ++HeaderOf(object).References;
+}
+
+void Unlock(void* object) {
+  if (!object || --HeaderOf(object).References > 0) return;
+  const Class* of = HeaderOf(object).Of;
+  if (of->Destructor) {
+    // A destructor may lock and unlock its own object; it must not end twice.
+    HeaderOf(object).References = 1 << 20;
+    of->Destructor(object);
+  }
+  HeaderOf(object).~ObjectHeader();
+  ::operator delete (object, std::align_val_t{InstanceOffset});
+  --TheRuntime().Alive.Objects;
+  --TheRuntime().AliveOf[of];
+}
+
+void ThrowPending() {
+  Runtime& runtime = TheRuntime();
+  if (std::exception_ptr thrown = std::exchange(runtime.Thrown, nullptr)) {
+    Unlock(std::exchange(runtime.Raised, nullptr));
+    std::rethrow_exception(thrown);
+  }
+  if (void* raised = std::exchange(runtime.Raised, nullptr)) {
+    const auto* holds = HeldBy<ExceptionPayload>(raised);
+    const HostException exception(HeaderOf(raised).Of->Name, holds ? holds->Message : "");
+    Unlock(raised);
+    throw exception;
+  }
+}
+
+}

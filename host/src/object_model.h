@@ -1,0 +1,131 @@
+#pragma once
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <map>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "declaration.h"
+#include "frame/records.h"
+#include "picturezor/host.h"
+
+namespace picturezor::model {
+
+/// A method as registered, its declaration taken apart.
+struct MethodEntry {
+  const zor::MethodRecord* Record;
+  Declaration Of;
+};
+
+struct PropertyEntry {
+  const zor::PropertyRecord* Record;
+  std::string Name, Type;
+};
+
+struct Class {
+  std::string Name;
+  std::size_t DataSize = 0;
+  void (*Destructor)(void* object) = nullptr;
+  const zor::ClassRecord* Record = nullptr;
+  std::vector<MethodEntry> Methods{}, SharedMethods{};
+  std::vector<PropertyEntry> Properties{};
+  std::map<std::string, std::int64_t> Constants{};  // by lower-case name
+};
+
+/// What an object of one of the host's own classes holds beside its instance data.
+struct Payload {
+  virtual ~Payload() = default;
+};
+
+struct ObjectHeader {
+  const Class* Of;
+  int References;
+  std::unique_ptr<Payload> Holds;
+};
+
+/// Where an object's instance data begins; what the host writes into `InstanceOffsetSlot`. Not zero, so that
+/// a module which forgets it is found out.
+inline constexpr std::size_t InstanceOffset = 64;
+static_assert(sizeof(ObjectHeader) <= InstanceOffset);
+
+inline ObjectHeader& HeaderOf(void* object) { return *static_cast<ObjectHeader*>(object); }
+inline std::uint8_t* InstanceOf(void* object) { return static_cast<std::uint8_t*>(object) + InstanceOffset; }
+
+template <class T>
+T* HeldBy(void* object) {
+  return object ? dynamic_cast<T*>(HeaderOf(object).Holds.get()) : nullptr;
+}
+
+/// All that lives behind the services.
+struct Runtime {
+  std::map<std::string, Class, std::less<>> Classes;  // by lower-case name
+  std::vector<std::string> Hidden;
+  std::function<void()> OnYield;
+  double Version = 0;
+  int CreationsLeft = -1;
+  Host::Alive Alive;
+  std::map<const Class*, int> AliveOf;
+  /// What comes out of the call in hand once the module returns: an exception that the module raised, or one
+  /// that C++ code called by the module threw.
+  void* Raised = nullptr;
+  std::exception_ptr Thrown;
+};
+
+Runtime& TheRuntime();
+
+std::string Lower(std::string_view text);
+const Class* FindClass(std::string_view name);
+/// Throws ModuleError for an unknown name.
+const Class& ClassNamed(std::string_view name);
+void Register(zor::ClassRecord* record);
+
+/// Whether something may be created now; false once the creations that a test allows are used up.
+bool MayCreate();
+
+/// A new object with one reference and zeroed instance data.
+void* NewObject(const Class& of, std::unique_ptr<Payload> holds = nullptr);
+void Lock(void* object);
+void Unlock(void* object);
+
+struct BlockPayload : Payload {
+  std::vector<std::uint8_t> Own;
+  std::uint8_t* Start = nullptr;
+  std::size_t Size = 0;
+  BlockPayload() { ++TheRuntime().Alive.MemoryBlocks; }
+  ~BlockPayload() override { --TheRuntime().Alive.MemoryBlocks; }
+};
+struct FilePayload : Payload {
+  std::string Path;
+};
+struct ArrayPayload : Payload {
+  std::vector<std::int32_t> Values;
+};
+struct ExceptionPayload : Payload {
+  std::string Message;
+};
+struct FactoryPayload : Payload {
+  std::function<void*(std::int32_t, std::int32_t, std::int32_t)> NewPicture;
+};
+
+/// Runs C++ code that the module has called; an exception is kept for the call in hand, and the module gets
+/// the failure value.
+template <class Result, class Body>
+Result Guarded(Result failure, Body&& body) {
+  try {
+    return body();
+  } catch (...) {
+    TheRuntime().Thrown = std::current_exception();
+    return failure;
+  }
+}
+
+/// Throws what the module raised, or what code called by it threw, during the call that has just returned.
+void ThrowPending();
+
+/// The address of a service by its name, or null.
+void* ServiceNamed(const char* name);
+
+}

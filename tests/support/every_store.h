@@ -1,0 +1,104 @@
+#pragma once
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <filesystem>
+#include <random>
+#include <string>
+#include <vector>
+
+#include "picturezor/picture.h"
+
+namespace picturezor {
+
+using Samples = Bytes;
+
+inline void PrintTo(Format format, std::ostream* out) { *out << "Format " << int(format); }
+
+/// All codes that have a layout.
+inline std::vector<Format> EveryFormat() {
+  std::vector<Format> formats;
+  for (int code = 1; code <= 40; ++code)
+    if (BytesPerPixel(Format(code)) > 0) formats.push_back(Format(code));
+  return formats;
+}
+
+/// A stream of numbers from a seed that a failing test prints.
+class Noise {
+ public:
+  explicit Noise(unsigned seed) : Engine(seed) {}
+  std::uint8_t Byte() { return std::uint8_t(Engine()); }
+  /// From first to last, both included.
+  int Between(int first, int last) { return first + int(Engine() % unsigned(last - first + 1)); }
+  Samples Many(std::size_t count) {
+    Samples samples(count);
+    for (auto& sample : samples) sample = Byte();
+    return samples;
+  }
+
+ private:
+  std::mt19937 Engine;
+};
+
+/// A file name that nobody has, in the folder for temporary files; the file is removed at the end.
+class TemporaryFile {
+ public:
+  TemporaryFile();
+  ~TemporaryFile();
+  TemporaryFile(const TemporaryFile&) = delete;
+  const std::filesystem::path& Path() const { return At; }
+
+ private:
+  std::filesystem::path At;
+};
+
+/// The stored rows of a picture, filler and padding included.
+std::vector<Samples> StoredRows(const Picture& picture);
+void SetStoredRows(const Picture& picture, const std::vector<Samples>& rows);
+
+/// Fills every byte of a picture's rows, filler and padding included.
+void FillWithNoise(const Picture& picture, unsigned seed);
+
+/// The packed pixels of the whole picture as they are stored, filler included.
+Samples Packed(const Picture& picture);
+void SetPacked(const Picture& picture, const Samples& pixels);
+
+/// A picture in one of the stores, its surroundings filled with noise.
+class StoredPicture {
+ public:
+  enum Kind { Memory, Block, Mapped, Clip, Mirrored, MappedClip };
+  static constexpr Kind Kinds[] = {Memory, Block, Mapped, Clip, Mirrored, MappedClip};
+  static const char* NameOf(Kind kind);
+  /// A file's window needs five rows.
+  static bool Fits(Kind kind, int height) { return kind != Mapped || height >= 5; }
+
+  StoredPicture(Kind kind, int width, int height, Format format);
+  const Picture& Get() const { return Shown; }
+  /// Whether the bytes that don't belong to the picture are as they were.
+  bool SurroundingsIntact() const;
+
+ private:
+  /// Rows of the whole with the picture's own bytes set to zero.
+  std::vector<Samples> Surroundings() const;
+
+  TemporaryFile File;
+  Picture Whole, Shown;
+  int Left = 0, Top = 0;
+  std::vector<Samples> Before;
+};
+
+/// Runs body once for each store that a picture can live in: own memory, the caller's block with a wide
+/// stride, a mapped file with the smallest window, a clip of a larger picture, a mirrored view, a clip of a
+/// mapped file. The bytes around the picture must be as they were afterwards.
+template <class Body>
+void ForEveryStore(int width, int height, Format format, Body&& body) {
+  for (const StoredPicture::Kind kind : StoredPicture::Kinds) {
+    if (!StoredPicture::Fits(kind, height)) continue;
+    SCOPED_TRACE(StoredPicture::NameOf(kind));
+    const StoredPicture picture(kind, width, height, format);
+    body(picture.Get());
+    EXPECT_TRUE(picture.SurroundingsIntact());
+  }
+}
+
+}
