@@ -1,0 +1,18 @@
+#pragma once
+#include <optional>
+#include <span>
+
+#include "codecs/image_file.h"
+
+namespace picturezor::cli {
+
+/// What of a camera's notes matters here.
+struct Exif {
+  int Orientation = 1;
+  std::optional<Resolution> Density;
+};
+
+/// Reads a block of EXIF, from its byte order mark on. What is damaged counts as not there.
+Exif ReadExif(std::span<const std::uint8_t> block);
+
+}

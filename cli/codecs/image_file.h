@@ -1,0 +1,116 @@
+#pragma once
+#include <cstdint>
+#include <filesystem>
+#include <memory>
+#include <optional>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "picturezor/picture.h"
+
+namespace picturezor::cli {
+
+enum class FileType { PNG, JPEG, TIFF };
+std::string NameOf(FileType type);
+
+/// Pixels per inch.
+struct Resolution {
+  double X = 0, Y = 0;
+};
+
+/// What goes with the pixels of a file.
+struct ImageInfo {
+  /// As stored, before the orientation is applied.
+  std::int32_t Width = 0, Height = 0;
+  /// G, GA, RGB, RGBA, CMYK or CMYKA. Alpha is not multiplied into the colours, and a CMYK sample is an
+  /// amount of ink: 255 is full ink.
+  Format Pixels = Format::Unknown;
+  /// Bits of a sample in the file.
+  int Bits = 8;
+  /// As in EXIF: 1 is upright, 5 to 8 have rows and columns exchanged.
+  int Orientation = 1;
+  Bytes Profile;
+  std::optional<Resolution> Density;
+  /// What the reader had to change or leave out.
+  std::vector<std::string> Notes;
+};
+
+/// Reads an image file row by row. All failures are thrown as Failure, naming the file.
+class ImageReader {
+ public:
+  virtual ~ImageReader() = default;
+  const ImageInfo& Info() const { return About; }
+  virtual FileType Type() const = 0;
+  /// The next row, packed pixels of Info().Pixels. To be called Info().Height times.
+  virtual void ReadRow(std::uint8_t* row) = 0;
+  /// To be called after the last row: reads what stands behind the pixels, so that a file which is cut off
+  /// there is noticed too.
+  virtual void Finish() = 0;
+
+ protected:
+  ImageInfo About;
+};
+
+/// Writes an image file row by row into an open file. Failures are thrown as Failure, naming the target.
+class ImageWriter {
+ public:
+  virtual ~ImageWriter() = default;
+  virtual void WriteRow(const std::uint8_t* row) = 0;
+  /// To be called after the last row: the file is complete then.
+  virtual void Finish() = 0;
+};
+
+struct WriteOptions {
+  /// 1 to 100, for JPEG. From 90 on colours are kept at full resolution.
+  int Quality = 90;
+};
+
+/// Opens an image file of any of the types, told by its first bytes. A file whose size can't hold the pixels
+/// that it claims is refused before anything of their size is allocated; what a file needs for itself
+/// beside one row (interlaced PNG, progressive JPEG, large tiles) may take up to `memoryLimit` bytes.
+std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, std::int64_t memoryLimit);
+
+/// The type that the file's extension stands for. Throws UsageFailure.
+FileType TypeByExtension(const std::filesystem::path& file);
+/// The format nearest to `pixels` that a file of the type holds: JPEG has no alpha. Throws Failure where
+/// there is none, as for CMYK in PNG, or where the type can't hold a picture of that size.
+Format StorableFormat(const std::filesystem::path& file, FileType type, Format pixels);
+void RequireStorableSize(const std::filesystem::path& file, FileType type, std::int64_t width,
+                         std::int64_t height);
+
+/// Starts an image file at the beginning of `descriptor`, which stays the caller's. Of `info` the size,
+/// pixels, profile and density count; the orientation is written as upright. `target` names it in failures.
+/// A TIFF is compressed by LZW with a predictor, and is a BigTIFF where it might pass 4 GB.
+std::unique_ptr<ImageWriter> CreateImage(int descriptor, const std::filesystem::path& target, FileType type,
+                                         const ImageInfo& info, const WriteOptions& options);
+
+/// The channels of one of the six formats of files, alpha included, and whether alpha is among them.
+int ChannelsOf(Format format);
+bool HasAlpha(Format format);
+Format WithoutAlpha(Format format);
+Format WithAlpha(Format format);
+/// "gray with alpha" and the like.
+std::string Describe(Format format);
+
+/// Whether the colour space that a profile names is that of the pixels.
+bool ProfileFits(std::span<const std::uint8_t> profile, Format format);
+
+/// For the codecs: refuses sizes beyond what a picture can have, and a size that needs more than
+/// `fileSize` bytes at `pixelsPerByte`, the most that a byte of the file can stand for.
+void RequirePlausible(const std::filesystem::path& file, std::int64_t width, std::int64_t height,
+                      std::int64_t fileSize, double pixelsPerByte);
+void RequireWithinLimit(const std::filesystem::path& file, std::int64_t bytes, std::int64_t memoryLimit,
+                        const std::string& what);
+
+std::unique_ptr<ImageReader> OpenPNG(const std::filesystem::path& file, std::int64_t memoryLimit);
+std::unique_ptr<ImageReader> OpenJPEG(const std::filesystem::path& file, std::int64_t memoryLimit);
+std::unique_ptr<ImageReader> OpenTIFF(const std::filesystem::path& file, std::int64_t memoryLimit);
+std::unique_ptr<ImageWriter> CreatePNG(int descriptor, const std::filesystem::path& target,
+                                       const ImageInfo& info);
+std::unique_ptr<ImageWriter> CreateJPEG(int descriptor, const std::filesystem::path& target,
+                                        const ImageInfo& info, const WriteOptions& options);
+std::unique_ptr<ImageWriter> CreateTIFF(int descriptor, const std::filesystem::path& target,
+                                        const ImageInfo& info);
+
+}

@@ -1,0 +1,440 @@
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+
+#include "codecs/exif.h"
+#include "codecs/image_file.h"
+#include "codecs/stream.h"
+#include "codecs/tiff_handle.h"
+#include "failure.h"
+
+namespace picturezor::cli {
+
+namespace {
+
+constexpr double CentimetresOfInch = 2.54;
+
+/// The most pixels that a byte of the file can stand for. Fax codes have a bit for a whole row.
+double MostPixelsPerByte(std::uint16_t compression, std::int64_t width, double bits) {
+  switch (compression) {
+    case COMPRESSION_NONE: return 8 / bits;
+    case COMPRESSION_PACKBITS: return 64 * 8 / bits;
+    case COMPRESSION_ADOBE_DEFLATE:
+    case COMPRESSION_DEFLATE: return 1032 * 8 / bits;
+    case COMPRESSION_LZW: return 4096 * 8 / bits;
+    case COMPRESSION_JPEG: return 512;
+    default: return std::max<double>(double(width) * 8, 65536);
+  }
+}
+
+/// How the samples of a file lie, and where rows come from.
+struct Layout {
+  std::int64_t Width = 0, Height = 0;
+  std::uint16_t Bits = 1, Samples = 1, Photometric = 0, Compression = 0;
+  bool Planar = false, Tiled = false, Associated = false;
+  int Colours = 0;
+  /// The sample that is alpha, or -1.
+  int AlphaAt = -1;
+  /// Samples that stand side by side.
+  int Interleaved() const { return Planar ? 1 : Samples; }
+  int Planes() const { return Planar ? Samples : 1; }
+  std::size_t RowBytes(std::int64_t pixels) const {
+    return std::size_t((pixels * Interleaved() * Bits + 7) / 8);
+  }
+};
+
+/// Gives the decoded rows of one plane in order, packed as in the file, 16-bit samples in the machine's
+/// order.
+class PlaneSource {
+ public:
+  virtual ~PlaneSource() = default;
+  virtual const std::uint8_t* Row(std::int64_t y) = 0;
+};
+
+/// Strips of any compression. libtiff holds one strip as it is compressed.
+class DecodedStrips : public PlaneSource {
+ public:
+  DecodedStrips(const std::filesystem::path& file, int plane, std::int64_t memoryLimit)
+      : File(TIFFHandle::Open(file, memoryLimit)), Plane(std::uint16_t(plane)) {
+    if (File->Get<std::uint16_t>(TIFFTAG_COMPRESSION, 1) == COMPRESSION_JPEG)
+      File->Set(TIFFTAG_JPEGCOLORMODE, JPEGCOLORMODE_RGB);
+    File->ReadingPixels();
+    Line.resize(std::size_t(TIFFScanlineSize64(*File)));
+  }
+
+  const std::uint8_t* Row(std::int64_t y) override {
+    File->Check(TIFFReadScanline(*File, Line.data(), std::uint32_t(y), Plane) == 1);
+    return Line.data();
+  }
+
+ private:
+  std::unique_ptr<TIFFHandle> File;
+  std::uint16_t Plane;
+  Bytes Line;
+};
+
+/// Strips without compression are read row by row, however large they are.
+class PlainStrips : public PlaneSource {
+ public:
+  PlainStrips(const std::filesystem::path& path, const TIFFHandle& file, const Layout& layout, int plane)
+      : Path(path), File(OpenForReading(path)), Header(file), Of(layout) {
+    RowsPerStrip =
+        std::min<std::int64_t>(file.Get<std::uint32_t>(TIFFTAG_ROWSPERSTRIP, UINT32_MAX), layout.Height);
+    FirstStrip = plane * ((layout.Height + RowsPerStrip - 1) / RowsPerStrip);
+    Line.resize(layout.RowBytes(layout.Width));
+    Reversed = file.Get<std::uint16_t>(TIFFTAG_FILLORDER, FILLORDER_MSB2LSB) == FILLORDER_LSB2MSB;
+  }
+
+  const std::uint8_t* Row(std::int64_t y) override {
+    const auto strip = std::uint32_t(FirstStrip + y / RowsPerStrip);
+    const std::uint64_t at = std::uint64_t(y % RowsPerStrip) * Line.size();
+    const std::uint64_t start = TIFFGetStrileOffset(Header, strip);
+    const std::uint64_t size = TIFFGetStrileByteCount(Header, strip);
+    Header.Check();
+    if (at + Line.size() > size || start > std::uint64_t(SizeOf(File)))
+      throw Failure(Path, "corrupt TIFF: a strip is too short for its rows");
+    for (std::size_t done = 0; done < Line.size();) {
+      const ssize_t got =
+          pread(fileno(File.get()), Line.data() + done, Line.size() - done, off_t(start + at + done));
+      if (got < 0) throw Failure(Path, std::strerror(errno));
+      if (got == 0) throw Failure(Path, "the TIFF file is cut off");
+      done += std::size_t(got);
+    }
+    if (Reversed && Of.Bits < 16) TIFFReverseBits(Line.data(), tmsize_t(Line.size()));
+    if (Of.Bits == 16 && TIFFIsByteSwapped(Header))
+      TIFFSwabArrayOfShort(reinterpret_cast<std::uint16_t*>(Line.data()), tmsize_t(Line.size() / 2));
+    return Line.data();
+  }
+
+ private:
+  std::filesystem::path Path;
+  Stream File;
+  const TIFFHandle& Header;
+  Layout Of;
+  std::int64_t RowsPerStrip, FirstStrip;
+  Bytes Line;
+  bool Reversed;
+};
+
+/// A row of tiles at a time.
+class TileBand : public PlaneSource {
+ public:
+  TileBand(const std::filesystem::path& path, const Layout& layout, int plane, std::int64_t memoryLimit)
+      : File(TIFFHandle::Open(path, memoryLimit)), Of(layout), Plane(std::uint16_t(plane)) {
+    if (layout.Compression == COMPRESSION_JPEG) File->Set(TIFFTAG_JPEGCOLORMODE, JPEGCOLORMODE_RGB);
+    File->ReadingPixels();
+    TileWidth = File->Get<std::uint32_t>(TIFFTAG_TILEWIDTH, 0);
+    TileHeight = File->Get<std::uint32_t>(TIFFTAG_TILELENGTH, 0);
+    if (TileWidth < 1 || TileHeight < 1 || layout.Bits * layout.Interleaved() * TileWidth % 8 != 0)
+      throw Failure(path, "corrupt TIFF: tiles of a size that can't be");
+    TileRow = layout.RowBytes(TileWidth);
+    Across = (layout.Width + TileWidth - 1) / TileWidth;
+    // Short pictures don't fill their tiles.
+    const std::int64_t rows = std::min(TileHeight, layout.Height);
+    RequireWithinLimit(path, std::int64_t(TileRow) * (Across * rows + TileHeight), memoryLimit,
+                       "a TIFF with tiles of this size");
+    BandRow = TileRow * std::size_t(Across);
+    Band.resize(BandRow * std::size_t(rows));
+    Tile.resize(std::size_t(TIFFTileSize64(*File)));
+    if (Tile.size() < TileRow * std::size_t(TileHeight))
+      throw Failure(path, "corrupt TIFF: tiles of a size that can't be");
+  }
+
+  const std::uint8_t* Row(std::int64_t y) override {
+    if (y % TileHeight == 0) Fill(y);
+    return Band.data() + BandRow * std::size_t(y % TileHeight);
+  }
+
+ private:
+  void Fill(std::int64_t y) {
+    const std::int64_t rows = std::min(TileHeight, Of.Height - y);
+    for (std::int64_t across = 0; across < Across; ++across) {
+      const std::uint32_t tile =
+          TIFFComputeTile(*File, std::uint32_t(across * TileWidth), std::uint32_t(y), 0, Plane);
+      const tmsize_t got = TIFFReadEncodedTile(*File, tile, Tile.data(), tmsize_t(Tile.size()));
+      File->Check(got == tmsize_t(Tile.size()));
+      for (std::int64_t row = 0; row < rows; ++row)
+        std::memcpy(Band.data() + BandRow * std::size_t(row) + TileRow * std::size_t(across),
+                    Tile.data() + TileRow * std::size_t(row), TileRow);
+    }
+  }
+
+  std::unique_ptr<TIFFHandle> File;
+  Layout Of;
+  std::uint16_t Plane;
+  std::int64_t TileWidth, TileHeight, Across = 0;
+  std::size_t TileRow = 0, BandRow = 0;
+  Bytes Band, Tile;
+};
+
+class TIFFReader : public ImageReader {
+ public:
+  TIFFReader(const std::filesystem::path& file, std::int64_t memoryLimit)
+      : Path(file), File(TIFFHandle::Open(file, memoryLimit)) {
+    const std::int64_t fileSize = SizeOf(OpenForReading(file));
+    RequireWholeDirectory(fileSize);
+    ReadLayout();
+    RequirePlausible(file, Of.Width, Of.Height, fileSize,
+                     MostPixelsPerByte(Of.Compression, Of.Width, double(Of.Bits) * Of.Samples));
+    About.Width = std::int32_t(Of.Width);
+    About.Height = std::int32_t(Of.Height);
+    About.Bits = Of.Bits;
+    if (Of.Bits == 16) About.Notes.push_back("16 bits a sample reduced to 8");
+    ReadExtras();
+    for (int plane = 0; plane < Of.Planes(); ++plane) {
+      // Samples that nobody asks for need no rows.
+      if (Of.Planar && plane >= Of.Colours && plane != Of.AlphaAt)
+        Sources.emplace_back();
+      else if (Of.Tiled)
+        Sources.push_back(std::make_unique<TileBand>(file, Of, plane, memoryLimit));
+      else if (Of.Compression == COMPRESSION_NONE)
+        Sources.push_back(std::make_unique<PlainStrips>(file, *File, Of, plane));
+      else
+        Sources.push_back(std::make_unique<DecodedStrips>(file, plane, memoryLimit));
+    }
+    Lines.resize(Sources.size());
+  }
+
+  FileType Type() const override { return FileType::TIFF; }
+
+  void ReadRow(std::uint8_t* row) override {
+    for (std::size_t i = 0; i < Sources.size(); ++i)
+      if (Sources[i]) Lines[i] = Sources[i]->Row(NextRow);
+    ++NextRow;
+    const int channels = ChannelsOf(About.Pixels);
+    if (Of.Photometric == PHOTOMETRIC_PALETTE) {
+      for (std::int64_t x = 0; x < Of.Width; ++x)
+        std::memcpy(row + x * channels, Palette[Raw(x, 0) & 255].data(), 3);
+    } else {
+      for (int c = 0; c < Of.Colours; ++c) CopySamples(row + c, channels, c);
+      if (Of.Photometric == PHOTOMETRIC_MINISWHITE)
+        for (std::int64_t x = 0; x < Of.Width; ++x) row[x * channels] = std::uint8_t(255 - row[x * channels]);
+    }
+    if (Of.AlphaAt >= 0) CopySamples(row + channels - 1, channels, Of.AlphaAt);
+    if (Of.Associated) Divide(row, channels);
+  }
+
+  /// libtiff has read all that belongs to the picture.
+  void Finish() override {}
+
+ private:
+  /// libtiff overlooks a cut in the last bytes of a directory.
+  void RequireWholeDirectory(std::int64_t fileSize) const {
+    const std::uint64_t at = TIFFCurrentDirOffset(*File);
+    const bool big = TIFFIsBigTIFF(*File), bigEnd = TIFFIsBigEndian(*File);
+    std::uint8_t count[8] = {};
+    const std::size_t size = big ? 8 : 2;
+    const Stream stream = OpenForReading(Path);
+    if (pread(fileno(stream.get()), count, size, off_t(at)) != ssize_t(size))
+      throw Failure(Path, "the TIFF file is cut off");
+    std::uint64_t entries = 0;
+    for (std::size_t i = 0; i < size; ++i) entries = entries << 8 | count[bigEnd ? i : size - 1 - i];
+    if (at + size + entries * (big ? 20 : 12) + (big ? 8 : 4) > std::uint64_t(fileSize))
+      throw Failure(Path, "the TIFF file is cut off");
+  }
+
+  void ReadLayout() {
+    Of.Width = File->Get<std::uint32_t>(TIFFTAG_IMAGEWIDTH, 0);
+    Of.Height = File->Get<std::uint32_t>(TIFFTAG_IMAGELENGTH, 0);
+    Of.Bits = File->Get<std::uint16_t>(TIFFTAG_BITSPERSAMPLE, 1);
+    Of.Samples = File->Get<std::uint16_t>(TIFFTAG_SAMPLESPERPIXEL, 1);
+    Of.Compression = File->Get<std::uint16_t>(TIFFTAG_COMPRESSION, COMPRESSION_NONE);
+    Of.Planar = Of.Samples > 1 &&
+                File->Get<std::uint16_t>(TIFFTAG_PLANARCONFIG, PLANARCONFIG_CONTIG) == PLANARCONFIG_SEPARATE;
+    Of.Tiled = TIFFIsTiled(*File);
+    if (!TIFFGetField(*File, TIFFTAG_PHOTOMETRIC, &Of.Photometric))
+      Of.Photometric = Of.Samples >= 3 ? PHOTOMETRIC_RGB : PHOTOMETRIC_MINISBLACK;
+    const auto refuse = [&](const std::string& what) { throw Failure(Path, what + " aren't supported"); };
+    if (!TIFFIsCODECConfigured(Of.Compression))
+      refuse("TIFF files with compression " + std::to_string(Of.Compression));
+    const auto kind = File->Get<std::uint16_t>(TIFFTAG_SAMPLEFORMAT, SAMPLEFORMAT_UINT);
+    if (kind != SAMPLEFORMAT_UINT && kind != SAMPLEFORMAT_VOID)
+      refuse("TIFF samples that are signed or floating-point");
+    if (Of.Bits != 1 && Of.Bits != 2 && Of.Bits != 4 && Of.Bits != 8 && Of.Bits != 16)
+      refuse("TIFF samples of " + std::to_string(Of.Bits) + " bits");
+    switch (Of.Photometric) {
+      case PHOTOMETRIC_MINISWHITE:
+      case PHOTOMETRIC_MINISBLACK:
+        About.Pixels = Format::G;
+        Of.Colours = 1;
+        break;
+      case PHOTOMETRIC_PALETTE:
+        About.Pixels = Format::RGB;
+        Of.Colours = 1;
+        ReadPalette();
+        break;
+      case PHOTOMETRIC_YCBCR:
+        if (Of.Compression != COMPRESSION_JPEG) refuse("TIFF files in YCbCr without JPEG compression");
+        [[fallthrough]];
+      case PHOTOMETRIC_RGB:
+        About.Pixels = Format::RGB;
+        Of.Colours = 3;
+        break;
+      case PHOTOMETRIC_SEPARATED:
+        if (File->Get<std::uint16_t>(TIFFTAG_INKSET, INKSET_CMYK) != INKSET_CMYK)
+          refuse("TIFF files with other inks than CMYK");
+        About.Pixels = Format::CMYK;
+        Of.Colours = 4;
+        break;
+      default: refuse("TIFF files with colours of kind " + std::to_string(Of.Photometric));
+    }
+    if (Of.Samples < Of.Colours) throw Failure(Path, "corrupt TIFF: too few samples a pixel");
+    std::uint16_t count = 0, *kinds = nullptr;
+    if (TIFFGetFieldDefaulted(*File, TIFFTAG_EXTRASAMPLES, &count, &kinds) && count > 0 &&
+        Of.Samples > Of.Colours && Of.Photometric != PHOTOMETRIC_PALETTE &&
+        (kinds[0] == EXTRASAMPLE_ASSOCALPHA || kinds[0] == EXTRASAMPLE_UNASSALPHA)) {
+      Of.AlphaAt = Of.Colours;
+      Of.Associated = kinds[0] == EXTRASAMPLE_ASSOCALPHA;
+      About.Pixels = WithAlpha(About.Pixels);
+    }
+    const int left = Of.Samples - Of.Colours - (Of.AlphaAt >= 0);
+    if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples a pixel left out");
+    if (!TIFFLastDirectory(*File)) About.Notes.push_back("only the first image of the file is used");
+    File->Check();
+  }
+
+  void ReadPalette() {
+    std::uint16_t* maps[3] = {};
+    if (Of.Bits > 8 || !TIFFGetField(*File, TIFFTAG_COLORMAP, &maps[0], &maps[1], &maps[2]))
+      throw Failure(Path, "corrupt TIFF: no palette");
+    // Some programs fill the map with 8-bit numbers.
+    bool wide = false;
+    const int colours = 1 << Of.Bits;
+    for (const auto* map : maps)
+      for (int i = 0; i < colours; ++i) wide |= map[i] > 255;
+    Palette.resize(256);
+    for (int i = 0; i < colours; ++i)
+      for (int c = 0; c < 3; ++c) Palette[i][c] = std::uint8_t(wide ? maps[c][i] >> 8 : maps[c][i]);
+  }
+
+  void ReadExtras() {
+    About.Orientation = File->Get<std::uint16_t>(TIFFTAG_ORIENTATION, ORIENTATION_TOPLEFT);
+    if (About.Orientation < 1 || About.Orientation > 8) About.Orientation = 1;
+    float x = 0, y = 0;
+    const auto unit = File->Get<std::uint16_t>(TIFFTAG_RESOLUTIONUNIT, RESUNIT_INCH);
+    if (unit != RESUNIT_NONE && TIFFGetField(*File, TIFFTAG_XRESOLUTION, &x) &&
+        TIFFGetField(*File, TIFFTAG_YRESOLUTION, &y) && x > 0 && y > 0) {
+      const double inches = unit == RESUNIT_CENTIMETER ? CentimetresOfInch : 1;
+      About.Density = {x * inches, y * inches};
+    }
+    std::uint32_t size = 0;
+    const std::uint8_t* profile = nullptr;
+    if (TIFFGetField(*File, TIFFTAG_ICCPROFILE, &size, &profile))
+      About.Profile.assign(profile, profile + size);
+    File->Check();
+  }
+
+  /// A sample as it stands in the file; `sample` counts within what is interleaved.
+  int Raw(std::int64_t x, int sample) const {
+    const std::uint8_t* line = Lines[Of.Planar ? std::size_t(sample) : 0];
+    const std::int64_t at = Of.Planar ? x : x * Of.Samples + sample;
+    if (Of.Bits == 8) return line[at];
+    if (Of.Bits == 16) {
+      std::uint16_t value;
+      std::memcpy(&value, line + 2 * at, 2);
+      return value;
+    }
+    const std::int64_t bit = at * Of.Bits;
+    return line[bit / 8] >> (8 - Of.Bits - bit % 8) & ((1 << Of.Bits) - 1);
+  }
+
+  void CopySamples(std::uint8_t* out, int step, int sample) const {
+    const int most = (1 << Of.Bits) - 1;
+    if (Of.Bits == 8)
+      for (std::int64_t x = 0; x < Of.Width; ++x) out[x * step] = std::uint8_t(Raw(x, sample));
+    else if (Of.Bits == 16)
+      for (std::int64_t x = 0; x < Of.Width; ++x)
+        out[x * step] = std::uint8_t((Raw(x, sample) * 255u + 32895u) >> 16);
+    else
+      for (std::int64_t x = 0; x < Of.Width; ++x) out[x * step] = std::uint8_t(Raw(x, sample) * 255 / most);
+  }
+
+  /// Takes the alpha out of colours that have been multiplied by it.
+  void Divide(std::uint8_t* row, int channels) const {
+    for (std::int64_t x = 0; x < Of.Width; ++x, row += channels) {
+      const int alpha = row[channels - 1];
+      for (int c = 0; c < channels - 1; ++c)
+        row[c] = std::uint8_t(alpha ? std::min(255, (row[c] * 255 + alpha / 2) / alpha) : 0);
+    }
+  }
+
+  std::filesystem::path Path;
+  std::unique_ptr<TIFFHandle> File;
+  Layout Of;
+  std::vector<std::array<std::uint8_t, 3>> Palette;
+  std::vector<std::unique_ptr<PlaneSource>> Sources;
+  std::vector<const std::uint8_t*> Lines;
+  std::int64_t NextRow = 0;
+};
+
+class TIFFWriter : public ImageWriter {
+ public:
+  TIFFWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info) {
+    const int channels = ChannelsOf(info.Pixels);
+    const bool alpha = HasAlpha(info.Pixels);
+    // LZW makes noise longer by half at most.
+    const double worst = 1.5 * info.Width * double(info.Height) * channels;
+    File = TIFFHandle::Create(descriptor, target, worst > 4e9);
+    const Format colour = WithoutAlpha(info.Pixels);
+    File->Set(TIFFTAG_IMAGEWIDTH, std::uint32_t(info.Width));
+    File->Set(TIFFTAG_IMAGELENGTH, std::uint32_t(info.Height));
+    File->Set(TIFFTAG_BITSPERSAMPLE, 8);
+    File->Set(TIFFTAG_SAMPLESPERPIXEL, channels);
+    File->Set(TIFFTAG_PHOTOMETRIC, colour == Format::G     ? PHOTOMETRIC_MINISBLACK
+                                   : colour == Format::RGB ? PHOTOMETRIC_RGB
+                                                           : PHOTOMETRIC_SEPARATED);
+    File->Set(TIFFTAG_PLANARCONFIG, PLANARCONFIG_CONTIG);
+    File->Set(TIFFTAG_ORIENTATION, ORIENTATION_TOPLEFT);
+    File->Set(TIFFTAG_COMPRESSION, COMPRESSION_LZW);
+    File->Set(TIFFTAG_PREDICTOR, PREDICTOR_HORIZONTAL);
+    if (alpha) {
+      std::uint16_t kind = EXTRASAMPLE_UNASSALPHA;
+      File->Set(TIFFTAG_EXTRASAMPLES, 1, &kind);
+    }
+    if (info.Density) {
+      File->Set(TIFFTAG_XRESOLUTION, info.Density->X);
+      File->Set(TIFFTAG_YRESOLUTION, info.Density->Y);
+      File->Set(TIFFTAG_RESOLUTIONUNIT, RESUNIT_INCH);
+    }
+    if (!info.Profile.empty())
+      File->Set(TIFFTAG_ICCPROFILE, std::uint32_t(info.Profile.size()), info.Profile.data());
+    // About 64 KB a strip.
+    const std::int64_t rows = std::max<std::int64_t>(1, 65536 / (std::int64_t{info.Width} * channels));
+    File->Set(TIFFTAG_ROWSPERSTRIP, std::uint32_t(std::min<std::int64_t>(rows, info.Height)));
+    // The predictor works in the row that it is given.
+    Line.resize(std::size_t(info.Width) * std::size_t(channels));
+  }
+
+  void WriteRow(const std::uint8_t* row) override {
+    std::memcpy(Line.data(), row, Line.size());
+    errno = 0;
+    File->Check(TIFFWriteScanline(*File, Line.data(), NextRow++, 0) == 1);
+  }
+
+  void Finish() override {
+    errno = 0;
+    File->Check(TIFFFlush(*File) == 1);
+    File->Close();
+    File->Check();
+  }
+
+ private:
+  std::unique_ptr<TIFFHandle> File;
+  Bytes Line;
+  std::uint32_t NextRow = 0;
+};
+
+}
+
+std::unique_ptr<ImageReader> OpenTIFF(const std::filesystem::path& file, std::int64_t memoryLimit) {
+  return std::make_unique<TIFFReader>(file, memoryLimit);
+}
+
+std::unique_ptr<ImageWriter> CreateTIFF(int descriptor, const std::filesystem::path& target,
+                                        const ImageInfo& info) {
+  return std::make_unique<TIFFWriter>(descriptor, target, info);
+}
+
+}

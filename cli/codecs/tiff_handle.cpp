@@ -1,0 +1,91 @@
+#include "codecs/tiff_handle.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+
+#include "failure.h"
+
+namespace picturezor::cli {
+
+namespace {
+
+std::string Printed(const char* format, va_list arguments) {
+  char text[512];
+  std::vsnprintf(text, sizeof text, format, arguments);
+  std::string line = text;
+  std::ranges::replace(line, '\n', ' ');
+  return line;
+}
+
+}
+
+int TIFFHandle::OnError(TIFF*, void* user, const char*, const char* format, va_list arguments) {
+  auto& self = *static_cast<TIFFHandle*>(user);
+  if (!self.Report.empty()) return 1;
+  self.SystemError = errno;
+  self.Report = Printed(format, arguments);
+  return 1;
+}
+
+int TIFFHandle::OnWarning(TIFF* file, void* user, const char* module, const char* format, va_list arguments) {
+  auto& self = *static_cast<TIFFHandle*>(user);
+  va_list copy;
+  va_copy(copy, arguments);
+  const std::string text = Printed(format, copy);
+  va_end(copy);
+  // An entry whose values lie beyond the end of the file is only left out otherwise.
+  if (self.Strict || text.find("IO error") != std::string::npos)
+    return OnError(file, user, module, format, arguments);
+  return 1;
+}
+
+std::unique_ptr<TIFFHandle> TIFFHandle::Open(const std::filesystem::path& file, std::int64_t memoryLimit) {
+  std::unique_ptr<TIFFHandle> handle(new TIFFHandle(file));
+  TIFFOpenOptions* options = TIFFOpenOptionsAlloc();
+  // Directories and tables of strips need some room however small the limit is.
+  TIFFOpenOptionsSetMaxSingleMemAlloc(options, std::max<std::int64_t>(memoryLimit, 64 << 20));
+  TIFFOpenOptionsSetErrorHandlerExtR(options, OnError, handle.get());
+  TIFFOpenOptionsSetWarningHandlerExtR(options, OnWarning, handle.get());
+  // Not mapped: the pages would count as memory in use.
+  handle->File = TIFFOpenExt(file.c_str(), "rm", options);
+  TIFFOpenOptionsFree(options);
+  handle->Check(handle->File);
+  return handle;
+}
+
+std::unique_ptr<TIFFHandle> TIFFHandle::Create(int descriptor, const std::filesystem::path& target,
+                                               bool big) {
+  std::unique_ptr<TIFFHandle> handle(new TIFFHandle(target));
+  handle->Writing = true;
+  const int copy = fcntl(descriptor, F_DUPFD_CLOEXEC, 0);
+  if (copy < 0) throw Failure(target, std::strerror(errno));
+  TIFFOpenOptions* options = TIFFOpenOptionsAlloc();
+  TIFFOpenOptionsSetErrorHandlerExtR(options, OnError, handle.get());
+  TIFFOpenOptionsSetWarningHandlerExtR(options, OnWarning, handle.get());
+  errno = 0;
+  handle->File = TIFFFdOpenExt(copy, target.c_str(), big ? "w8" : "w", options);
+  TIFFOpenOptionsFree(options);
+  if (!handle->File) close(copy);
+  handle->Check(handle->File);
+  return handle;
+}
+
+void TIFFHandle::Check(bool good) const {
+  if (good && Report.empty()) return;
+  if (Writing) throw Failure(Path, SystemError ? std::strerror(SystemError) : Report);
+  throw Failure(Path, "corrupt TIFF: " + (Report.empty() ? "it can't be read" : Report));
+}
+
+void TIFFHandle::Close() {
+  if (!File) return;
+  errno = 0;
+  TIFFClose(File);
+  File = nullptr;
+}
+
+}

@@ -1,0 +1,124 @@
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <cmath>
+#include <map>
+
+#include "failure.h"
+#include "picturezor/host.h"
+#include "session.h"
+
+namespace picturezor::cli {
+
+namespace {
+
+struct ScaleOptions {
+  std::filesystem::path In, Out;
+  std::int64_t Width = 0, Height = 0;
+  std::string Fit;
+  double Percent = 0;
+  std::string KernelName = "lanczos3";
+};
+
+const std::map<std::string, Kernel> Kernels{{"triangle", Kernel::Triangle}, {"box", Kernel::Box},
+                                            {"lanczos3", Kernel::Lanczos3}, {"lanczos8", Kernel::Lanczos8},
+                                            {"mitchell", Kernel::Mitchell}, {"poly3", Kernel::Poly3},
+                                            {"cubic", Kernel::Cubic}};
+
+/// The size asked for; a side that isn't given follows the other.
+PictureSize ResultSize(const ScaleOptions& options, const ImageInfo& source, Format format) {
+  double width = double(options.Width), height = double(options.Height);
+  if (!options.Fit.empty()) {
+    const auto box = ParseNumbers("--fit", options.Fit, 'x', 2);
+    if (box[0] < 1 || box[1] < 1) throw UsageFailure("--fit: " + options.Fit + ": a size is 1 or more");
+    const double factor = std::min(double(box[0]) / source.Width, double(box[1]) / source.Height);
+    width = source.Width * factor;
+    height = source.Height * factor;
+  } else if (options.Percent > 0) {
+    width = source.Width * options.Percent / 100;
+    height = source.Height * options.Percent / 100;
+  } else if (options.Height == 0) {
+    height = width * source.Height / source.Width;
+  } else if (options.Width == 0) {
+    width = height * source.Width / source.Height;
+  }
+  constexpr double most = 4e8;
+  if (width > most || height > most) throw UsageFailure("the size asked for is too large");
+  return {std::max(1, int(std::lround(width))), std::max(1, int(std::lround(height))), format};
+}
+
+/// What `Scale` keeps between its passes.
+Format TempFormat(Format source, Format dest) {
+  const bool alpha = HasAlpha(source) && HasAlpha(dest);
+  switch (WithoutAlpha(dest)) {
+    case Format::G: return alpha ? Format::Scaling2 : Format::Scaling1;
+    case Format::CMYK: return alpha ? Format::Scaling5 : Format::Scaling4;
+    default: return Format::Scaling4;
+  }
+}
+
+int Scale(Session& session, const ScaleOptions& options) {
+  if (options.Width == 0 && options.Height == 0 && options.Fit.empty() && options.Percent == 0)
+    throw UsageFailure("scale: give --width, --height, --fit or --percent");
+  Target target(options.Out);
+  OpenedImage source(session, options.In);
+  const Format format = target.Storable(session, source.Upright.Pixels);
+  const PictureSize size = ResultSize(options, source.Upright, format);
+  target.Start(size.Width, size.Height);
+  const PictureSize temp{size.Width, source.Upright.Height, TempFormat(source.Upright.Pixels, format)};
+  auto pictures = MakePictures(session.Stores, {source.Size(), size, temp});
+  source.ReadInto(session, pictures[0]);
+  session.Bar.Begin("scaling");
+  if (session.Bar.Shown()) {
+    Host::OnYield([&session] { session.Bar.Tick(); });
+    pictures[1].SetYieldTicks(6);
+  }
+  const bool scaled =
+      pictures[1].Scale(pictures[0], pictures[2], Kernels.at(options.KernelName), size.Width, size.Height);
+  Host::OnYield({});
+  if (!scaled) throw Failure(options.In, "it can't be scaled");
+  pictures[0] = pictures[2] = Picture();
+  target.Write(session, pictures[1], format, source.Upright);
+  return Done;
+}
+
+}
+
+void AddScale(CLI::App& app, Session& session) {
+  CLI::App* command = app.add_subcommand("scale", "Scale an image");
+  command->footer(
+      "Examples:\n"
+      "  picturezor scale photo.jpg --width 800 -o small.jpg\n"
+      "  picturezor scale photo.png --fit 1920x1080 --kernel mitchell -o screen.png\n"
+      "  picturezor scale map.tif --percent 12.5 --memory-limit 256M -o overview.tif");
+  auto options = std::make_shared<ScaleOptions>();
+  command->add_option("IN", options->In, "Image to read: PNG, JPEG or TIFF")->required()->type_name("");
+  command->add_option("-o,--output", options->Out, "Image to write; the name's ending says its type")
+      ->required()
+      ->type_name("OUT");
+  const auto size = CLI::Range(std::int64_t{1}, std::int64_t{400'000'000});
+  CLI::Option* width =
+      command->add_option("--width", options->Width, "Columns; without --height it follows")->check(size);
+  CLI::Option* height =
+      command->add_option("--height", options->Height, "Rows; without --width it follows")->check(size);
+  CLI::Option* fit =
+      command->add_option("--fit", options->Fit, "The largest size within this, as 1920x1080; enlarges too")
+          ->type_name("WxH");
+  CLI::Option* percent =
+      command->add_option("--percent", options->Percent, "Of both sides")->check(CLI::Range(1e-6, 1e9));
+  width->type_name("N");
+  height->type_name("N");
+  percent->type_name("P");
+  fit->excludes(width)->excludes(height)->excludes(percent);
+  percent->excludes(width)->excludes(height);
+  command
+      ->add_option("--kernel", options->KernelName,
+                   "triangle, box, lanczos3 (default), lanczos8, mitchell, poly3 or cubic")
+      ->type_name("NAME")
+      ->check(CLI::IsMember(Kernels));
+  AddQualityOption(*command, session);
+  AddStoreOptions(*command, session);
+  command->callback(
+      [&session, options] { session.Work = [&session, options] { return Scale(session, *options); }; });
+}
+
+}

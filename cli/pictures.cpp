@@ -1,0 +1,244 @@
+#include "pictures.h"
+
+#include <fcntl.h>
+#include <sys/statvfs.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdlib>
+#include <cstring>
+#include <fstream>
+#include <numeric>
+
+#include "failure.h"
+#include "temporary_files.h"
+
+namespace picturezor::cli {
+
+namespace {
+
+std::int64_t FreeMemory() {
+  std::ifstream file("/proc/meminfo");
+  for (std::string name; file >> name;) {
+    std::int64_t kilobytes = 0;
+    if (name == "MemAvailable:" && file >> kilobytes) return kilobytes * 1024;
+    file.ignore(256, '\n');
+  }
+  return std::int64_t{sysconf(_SC_PHYS_PAGES)} * sysconf(_SC_PAGESIZE) / 2;
+}
+
+std::string Megabytes(std::int64_t bytes) { return std::to_string((bytes + (1 << 20) - 1) >> 20) + " MB"; }
+
+std::string SizeText(const PictureSize& size) {
+  return std::to_string(size.Width) + " x " + std::to_string(size.Height) + " pixels";
+}
+
+/// Bytes in memory, whatever the size.
+std::int64_t MemoryOf(const PictureSize& size) {
+  return (std::int64_t{size.Width} * BytesPerPixel(size.Of) + 63) / 64 * 64 * size.Height;
+}
+
+/// Takes the room on the disk now, so that a full disk shows here and not in the middle of the work.
+void Reserve(const std::filesystem::path& file, std::int64_t bytes, const std::filesystem::path& directory) {
+  const int descriptor = open(file.c_str(), O_WRONLY | O_CLOEXEC);
+  if (descriptor < 0) throw Failure(directory, std::strerror(errno));
+  const bool reserved = fallocate(descriptor, 0, 0, bytes) == 0;
+  const int reason = errno;
+  close(descriptor);
+  if (!reserved && reason != EOPNOTSUPP)
+    throw Failure(directory, std::string("no room for a temporary file of ") + Megabytes(bytes) + ": " +
+                                 std::strerror(reason));
+}
+
+Picture MakeMapped(const PictureSize& size, const std::filesystem::path& directory) {
+  const std::int64_t page = std::max<std::int64_t>(sysconf(_SC_PAGESIZE), 4096);
+  const std::int64_t row = (std::int64_t{size.Width} * BytesPerPixel(size.Of) + page - 1) / page * page;
+  const std::int64_t bytes = row * size.Height + page;
+  struct statvfs disk {};
+  if (statvfs(directory.c_str(), &disk) != 0)
+    throw Failure(directory, std::string("no temporary file can be made there: ") + std::strerror(errno));
+  const auto free = std::int64_t(disk.f_bavail) * std::int64_t(disk.f_frsize);
+  if (bytes > free)
+    throw Failure(directory, SizeText(size) + " need a temporary file of " + Megabytes(bytes) +
+                                 ", but only " + Megabytes(free) +
+                                 " are free; --temp-dir names another place");
+  const PrivateDirectory own(directory);
+  const std::filesystem::path file = own.Path() / "pixels";
+  RemoveOnDeath(file);
+  const struct Unlink {
+    const std::filesystem::path& File;
+    ~Unlink() {
+      unlink(File.c_str());
+      KeepOnDeath(File);
+    }
+  } nameless{file};
+  Picture picture = Picture::Mapped(file, size.Width, size.Height, size.Of);
+  if (!picture.Valid())
+    throw Failure(directory, "no temporary file of " + Megabytes(bytes) + " can be made there");
+  Reserve(file, bytes, directory);
+  return picture;
+}
+
+Picture MakeInMemory(const PictureSize& size) {
+  Picture picture(size.Width, size.Height, size.Of);
+  if (!picture.Valid()) throw Failure("not enough memory for " + SizeText(size));
+  return picture;
+}
+
+std::uint8_t* RowOf(const Picture& picture, std::int32_t y) {
+  const MemoryBlock row = picture.RawRow(y);
+  if (!row) throw Failure("a row of a picture can't be reached");
+  return row.Start();
+}
+
+/// A pixel as one value, so that copying it is one move where the size allows.
+template <int N>
+struct Pixel {
+  std::uint8_t Samples[N];
+};
+
+/// Orientations that exchange rows and columns. A band of rows is read, then its columns go to the rows of
+/// the picture, from the top down, so that a mapped picture's window moves through it once a band.
+template <int N>
+void ReadTurned(const Picture& picture, ImageReader& reader, Progress& progress) {
+  constexpr std::int64_t bandBytes = 64 << 20, block = 16;
+  const ImageInfo& info = reader.Info();
+  const std::int64_t width = info.Width, height = info.Height;
+  const bool fromBottom = info.Orientation == 7 || info.Orientation == 8;
+  const bool fromRight = info.Orientation == 6 || info.Orientation == 7;
+  const std::int64_t most = std::clamp<std::int64_t>(bandBytes / (width * N), 1, height);
+  std::vector<Pixel<N>> band(std::size_t(most * width)), turned(std::size_t(block * most));
+  for (std::int64_t first = 0; first < height; first += most) {
+    const std::int64_t rows = std::min(most, height - first);
+    for (std::int64_t y = 0; y < rows; ++y, progress.Step())
+      reader.ReadRow(band[std::size_t(y * width)].Samples);
+    const std::int64_t at = fromRight ? height - first - rows : first;
+    for (std::int64_t top = 0; top < width; top += block) {
+      const std::int64_t count = std::min(block, width - top);
+      for (std::int64_t y = 0; y < rows; ++y) {
+        const Pixel<N>* row = &band[std::size_t(y * width)];
+        Pixel<N>* out = &turned[std::size_t(fromRight ? rows - 1 - y : y)];
+        for (std::int64_t i = 0; i < count; ++i)
+          out[i * most] = row[fromBottom ? width - 1 - top - i : top + i];
+      }
+      for (std::int64_t i = 0; i < count; ++i)
+        std::memcpy(RowOf(picture, std::int32_t(top + i)) + at * N, &turned[std::size_t(i * most)],
+                    std::size_t(rows) * N);
+    }
+  }
+}
+
+template <int N>
+void ReadUpright(const Picture& picture, ImageReader& reader, Progress& progress) {
+  const ImageInfo& info = reader.Info();
+  const bool mirrored = info.Orientation == 2 || info.Orientation == 3;
+  const bool fromBottom = info.Orientation == 3 || info.Orientation == 4;
+  for (std::int32_t y = 0; y < info.Height; ++y, progress.Step()) {
+    std::uint8_t* row = RowOf(picture, fromBottom ? info.Height - 1 - y : y);
+    reader.ReadRow(row);
+    auto* pixels = reinterpret_cast<Pixel<N>*>(row);
+    if (mirrored) std::reverse(pixels, pixels + info.Width);
+  }
+}
+
+}
+
+std::int64_t DefaultMemoryLimit() { return FreeMemory() / 2; }
+
+std::filesystem::path DefaultTempDirectory() {
+  const char* named = std::getenv("TMPDIR");
+  return named && *named ? named : "/var/tmp";
+}
+
+std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector<PictureSize>& sizes) {
+  // The module keeps pictures in memory below this, and needs this many rows for a mapped one.
+  constexpr std::int64_t mostInMemory = std::int64_t{1} << 31;
+  constexpr std::int32_t fewestMapped = 5;
+  std::vector<std::size_t> order(sizes.size());
+  std::iota(order.begin(), order.end(), 0);
+  std::ranges::stable_sort(order, {}, [&](std::size_t i) { return MemoryOf(sizes[i]); });
+  std::vector<Picture> pictures(sizes.size());
+  std::int64_t used = 0;
+  const std::int64_t free = FreeMemory();
+  for (const std::size_t i : order) {
+    const PictureSize& size = sizes[i];
+    const std::int64_t bytes = MemoryOf(size);
+    const bool fits = options.Kind != Store::Mapped && bytes < mostInMemory &&
+                      (options.Kind == Store::Memory || used + bytes <= options.MemoryLimit);
+    if (fits || size.Height < fewestMapped) {
+      used += bytes;
+      if (used > free)
+        throw Failure(SizeText(size) + " need " + Megabytes(bytes) + " of memory, more than is free");
+      pictures[i] = MakeInMemory(size);
+    } else if (options.Kind == Store::Memory) {
+      throw Failure(SizeText(size) + " are too many for --store memory, which ends at 2 GB a picture");
+    } else {
+      pictures[i] = MakeMapped(size, options.TempDirectory);
+    }
+  }
+  return pictures;
+}
+
+ImageInfo Upright(const ImageInfo& info) {
+  ImageInfo upright = info;
+  upright.Orientation = 1;
+  if (info.Orientation >= 5) {
+    std::swap(upright.Width, upright.Height);
+    if (upright.Density) std::swap(upright.Density->X, upright.Density->Y);
+  }
+  return upright;
+}
+
+void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress) {
+  const ImageInfo& info = reader.Info();
+  progress.Begin("reading", info.Height);
+  const auto read = [&]<int N>() {
+    if (info.Orientation >= 5)
+      ReadTurned<N>(picture, reader, progress);
+    else
+      ReadUpright<N>(picture, reader, progress);
+  };
+  switch (ChannelsOf(info.Pixels)) {
+    case 1: read.operator()<1>(); break;
+    case 2: read.operator()<2>(); break;
+    case 3: read.operator()<3>(); break;
+    case 4: read.operator()<4>(); break;
+    case 5: read.operator()<5>(); break;
+  }
+  reader.Finish();
+}
+
+bool Convertible(Format from, Format to) {
+  const Format a = WithoutAlpha(from), b = WithoutAlpha(to);
+  return a == b || a == Format::G || b == Format::G;
+}
+
+void WriteFrom(const Picture& picture, ImageWriter& writer, Format format, Progress& progress) {
+  const Format from = picture.ImageFormat();
+  const std::int32_t height = picture.Height();
+  const int channels = ChannelsOf(format);
+  const bool opaque = HasAlpha(format) && !HasAlpha(from);
+  const bool toInk = WithoutAlpha(format) == Format::CMYK && WithoutAlpha(from) == Format::G;
+  const bool ofInk = WithoutAlpha(format) == Format::G && WithoutAlpha(from) == Format::CMYK;
+  progress.Begin("writing", height);
+  for (std::int32_t y = 0; y < height; ++y, progress.Step()) {
+    if (format == from) {
+      writer.WriteRow(RowOf(picture, y));
+      continue;
+    }
+    Bytes row = picture.RowInFormat(y, format);
+    if (row.empty()) throw Failure("a row of a picture can't be converted");
+    for (std::size_t at = 0; at < row.size(); at += std::size_t(channels)) {
+      if (opaque) row[at + std::size_t(channels) - 1] = 255;
+      if (ofInk) row[at] = std::uint8_t(255 - row[at]);
+      if (toInk) {
+        row[at + 3] = std::uint8_t(255 - row[at + 3]);
+        row[at] = row[at + 1] = row[at + 2] = 0;
+      }
+    }
+    writer.WriteRow(row.data());
+  }
+}
+
+}

@@ -1,0 +1,47 @@
+#pragma once
+#include <cstdint>
+#include <filesystem>
+#include <vector>
+
+#include "codecs/image_file.h"
+#include "picturezor/picture.h"
+#include "progress.h"
+
+namespace picturezor::cli {
+
+enum class Store { Auto, Memory, Mapped };
+
+/// Where pictures live.
+struct StoreOptions {
+  Store Kind = Store::Auto;
+  /// Bytes for all pictures of a command together; what doesn't fit goes to temporary files.
+  std::int64_t MemoryLimit = 0;
+  std::filesystem::path TempDirectory;
+};
+
+/// Half of the memory that is free.
+std::int64_t DefaultMemoryLimit();
+/// $TMPDIR, or /var/tmp, which lies on a disk where /tmp may lie in memory.
+std::filesystem::path DefaultTempDirectory();
+
+struct PictureSize {
+  std::int32_t Width = 0, Height = 0;
+  Format Of = Format::Unknown;
+};
+
+/// The pictures that a command needs, zeroed. The smallest go to memory as long as the limit allows. A mapped
+/// one has its room on the disk from the start and its file has no name any more, so nothing can be left
+/// behind. Throws Failure where there is no room.
+std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector<PictureSize>& sizes);
+
+/// What an image file is once its orientation has been applied.
+ImageInfo Upright(const ImageInfo& info);
+/// Reads all rows into a picture of the upright size and the file's format.
+void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress);
+/// Whether `WriteFrom` has a way from a picture's format to a file's.
+bool Convertible(Format from, Format to);
+/// Writes all rows in a format of files. A missing alpha becomes opaque. Gray becomes black ink alone, and
+/// gray comes of black ink alone.
+void WriteFrom(const Picture& picture, ImageWriter& writer, Format format, Progress& progress);
+
+}

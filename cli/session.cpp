@@ -1,0 +1,121 @@
+#include "session.h"
+
+#include <CLI/CLI.hpp>
+#include <charconv>
+#include <cmath>
+#include <cstdio>
+#include <map>
+
+#include "failure.h"
+#include "temporary_files.h"
+
+namespace picturezor::cli {
+
+void Session::Note(const std::filesystem::path& file, const std::string& text) {
+  if (Quiet) return;
+  Bar.Clear();
+  std::fprintf(stderr, "picturezor: %s: note: %s\n", file.c_str(), text.c_str());
+}
+
+void AddStoreOptions(CLI::App& command, Session& session) {
+  static const std::map<std::string, Store> stores{
+      {"auto", Store::Auto}, {"memory", Store::Memory}, {"mapped", Store::Mapped}};
+  command.add_flag("-q,--quiet", session.Quiet, "No notes, no progress bar");
+  command
+      .add_option_function<std::string>(
+          "--store", [&session](const std::string& name) { session.Stores.Kind = stores.at(name); },
+          "Where pictures live: memory, mapped (in temporary files), or auto (mapped where --memory-limit\n"
+          "is passed; the default)")
+      ->type_name("KIND")
+      ->check(CLI::IsMember({"auto", "memory", "mapped"}));
+  command
+      .add_option_function<std::string>(
+          "--memory-limit",
+          [&session](const std::string& text) { session.Stores.MemoryLimit = ParseBytes(text); },
+          "Memory for all pictures together, as 256M or 2G; half of the free memory by default")
+      ->type_name("SIZE");
+  command
+      .add_option("--temp-dir", session.Stores.TempDirectory,
+                  "Directory of the temporary files; $TMPDIR or /var/tmp by default")
+      ->type_name("DIR");
+}
+
+void AddQualityOption(CLI::App& command, Session& session) {
+  command
+      .add_option("--quality", session.Writing.Quality,
+                  "JPEG quality, 1 to 100, 90 by default; from 90 on colours keep their full resolution")
+      ->type_name("N")
+      ->check(CLI::Range(1, 100));
+}
+
+OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
+    : File(file), Reader(OpenImage(file, session.Stores.MemoryLimit)), Upright(cli::Upright(Reader->Info())) {
+  for (const std::string& note : Upright.Notes) session.Note(file, note);
+}
+
+Target::Target(const std::filesystem::path& file) : File(file), Type(TypeByExtension(file)) {}
+Target::~Target() = default;
+
+Format Target::Storable(Session& session, Format pixels) const {
+  const Format format = StorableFormat(File, Type, pixels);
+  if (format != pixels) session.Note(File, NameOf(Type) + " has no alpha, it is left out");
+  return format;
+}
+
+void Target::Start(std::int64_t width, std::int64_t height) {
+  RequireStorableSize(File, Type, width, height);
+  Output = std::make_unique<OutputFile>(File);
+}
+
+void Target::Write(Session& session, const Picture& picture, Format format, ImageInfo info) {
+  info.Width = picture.Width();
+  info.Height = picture.Height();
+  info.Pixels = format;
+  if (!ProfileFits(info.Profile, format)) info.Profile.clear();
+  {
+    const auto writer = CreateImage(Output->Descriptor(), File, Type, info, session.Writing);
+    WriteFrom(picture, *writer, format, session.Bar);
+    writer->Finish();
+  }
+  Output->Commit();
+}
+
+std::int64_t ParseBytes(const std::string& text) {
+  double number = 0;
+  const char* end = text.data() + text.size();
+  auto [rest, failed] = std::from_chars(text.data(), end, number);
+  double unit = 1;
+  if (failed == std::errc() && rest != end) {
+    constexpr std::string_view letters = "KMGT";
+    const auto power = letters.find(char(std::toupper(*rest)));
+    unit = power == letters.npos ? 0 : std::pow(1024.0, double(power + 1));
+    ++rest;
+    if (rest != end && *rest == 'i') ++rest;
+    if (rest != end && *rest == 'B') ++rest;
+  }
+  const double bytes = number * unit;
+  if (failed != std::errc() || rest != end || !(bytes >= 1) || bytes > 1e18)
+    throw UsageFailure("--memory-limit: " + text + " isn't a size like 256M or 2G");
+  return std::int64_t(bytes);
+}
+
+std::vector<std::int64_t> ParseNumbers(const std::string& option, const std::string& text, char between,
+                                       std::size_t count) {
+  std::vector<std::int64_t> numbers;
+  const char *at = text.data(), *end = at + text.size();
+  while (numbers.size() < count) {
+    std::int64_t number = 0;
+    const auto [rest, failed] = std::from_chars(at, end, number);
+    if (failed != std::errc()) break;
+    numbers.push_back(number);
+    at = rest;
+    if (at == end || *at != between) break;
+    ++at;
+  }
+  if (numbers.size() != count || at != end)
+    throw UsageFailure(option + ": " + text + " isn't " + std::to_string(count) + " whole numbers with '" +
+                       between + "' between them");
+  return numbers;
+}
+
+}

@@ -1,0 +1,79 @@
+#pragma once
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "codecs/image_file.h"
+#include "pictures.h"
+#include "progress.h"
+
+namespace CLI {
+class App;
+}
+
+namespace picturezor::cli {
+
+/// What all commands share: the options that several of them have, and the ways to the person at the other
+/// end.
+struct Session {
+  bool Quiet = false;
+  StoreOptions Stores;
+  WriteOptions Writing;
+  Progress Bar;
+  /// What the chosen command does; gives its exit code.
+  std::function<int()> Work;
+
+  /// A line on standard error, unless --quiet.
+  void Note(const std::filesystem::path& file, const std::string& text);
+};
+
+/// -q, and the options of where pictures live.
+void AddStoreOptions(CLI::App& command, Session& session);
+/// --quality.
+void AddQualityOption(CLI::App& command, Session& session);
+
+/// An image file that is open, its notes told.
+struct OpenedImage {
+  std::filesystem::path File;
+  std::unique_ptr<ImageReader> Reader;
+  /// With the orientation applied.
+  ImageInfo Upright;
+
+  OpenedImage(Session& session, const std::filesystem::path& file);
+  PictureSize Size() const { return {Upright.Width, Upright.Height, Upright.Pixels}; }
+  /// Reads all of it, once.
+  void ReadInto(Session& session, const Picture& picture) { cli::ReadInto(picture, *Reader, session.Bar); }
+};
+
+/// The file that a command writes. Made before the work, so that one that can't be written shows early.
+class Target {
+ public:
+  explicit Target(const std::filesystem::path& file);
+  ~Target();
+  /// What of `pixels` the file can hold; says so where alpha is lost.
+  Format Storable(Session& session, Format pixels) const;
+  /// Refuses a size that the file can't hold, and starts the file.
+  void Start(std::int64_t width, std::int64_t height);
+  /// Writes and completes the file. `info` tells what else goes into it: a profile only where its colours
+  /// fit.
+  void Write(Session& session, const Picture& picture, Format format, ImageInfo info);
+
+ private:
+  std::filesystem::path File;
+  FileType Type;
+  std::unique_ptr<class OutputFile> Output;
+};
+
+/// "256M", "1.5G" or a plain number of bytes. Throws UsageFailure.
+std::int64_t ParseBytes(const std::string& text);
+/// Numbers with a letter between them, "640x480" or "10,20". Throws UsageFailure naming the option.
+std::vector<std::int64_t> ParseNumbers(const std::string& option, const std::string& text, char between,
+                                       std::size_t count);
+
+void AddScale(CLI::App& app, Session& session);
+void AddInfo(CLI::App& app, Session& session);
+void AddConvert(CLI::App& app, Session& session);
+
+}

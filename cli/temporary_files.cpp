@@ -1,0 +1,162 @@
+#include "temporary_files.h"
+
+#include <fcntl.h>
+#include <limits.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <array>
+#include <atomic>
+#include <cerrno>
+#include <csignal>
+#include <cstdlib>
+#include <cstring>
+#include <utility>
+
+#include "failure.h"
+
+namespace picturezor::cli {
+
+namespace {
+
+/// Fixed memory, so that a signal handler can read it at any time.
+struct Doomed {
+  std::atomic<bool> Used = false;
+  bool Directory = false;
+  char Path[PATH_MAX] = {};
+};
+std::array<Doomed, 16> TheDoomed;
+static_assert(std::atomic<bool>::is_always_lock_free);
+
+/// Files stand behind the directory that they are in.
+void RemoveDoomed() {
+  for (std::size_t i = TheDoomed.size(); i-- > 0;)
+    if (TheDoomed[i].Used) {
+      if (TheDoomed[i].Directory)
+        rmdir(TheDoomed[i].Path);
+      else
+        unlink(TheDoomed[i].Path);
+    }
+}
+
+void DieBySignal(int signal) {
+  RemoveDoomed();
+  // Its action is the default one again, and it is let through when this returns.
+  raise(signal);
+}
+
+void DieOfFullDisk(int) {
+  RemoveDoomed();
+  constexpr char line[] = "picturezor: no space left for the temporary file, or an input file was cut off\n";
+  if (write(STDERR_FILENO, line, sizeof line - 1) < 0) _exit(Failed);
+  _exit(Failed);
+}
+
+/// No signal comes between making a file and naming it.
+class SignalsHeldBack {
+ public:
+  SignalsHeldBack() {
+    sigset_t all;
+    sigfillset(&all);
+    pthread_sigmask(SIG_BLOCK, &all, &Before);
+  }
+  SignalsHeldBack(const SignalsHeldBack&) = delete;
+  ~SignalsHeldBack() { pthread_sigmask(SIG_SETMASK, &Before, nullptr); }
+
+ private:
+  sigset_t Before;
+};
+
+}
+
+void CatchSignals() {
+  struct sigaction action {};
+  action.sa_handler = DieBySignal;
+  action.sa_flags = SA_RESETHAND;
+  for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU, SIGALRM}) {
+    struct sigaction before {};
+    sigaction(signal, nullptr, &before);
+    // As under nohup.
+    if (before.sa_handler != SIG_IGN) sigaction(signal, &action, nullptr);
+  }
+  action.sa_handler = DieOfFullDisk;
+  sigaction(SIGBUS, &action, nullptr);
+  // They come as errors of the write instead.
+  std::signal(SIGXFSZ, SIG_IGN);
+  std::signal(SIGPIPE, SIG_IGN);
+}
+
+void RemoveOnDeath(const std::filesystem::path& file, bool directory) {
+  const std::string path = std::filesystem::absolute(file).string();
+  if (path.size() >= PATH_MAX) return;
+  for (Doomed& entry : TheDoomed)
+    if (!entry.Used) {
+      std::strcpy(entry.Path, path.c_str());
+      entry.Directory = directory;
+      entry.Used = true;
+      return;
+    }
+}
+
+void KeepOnDeath(const std::filesystem::path& file) {
+  const std::string path = std::filesystem::absolute(file).string();
+  for (Doomed& entry : TheDoomed)
+    if (entry.Used && path == entry.Path) entry.Used = false;
+}
+
+OutputFile::OutputFile(const std::filesystem::path& target) : Name(target), Real(target) {
+  std::error_code failed;
+  // What a link points to is replaced, not the link.
+  if (std::filesystem::is_symlink(target, failed)) {
+    Real = std::filesystem::weakly_canonical(target, failed);
+    if (failed) throw Failure(target, failed.message());
+  }
+  struct stat about {};
+  const bool there = stat(Real.c_str(), &about) == 0;
+  if (there && S_ISDIR(about.st_mode)) throw Failure(target, "a directory");
+  if (there && !S_ISREG(about.st_mode)) throw Failure(target, "not a regular file");
+  if (there && access(Real.c_str(), W_OK) != 0) throw Failure(target, std::strerror(errno));
+  // Short, since a name may be as long as the system allows already.
+  std::string name = (Real.parent_path() / ".picturezor-XXXXXX").string();
+  const SignalsHeldBack held;
+  File = mkostemp(name.data(), O_CLOEXEC);
+  if (File < 0) throw Failure(target, std::strerror(errno));
+  Temporary = name;
+  RemoveOnDeath(Temporary);
+  const mode_t mask = umask(0);
+  umask(mask);
+  if (fchmod(File, there ? about.st_mode & 07777 : 0666 & ~mask) != 0) {
+    // A file system without permissions has none to set.
+  }
+}
+
+OutputFile::~OutputFile() {
+  if (File >= 0) close(File);
+  if (Temporary.empty()) return;
+  unlink(Temporary.c_str());
+  KeepOnDeath(Temporary);
+}
+
+void OutputFile::Commit() {
+  const int file = std::exchange(File, -1);
+  if (close(file) != 0) throw Failure(Name, std::strerror(errno));
+  if (rename(Temporary.c_str(), Real.c_str()) != 0) throw Failure(Name, std::strerror(errno));
+  KeepOnDeath(Temporary);
+  Temporary.clear();
+}
+
+PrivateDirectory::PrivateDirectory(const std::filesystem::path& parent) {
+  std::string name = (parent / "picturezor-XXXXXX").string();
+  const SignalsHeldBack held;
+  if (!mkdtemp(name.data()))
+    throw Failure(parent, std::string("no temporary file can be made there: ") + std::strerror(errno));
+  At = name;
+  RemoveOnDeath(At, true);
+}
+
+PrivateDirectory::~PrivateDirectory() {
+  rmdir(At.c_str());
+  KeepOnDeath(At);
+}
+
+}
