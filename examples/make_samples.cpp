@@ -60,8 +60,9 @@ double Ridge(int ridge, double x) {
 
 constexpr double Shore = 0.62, SunX = 0.66, SunY = 0.37;
 
-/// What is above the water: y from 0, the top, to Shore.
-Colour Land(double x, double y, double aspect) {
+/// What is above the water: y from 0, the top, to Shore. The water mirrors it without the sun, which leaves a
+/// path of light there.
+Colour Land(double x, double y, double aspect, bool sun) {
   const double far = std::hypot((x - SunX) * aspect, y - SunY);
   Colour sky = Mix({34, 47, 98}, {244, 150, 96}, std::pow(y / 0.5, 1.3));
   sky = Mix(sky, {255, 214, 130}, 0.85 * std::exp(-far * far * 14));
@@ -74,8 +75,8 @@ Colour Land(double x, double y, double aspect) {
       if (Hash(cellX, cellY + 999) > 0.985 && std::hypot(x * 190 - cellX - 0.5, y * 130 - cellY - 0.5) < 0.12)
         sky = Mix(sky, {255, 250, 235}, 0.9 - y * 2.4);
     }
-  sky = Mix(sky, {255, 246, 214}, (0.052 - far) * 260);
-  for (int ridge = 3; ridge >= 0; --ridge) {
+  if (sun) sky = Mix(sky, {255, 246, 214}, (0.052 - far) * 260);
+  for (int ridge = 0; ridge <= 3; ++ridge) {
     double skyline = Ridge(ridge, x);
     // Firs on the nearest one.
     if (ridge == 0) {
@@ -93,12 +94,12 @@ Colour Land(double x, double y, double aspect) {
 }
 
 Colour Lake(double x, double y, double aspect) {
-  if (y < Shore) return Land(x, y, aspect);
+  if (y < Shore) return Land(x, y, aspect, true);
   const double depth = (y - Shore) / (1 - Shore);
   const double ripple = Rough(x * 9 * aspect, 90 * std::pow(depth, 0.45), 5) - 0.48;
   const double mirrored = Shore - (y - Shore) * 1.02 + ripple * 0.10 * (0.25 + depth);
   const Colour seen =
-      Land(std::clamp(x + ripple * 0.012, 0.0, 1.0), std::clamp(mirrored, 0.0, Shore), aspect);
+      Land(std::clamp(x + ripple * 0.012, 0.0, 1.0), std::clamp(mirrored, 0.0, Shore), aspect, false);
   Colour water = Mix(seen, {16, 28, 52}, 0.22 + 0.42 * depth);
   const double path = std::exp(-std::pow((x - SunX) * aspect / (0.03 + 0.13 * depth), 2));
   return Mix(water, {255, 218, 150}, std::clamp(path * (ripple * 5 + 0.12), 0.0, 0.85));
