@@ -35,7 +35,10 @@ void Host::Load(const std::filesystem::path& module, const Options& options) {
   void* library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
   if (!library) throw ModuleError(std::string("the module can't be loaded: ") + dlerror());
   const auto entry = reinterpret_cast<zor::PluginMain>(dlsym(library, "REALPluginMain"));
-  if (!entry) throw ModuleError(path.string() + " isn't a module: it has no REALPluginMain");
+  if (!entry) {
+    dlclose(library);
+    throw ModuleError(path.string() + " isn't a module: it has no REALPluginMain");
+  }
   Runtime& runtime = TheRuntime();
   runtime.Version = options.Version;
   runtime.Hidden = options.Hidden;

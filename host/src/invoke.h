@@ -7,9 +7,9 @@
 #include <utility>
 #include <vector>
 
+#include "host_strings.h"
 #include "object_model.h"
 #include "picturezor/picture.h"
-#include "host_strings.h"
 
 // How C++ calls a row of a class: the row is found by name and argument types, and its function is called
 // through a pointer of just that C type.

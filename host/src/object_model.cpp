@@ -46,7 +46,8 @@ const Class* FindClass(std::string_view name) {
 
 const Class& ClassNamed(std::string_view name) {
   if (const Class* found = FindClass(name)) return *found;
-  throw ModuleError("there is no class " + std::string(name));
+  throw ModuleError("there is no class " + std::string(name) +
+                    (Host::IsLoaded() ? "" : ", since no module is loaded"));
 }
 
 void Register(zor::ClassRecord* record) {

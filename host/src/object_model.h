@@ -4,6 +4,7 @@
 #include <functional>
 #include <map>
 #include <memory>
+#include <new>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -110,15 +111,26 @@ struct FactoryPayload : Payload {
   std::function<void*(std::int32_t, std::int32_t, std::int32_t)> NewPicture;
 };
 
-/// Runs C++ code that the module has called; an exception is kept for the call in hand, and the module gets
-/// the failure value.
+/// Runs C++ code that the module has called; the first exception is kept for the call in hand, and the module
+/// gets the failure value.
 template <class Result, class Body>
 Result Guarded(Result failure, Body&& body) {
   try {
     return body();
   } catch (...) {
-    TheRuntime().Thrown = std::current_exception();
+    if (!TheRuntime().Thrown) TheRuntime().Thrown = std::current_exception();
     return failure;
+  }
+}
+
+/// Makes something for the module; null when there isn't the memory for it, or a test allows no more.
+template <class Make>
+void* Created(Make&& make) {
+  if (!MayCreate()) return nullptr;
+  try {
+    return make();
+  } catch (const std::bad_alloc&) {
+    return nullptr;
   }
 }
 

@@ -123,7 +123,24 @@ bool Picture::IsGray() const { return BooleanProperty("IsGray"); }
 bool Picture::IsRGB() const { return BooleanProperty("IsRGB"); }
 bool Picture::IsCMYK() const { return BooleanProperty("IsCMYK"); }
 bool Picture::IsMapping() const { return BooleanProperty("IsMapping"); }
+bool Picture::HasRed() const { return BooleanProperty("HasRed"); }
+bool Picture::HasGreen() const { return BooleanProperty("HasGreen"); }
+bool Picture::HasBlue() const { return BooleanProperty("HasBlue"); }
+bool Picture::HasGray() const { return BooleanProperty("HasGray"); }
 bool Picture::HasAlpha() const { return BooleanProperty("HasAlpha"); }
+bool Picture::HasCyan() const { return BooleanProperty("HasCyan"); }
+bool Picture::HasMagenta() const { return BooleanProperty("HasMagenta"); }
+bool Picture::HasYellow() const { return BooleanProperty("HasYellow"); }
+bool Picture::HasBlack() const { return BooleanProperty("HasBlack"); }
+std::int32_t Picture::RedOffset() const { return IntegerProperty("RedOffset"); }
+std::int32_t Picture::GreenOffset() const { return IntegerProperty("GreenOffset"); }
+std::int32_t Picture::BlueOffset() const { return IntegerProperty("BlueOffset"); }
+std::int32_t Picture::GrayOffset() const { return IntegerProperty("GrayOffset"); }
+std::int32_t Picture::AlphaOffset() const { return IntegerProperty("AlphaOffset"); }
+std::int32_t Picture::CyanOffset() const { return IntegerProperty("CyanOffset"); }
+std::int32_t Picture::MagentaOffset() const { return IntegerProperty("MagentaOffset"); }
+std::int32_t Picture::YellowOffset() const { return IntegerProperty("YellowOffset"); }
+std::int32_t Picture::BlackOffset() const { return IntegerProperty("BlackOffset"); }
 std::int32_t Picture::IntegerProperty(std::string_view name) const { return Get<std::int32_t>(*this, name); }
 bool Picture::BooleanProperty(std::string_view name) const { return Get<bool>(*this, name); }
 std::int32_t Picture::MappingBlockSize() const { return IntegerProperty("MappingBlockSize"); }
@@ -134,6 +151,8 @@ PictureFactory Picture::Factory() const { return Get<PictureFactory>(*this, "Fac
 void Picture::SetFactory(const PictureFactory& factory) const { Set(*this, "Factory", factory); }
 Picture Picture::Parent() const { return Get<Picture>(*this, "Parent"); }
 MemoryBlock Picture::MemoryTarget() const { return Get<MemoryBlock>(*this, "MemoryTarget"); }
+bool Picture::DebugPictureEnabled() const { return BooleanProperty("DebugPictureEnabled"); }
+void Picture::SetDebugPictureEnabled(bool enabled) const { Set(*this, "DebugPictureEnabled", enabled); }
 MemoryBlock Picture::Memory() const { return Get<MemoryBlock>(*this, "Memory"); }
 
 MemoryBlock Picture::RawRow(std::int32_t index) const {

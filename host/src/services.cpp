@@ -2,10 +2,11 @@
 #include <climits>
 #include <cstring>
 #include <filesystem>
+#include <stdexcept>
 #include <utility>
 
-#include "object_model.h"
 #include "host_strings.h"
+#include "object_model.h"
 
 // The services that the module asks for by name. Each has the C type that the module calls it by.
 
@@ -24,9 +25,9 @@ void PluginRegisterClass(void* record) {
 
 void* PluginNewInstance(const char* className) {
   const Class* of = FindClass(className);
-  if (!of || !MayCreate()) return nullptr;
+  if (!of) return nullptr;
   const bool exception = of->Name.ends_with("Exception");
-  return NewObject(*of, exception ? std::make_unique<ExceptionPayload>() : nullptr);
+  return Created([&] { return NewObject(*of, exception ? std::make_unique<ExceptionPayload>() : nullptr); });
 }
 
 void REALLockObject(void* object) { Lock(object); }
@@ -43,14 +44,16 @@ void* GetEventInstancePPC(void* object, std::uintptr_t eventWord) {
 }
 
 void* REALBuildString(const void* bytes, std::int32_t length) {
-  if (length < 0 || !MayCreate()) return nullptr;
-  return NewString(std::string(static_cast<const char*>(bytes), std::size_t(length)), 0);
+  if (length < 0) return nullptr;
+  return Created(
+      [&] { return NewString(std::string(static_cast<const char*>(bytes), std::size_t(length)), 0); });
 }
 void REALSetStringEncoding(void* string, std::uint32_t encoding) {
   if (string) static_cast<StringRecord*>(string)->Encoding = encoding;
 }
 void* REALConvertString(void* string, std::uint32_t encoding) {
-  return string && MayCreate() ? Converted(*static_cast<StringRecord*>(string), encoding) : nullptr;
+  if (!string) return nullptr;
+  return Created([&] { return Converted(*static_cast<StringRecord*>(string), encoding); });
 }
 void REALUnlockString(void* string) { UnlockString(static_cast<StringRecord*>(string)); }
 
@@ -67,22 +70,25 @@ void* NewBlock(std::unique_ptr<BlockPayload> payload) {
   return NewObject(*FindClass("MemoryBlock"), std::move(payload));
 }
 void* newMemoryBlock(std::int32_t size) {
-  if (size < 0 || !MayCreate()) return nullptr;
-  auto payload = std::make_unique<BlockPayload>();
-  payload->Own.resize(std::size_t(size));
-  payload->Start = payload->Own.data();
-  payload->Size = std::size_t(size);
-  return NewBlock(std::move(payload));
+  if (size < 0) return nullptr;
+  return Created([&] {
+    auto payload = std::make_unique<BlockPayload>();
+    payload->Own.resize(std::size_t(size));
+    payload->Start = payload->Own.data();
+    payload->Size = std::size_t(size);
+    return NewBlock(std::move(payload));
+  });
 }
 void* memoryBlockGetPtr(void* block) {
   const auto* payload = HeldBy<BlockPayload>(block);
   return payload ? payload->Start : nullptr;
 }
 void* PtrToMemoryBlock(void* address) {
-  if (!MayCreate()) return nullptr;
-  auto payload = std::make_unique<BlockPayload>();
-  payload->Start = static_cast<std::uint8_t*>(address);
-  return NewBlock(std::move(payload));
+  return Created([&] {
+    auto payload = std::make_unique<BlockPayload>();
+    payload->Start = static_cast<std::uint8_t*>(address);
+    return NewBlock(std::move(payload));
+  });
 }
 
 void REALYieldToRB() {
@@ -129,7 +135,11 @@ std::int32_t RuntimeUBound(void* array) {
   return payload ? std::int32_t(payload->Values.size()) - 1 : -1;
 }
 std::int32_t RuntimeDirectReadIntArray(void* array, std::int32_t index) {
-  return HeldBy<ArrayPayload>(array)->Values.at(std::size_t(index));
+  return Guarded(0, [&] {
+    const auto* payload = HeldBy<ArrayPayload>(array);
+    if (!payload) throw std::out_of_range("an element of nil was read");
+    return payload->Values.at(std::size_t(index));
+  });
 }
 
 struct Service {

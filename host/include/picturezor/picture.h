@@ -160,8 +160,26 @@ class Picture : public Object {
   bool IsRGB() const;
   bool IsCMYK() const;
   bool IsMapping() const;
+  /// Whether the pixels have a plane, and where it stands: bytes from the start of a row to its first sample.
+  bool HasRed() const;
+  bool HasGreen() const;
+  bool HasBlue() const;
+  bool HasGray() const;
   bool HasAlpha() const;
-  /// Any property by its name, for those that have no member of their own.
+  bool HasCyan() const;
+  bool HasMagenta() const;
+  bool HasYellow() const;
+  bool HasBlack() const;
+  std::int32_t RedOffset() const;
+  std::int32_t GreenOffset() const;
+  std::int32_t BlueOffset() const;
+  std::int32_t GrayOffset() const;
+  std::int32_t AlphaOffset() const;
+  std::int32_t CyanOffset() const;
+  std::int32_t MagentaOffset() const;
+  std::int32_t YellowOffset() const;
+  std::int32_t BlackOffset() const;
+  /// A property by its name. Throws ModuleError where the class has none of that name and type.
   std::int32_t IntegerProperty(std::string_view name) const;
   bool BooleanProperty(std::string_view name) const;
   /// The bytes of a window of a mapped picture, as rounded by the module.
@@ -170,10 +188,16 @@ class Picture : public Object {
   /// Least sixtieths of a second between two yields to the host; 0 is never.
   std::int32_t YieldTicks() const;
   void SetYieldTicks(std::int32_t ticks) const;
+  /// This picture's own factory, asked before the global one.
   PictureFactory Factory() const;
   void SetFactory(const PictureFactory& factory) const;
+  /// The picture that this view was made from; nil for one that isn't a view.
   Picture Parent() const;
+  /// The caller's block that holds the samples, or nil.
   MemoryBlock MemoryTarget() const;
+  /// Whether the module may show this picture to a debugger.
+  bool DebugPictureEnabled() const;
+  void SetDebugPictureEnabled(bool enabled) const;
   /// The start of the store, or of the window of a mapped one; nil without either. It has no size of its own.
   MemoryBlock Memory() const;
 
