@@ -185,7 +185,7 @@ T Get(const Object& self, std::string_view name) {
 }
 
 /// Writes a property. The host keeps a reference to an object that it writes into the instance data, and
-/// drops the one to the object that stood there.
+/// drops the one to the object that stood there; the last one goes with the object written to.
 template <class T>
 void Set(const Object& self, std::string_view name, const T& value) {
   using C = typename Passed<T>::C;

@@ -17,6 +17,22 @@ Runtime* MakeRuntime() {
   return runtime;
 }
 
+bool NamesObject(std::string_view type) {
+  const std::string name = Lower(type);
+  return name != "integer" && name != "int64" && name != "boolean" && name != "double" && name != "color" &&
+         name != "string";
+}
+
+/// Gives back the objects that this host has written into an object's fields.
+void ReleaseFields(void* object) {
+  for (const PropertyEntry& row : HeaderOf(object).Of->Properties) {
+    if (row.Record->Setter != zor::DirectField || !NamesObject(row.Type)) continue;
+    void* held;
+    std::memcpy(&held, InstanceOf(object) + row.Record->FieldOffset, sizeof held);
+    Unlock(held);
+  }
+}
+
 std::vector<MethodEntry> EntriesOf(const zor::MethodRecord* rows, std::size_t count) {
   std::vector<MethodEntry> entries;
   for (std::size_t i = 0; i < count; ++i)
@@ -99,6 +115,7 @@ void Unlock(void* object) {
     HeaderOf(object).References = 1 << 20;
     of->Destructor(object);
   }
+  ReleaseFields(object);
   HeaderOf(object).~ObjectHeader();
   ::operator delete (object, std::align_val_t{InstanceOffset});
   --TheRuntime().Alive.Objects;
