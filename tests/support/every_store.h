@@ -9,6 +9,10 @@
 
 #include "picturezor/picture.h"
 
+namespace zor {
+struct PictureData;
+}
+
 namespace picturezor {
 
 using Samples = Bytes;
@@ -52,6 +56,9 @@ class TemporaryFile {
   std::filesystem::path At;
 };
 
+/// The instance data of a picture, for what can't be seen from outside.
+zor::PictureData& DataOf(const Picture& picture);
+
 /// The stored rows of a picture, filler and padding included.
 std::vector<Samples> StoredRows(const Picture& picture);
 void SetStoredRows(const Picture& picture, const std::vector<Samples>& rows);
@@ -88,8 +95,8 @@ class StoredPicture {
 };
 
 /// Runs body once for each store that a picture can live in: own memory, the caller's block with a wide
-/// stride, a mapped file with the smallest window, a clip of a larger picture, a mirrored view, a clip of a
-/// mapped file. The bytes around the picture must be as they were afterwards.
+/// stride, a mapped file with a window of five rows, a clip of a larger picture, a mirrored view, a clip of a
+/// mapped file with such a window. The bytes around the picture must be as they were afterwards.
 template <class Body>
 void ForEveryStore(int width, int height, Format format, Body&& body) {
   for (const StoredPicture::Kind kind : StoredPicture::Kinds) {
