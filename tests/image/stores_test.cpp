@@ -1,0 +1,157 @@
+#include <gmock/gmock.h>
+#include <unistd.h>
+
+#include <algorithm>
+
+#include "image/picture_data.h"
+#include "invoke.h"
+#include "support/every_store.h"
+
+namespace picturezor {
+namespace {
+
+/// The numbers below are those of pages of 4096 bytes.
+bool OtherPages() { return getpagesize() > 4096; }
+
+std::pair<int, int> Window(const Picture& picture) {
+  return {DataOf(picture).WindowFirstRow, DataOf(picture).WindowLastRow};
+}
+
+/// Asks for a row as a loop does, and gives the window that it came from.
+std::pair<int, int> WindowAt(const Picture& picture, int row) {
+  EXPECT_NE(DataOf(picture).RowGetter(&DataOf(picture), row), nullptr);
+  return Window(picture);
+}
+
+using Rows = std::pair<int, int>;
+
+TEST(MappedStore, RoundsWindowsToPages) {
+  if (OtherPages()) GTEST_SKIP();
+  struct {
+    int Width, Height, Asked;
+    int RowSize, BlockSize, RowsPerBlock;
+  } cases[] = {
+      {1000, 10000, 1000000, 4096, 16777216, 4096},
+      {1000, 10000, 0, 4096, 16777216, 4096},
+      {1000, 10000, -5, 4096, 16777216, 4096},
+      {1000, 10000, 16781311, 4096, 16777216, 4096},
+      {1000, 10000, 16781312, 4096, 16781312, 4097},
+      {1000, 10000, 100000000, 4096, 40960000, 10000},
+      {1000, 5, 1, 4096, 20480, 5},
+      {2000, 6, 1, 8192, 49152, 6},
+      {2000, 3000, 1, 8192, 16777216, 2048},
+      {1400000, 7, 1, 4202496, 21012480, 5},
+  };
+  for (const auto& [width, height, asked, rowSize, blockSize, rowsPerBlock] : cases) {
+    SCOPED_TRACE(std::to_string(width) + " x " + std::to_string(height) + ", " + std::to_string(asked));
+    const TemporaryFile file;
+    const Picture picture = Picture::Mapped(file.Path(), width, height, Format::RGB, asked);
+    EXPECT_TRUE(picture.Valid() && picture.IsMapping());
+    EXPECT_EQ(picture.RowSize(), rowSize);
+    EXPECT_EQ(picture.TotalSize(), std::int64_t{rowSize} * height);
+    EXPECT_EQ(picture.MappingBlockSize(), blockSize);
+    EXPECT_EQ(DataOf(picture).RowsPerBlock, rowsPerBlock);
+    EXPECT_EQ(std::int64_t(std::filesystem::file_size(file.Path())), picture.TotalSize() + 4096);
+  }
+}
+
+TEST(MappedStore, OpensWindowsTwoRowsAbove) {
+  if (OtherPages()) GTEST_SKIP();
+  const TemporaryFile file;
+  const Picture picture = Picture::Mapped(file.Path(), 1000, 10000, Format::RGB, 1);
+  EXPECT_EQ(Window(picture), Rows(0, 4095));
+  EXPECT_EQ(WindowAt(picture, 4095), Rows(0, 4095));
+  EXPECT_EQ(WindowAt(picture, 4096), Rows(4094, 8189));
+  EXPECT_EQ(WindowAt(picture, 9999), Rows(5904, 9999));
+  EXPECT_EQ(WindowAt(picture, 1), Rows(1, 4096));
+  EXPECT_EQ(WindowAt(picture, 0), Rows(0, 4095));
+  EXPECT_EQ(WindowAt(picture, 5000), Rows(4998, 9093));
+  EXPECT_EQ(WindowAt(picture, 2), Rows(0, 4095));
+  WindowAt(picture, 9000);
+  picture.SetMappingBlockSize(20000000);
+  EXPECT_EQ(picture.MappingBlockSize(), 19996672);
+  EXPECT_EQ(Window(picture), Rows(0, 4881));
+
+  picture.SetMappingBlockSize(1);
+  const Picture clip = picture.ClipImage({0, 5000, 1000, 1000});
+  EXPECT_EQ(Window(clip), Rows(4998, 9093));
+  EXPECT_EQ(WindowAt(clip, 999), Rows(4998, 9093));
+  EXPECT_EQ(Window(picture), Rows(0, 4095)) << "a view has a window of its own";
+  const Picture low = picture.ClipImage({0, 9500, 1000, 500});
+  EXPECT_EQ(Window(low), Rows(5904, 9999));
+  const Picture mirror = picture.MirroredView();
+  EXPECT_EQ(Window(mirror), Rows(5904, 9999));
+  EXPECT_EQ(WindowAt(mirror, 4095), Rows(5904, 9999));
+  EXPECT_EQ(WindowAt(mirror, 4096), Rows(5901, 9996));
+}
+
+// Catches a window placed a row off, or samples lost when it moves.
+TEST(MappedStore, KeepsRowsWhileWindowsMove) {
+  const StoredPicture stored(StoredPicture::Mapped, 7, 41, Format::RGB);
+  const Picture& picture = stored.Get();
+  EXPECT_EQ(DataOf(picture).RowsPerBlock, 5);
+  Noise noise(2);
+  std::vector<Samples> rows;
+  for (int y = 0; y < 41; ++y) {
+    rows.push_back(noise.Many(21));
+    picture.SetRowInFormat(y, Format::RGB, rows.back());
+  }
+  const Picture mirror = picture.MirroredView(), clip = mirror.ClipImage({2, 3, 4, 30});
+  for (int y = 40; y >= 0; --y) {
+    EXPECT_EQ(picture.RowInFormat(y, Format::RGB), rows[std::size_t(y)]);
+    EXPECT_EQ(mirror.RowInFormat(40 - y, Format::RGB), rows[std::size_t(y)]);
+  }
+  for (int i = 0; i < 200; ++i) {
+    const int y = noise.Between(0, 29);
+    const Samples& row = rows[std::size_t(32 - y)];
+    EXPECT_EQ(clip.RowInFormat(y, Format::RGB), Samples(row.begin() + 6, row.begin() + 18));
+  }
+}
+
+TEST(MappedStore, EndsWithItsFile) {
+  const TemporaryFile file;
+  {
+    const Picture picture = Picture::Mapped(file.Path(), 3, 5, Format::G);
+    const Picture view = picture.ClipImage();
+    EXPECT_THAT(picture.Row(4), testing::Each(0));
+    picture.Close();
+    EXPECT_TRUE(std::filesystem::exists(file.Path())) << "a view still shows the file";
+    view.Close();
+    EXPECT_FALSE(std::filesystem::exists(file.Path()));
+  }
+  { const Picture picture = Picture::Mapped(file.Path(), 3, 5, Format::G); }
+  EXPECT_FALSE(std::filesystem::exists(file.Path()));
+}
+
+TEST(MappedStore, IsRefusedWithoutAFile) {
+  const TemporaryFile file;
+  const std::filesystem::path folder = file.Path().parent_path();
+  for (const auto& path : {folder, file.Path() / "below nothing", folder / std::string(300, 'n')})
+    EXPECT_FALSE(Picture::Mapped(path, 3, 5, Format::G).Valid()) << path;
+  EXPECT_TRUE(std::filesystem::is_directory(folder));
+
+  const Picture noItem{Object::Adopt(model::NewObject(model::ClassNamed("PictureZOR")))};
+  model::Invoke<void>(noItem, "Constructor", 3, 5, 11, 0, FolderItem());
+  EXPECT_FALSE(noItem.Valid());
+
+  for (const auto& [width, height, code] :
+       {std::tuple(3, 4, 11), {0, 5, 11}, {3, 5, 14}, {0x7FFFFFFF, 5, 1}, {0x10000000, 5, 2}})
+    EXPECT_FALSE(Picture::Mapped(file.Path(), width, height, Format(code)).Valid()) << width;
+  EXPECT_FALSE(std::filesystem::exists(file.Path()));
+
+  const Picture huge = Picture::Mapped(file.Path(), 400000000, 0x7FFFFFFF, Format::G);
+  EXPECT_FALSE(huge.Valid()) << "the disk can't hold 2^59 bytes";
+  EXPECT_FALSE(std::filesystem::exists(file.Path()));
+}
+
+TEST(MemoryStore, TakesABlockSizeToo) {
+  if (OtherPages()) GTEST_SKIP();
+  const Picture picture(10, 9, Format::G);
+  picture.SetRowInFormat(8, Format::G, Samples(10, 5));
+  picture.SetMappingBlockSize(0);
+  EXPECT_EQ(picture.MappingBlockSize(), 4096);
+  EXPECT_EQ(picture.RowInFormat(8, Format::G), Samples(10, 5));
+}
+
+}
+}
