@@ -189,6 +189,8 @@ class PNGWriter : public ImageWriter, PNGFile {
     if (HasAlpha(info.Pixels)) type |= PNG_COLOR_MASK_ALPHA;
     Try([&] {
       png_set_write_fn(Png, this, OnWrite, OnFlush);
+      // A profile that libpng finds fault with is left out.
+      png_set_benign_errors(Png, 1);
       png_set_user_limits(Png, PNG_UINT_31_MAX, PNG_UINT_31_MAX);
       png_set_IHDR(Png, Header, png_uint_32(info.Width), png_uint_32(info.Height), 8, type,
                    PNG_INTERLACE_NONE, PNG_COMPRESSION_TYPE_DEFAULT, PNG_FILTER_TYPE_DEFAULT);

@@ -1,6 +1,7 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <cmath>
+#include <cstdlib>
 #include <map>
 
 #include "failure.h"
@@ -104,7 +105,11 @@ void AddScale(CLI::App& app, Session& session) {
       command->add_option("--fit", options->Fit, "The largest size within this, as 1920x1080; enlarges too")
           ->type_name("WxH");
   CLI::Option* percent =
-      command->add_option("--percent", options->Percent, "Of both sides")->check(CLI::Range(1e-6, 1e9));
+      command->add_option("--percent", options->Percent, "Of both sides")->check([](const std::string& text) {
+        const double percent = std::atof(text.c_str());
+        // Not a number is neither.
+        return percent >= 1e-6 && percent <= 1e9 ? "" : text + " isn't a percentage";
+      });
   width->type_name("N");
   height->type_name("N");
   percent->type_name("P");

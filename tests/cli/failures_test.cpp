@@ -1,0 +1,210 @@
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <fstream>
+
+#include "command_test_support.h"
+
+namespace picturezor::tests {
+
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+class Failures : public CommandTest {
+ protected:
+  /// A gray TIFF without compression, full of zeros that take no room on the disk.
+  void WriteEmptyTIFF(const std::string& name, std::uint32_t width, std::uint32_t height) {
+    const std::uint32_t tags[][3] = {{256, 4, width}, {257, 4, height}, {258, 3, 8},
+                                     {259, 3, 1},     {262, 3, 1},      {273, 4, 8},
+                                     {277, 3, 1},     {278, 4, height}, {279, 4, width * height}};
+    Bytes directory;
+    const auto put = [&](std::uint32_t value, int bytes) {
+      for (int i = 0; i < bytes; ++i) directory.push_back(std::uint8_t(value >> 8 * i));
+    };
+    put(std::size(tags), 2);
+    for (const auto& [tag, type, value] : tags) {
+      put(tag, 2);
+      put(type, 2);
+      put(1, 4);
+      put(value, 4);
+    }
+    put(0, 4);
+    const std::uint32_t at = 8 + width * height;
+    WriteBytes(At(name), {'I', 'I', 42, 0, std::uint8_t(at), std::uint8_t(at >> 8), std::uint8_t(at >> 16),
+                          std::uint8_t(at >> 24)});
+    std::filesystem::resize_file(At(name), at);
+    std::ofstream(At(name), std::ios::binary | std::ios::app)
+        .write(reinterpret_cast<const char*>(directory.data()), std::streamsize(directory.size()));
+  }
+};
+
+TEST_F(Failures, AFileThatIsCutAnywhereIsRefused) {
+  const Raster picture = Waves(48, 32, 3);
+  WritePNG(At("whole.png"), picture);
+  WriteJPEG(At("whole.jpg"), picture, {.Profile = Profile("RGB ")});
+  WriteJPEG(At("progressive.jpg"), picture, {.Quality = 50, .Progressive = true});
+  WriteTIFF(At("whole.tif"), picture, {.DensityPerInch = 72, .Profile = Profile("RGB ")});
+  WriteTIFF(At("deflate.tif"), picture, {.Compression = 8, .RowsPerStrip = 1000});
+  for (const auto& name : Files()) {
+    const Bytes whole = ReadBytes(At(name));
+    const std::string cut = "cut" + std::filesystem::path(name).extension().string();
+    Do({"convert", name, "-q", "-o", "whole-out.png"});
+    std::filesystem::remove(At("whole-out.png"));
+    // All places near both ends, and some between.
+    for (std::size_t size = 0; size < whole.size(); size += size < 24 || size + 24 >= whole.size() ? 1 : 97) {
+      SCOPED_TRACE(testing::Message() << name << " cut to " << size << " of " << whole.size());
+      WriteBytes(At(cut), Bytes(whole.begin(), whole.begin() + std::ptrdiff_t(size)));
+      Fail({"convert", cut, "-q", "-o", "out.png"}, cut, "");
+      if (HasFailure()) return;
+    }
+    std::filesystem::remove(At(cut));
+  }
+}
+
+TEST_F(Failures, DamageIsNoticed) {
+  for (const std::string name : {"a.png", "a.tif"}) {
+    const Raster picture = Noise(64, 64, 3);
+    WritePNG(At("a.png"), picture);
+    WriteTIFF(At("a.tif"), picture, {.Compression = 8});
+    Bytes bytes = ReadBytes(At(name));
+    for (std::size_t i = bytes.size() / 2; i < bytes.size() / 2 + 8; ++i) bytes[i] ^= 0x55;
+    WriteBytes(At(name), bytes);
+    Fail({"convert", name, "-o", "out.png"}, name, "corrupt");
+  }
+}
+
+TEST_F(Failures, BadInput) {
+  WriteBytes(At("text.png"), {'h', 'e', 'l', 'l', 'o', ' ', 'y', 'o', 'u'});
+  WriteBytes(At("empty.jpg"), {});
+  // 100 bytes that claim 2^31 - 1 columns and rows.
+  Bytes huge = {0x89, 'P',  'N',  'G',  13,   10,   26,   10, 0, 0, 0, 13, 'I',  'H',  'D',  'R', 0x7F,
+                0xFF, 0xFF, 0xFF, 0x7F, 0xFF, 0xFF, 0xFF, 8,  2, 0, 0, 0,  0x9B, 0xAB, 0x9C, 0x31};
+  huge.resize(100);
+  WriteBytes(At("huge.png"), huge);
+  Bytes wide = huge;
+  // 60000 x 60000, with the check sum for it.
+  for (const std::size_t at : {16, 20}) {
+    wide[at] = wide[at + 1] = 0;
+    wide[at + 2] = 0xEA;
+    wide[at + 3] = 0x60;
+  }
+  const std::uint8_t sum[] = {0x0F, 0xB0, 0xE2, 0x15};
+  std::copy(std::begin(sum), std::end(sum), wide.begin() + 29);
+  WriteBytes(At("wide.png"), wide);
+  std::filesystem::create_directory(At("folder.png"));
+  WritePNG(At("good.png"), Noise(8, 8, 3));
+  const struct {
+    std::string In, Reason;
+  } cases[] = {{"missing.png", "No such file"},
+               {"folder.png", "directory"},
+               {"text.png", "not a PNG, JPEG or TIFF image"},
+               {"empty.jpg", "empty"},
+               {"huge.png", "pixels are too many"},
+               {"wide.png", "which 100 bytes can't hold"},
+               {"/dev/null", "not a regular file"}};
+  for (const auto& [in, reason] : cases) {
+    SCOPED_TRACE(in);
+    Fail({"convert", in, "-o", "out.png"}, in, reason);
+    EXPECT_EQ(Run({"info", in}).Code, 2);
+  }
+  Fail({"convert", "good.png", "-o", "nowhere/out.png"}, "nowhere/out.png", "No such file");
+  Fail({"convert", "good.png", "-o", "folder.png"}, "folder.png", "directory");
+  Fail({"convert", "good.png", "--store", "mapped", "--temp-dir", "nowhere", "-o", "o.png"}, "nowhere",
+       "No such file");
+}
+
+TEST_F(Failures, WrongCommandLines) {
+  WritePNG(At("a.png"), Noise(8, 8, 3));
+  const Arguments cases[] = {
+      {},
+      {"paint"},
+      {"convert", "a.png"},
+      {"convert", "a.png", "-o", "b.gif"},
+      {"convert", "a.png", "-o", "b.png", "--format", "hsv"},
+      {"convert", "a.png", "-o", "b.png", "--store", "tape"},
+      {"convert", "a.png", "-o", "b.png", "--memory-limit", "much"},
+      {"convert", "a.png", "-o", "b.png", "--memory-limit", "-1M"},
+      {"convert", "a.png", "-o", "b.jpg", "--quality", "101"},
+      {"convert", "a.png", "-o", "b.png", "--frobnicate"},
+      {"scale", "a.png", "-o", "b.png"},
+      {"scale", "a.png", "-o", "b.png", "--width", "0"},
+      {"scale", "a.png", "-o", "b.png", "--width", "-5"},
+      {"scale", "a.png", "-o", "b.png", "--width", "99999999999999999999"},
+      {"scale", "a.png", "-o", "b.png", "--width", "ten"},
+      {"scale", "a.png", "-o", "b.png", "--width", "4", "--kernel", "sharp"},
+      {"scale", "a.png", "-o", "b.png", "--width", "4", "--fit", "4x4"},
+      {"scale", "a.png", "-o", "b.png", "--fit", "4x"},
+      {"scale", "a.png", "-o", "b.png", "--fit", "0x4"},
+      {"scale", "a.png", "-o", "b.png", "--percent", "0"},
+      {"scale", "a.png", "-o", "b.png", "--percent", "nan"},
+      {"scale", "a.png", "-o", "b.png", "--percent", "1e300"},
+  };
+  for (const Arguments& arguments : cases) {
+    SCOPED_TRACE(testing::PrintToString(arguments));
+    const Outcome outcome = Run(arguments);
+    EXPECT_EQ(outcome.Code, 3);
+    EXPECT_THAT(outcome.Error, testing::MatchesRegex("picturezor: [^\n]+\n"));
+    EXPECT_THAT(Files(), ElementsAre("a.png"));
+  }
+  EXPECT_EQ(Run({"--help"}).Code, 0);
+  EXPECT_THAT(Run({"scale", "--help"}).Out, HasSubstr("Examples:"));
+  EXPECT_THAT(Run({"--version"}).Out, HasSubstr("picturezor 1."));
+}
+
+TEST_F(Failures, AnOlderFileStaysUntilTheNewOneIsComplete) {
+  const Raster old = Noise(5, 5, 1), picture = Noise(40, 40, 3);
+  WritePNG(At("old.png"), old);
+  WritePNG(At("in.png"), picture);
+  Bytes cut = ReadBytes(At("in.png"));
+  cut.resize(cut.size() - 30);
+  WriteBytes(At("cut.png"), cut);
+  Fail({"convert", "cut.png", "-o", "old.png"}, "cut.png", "cut off");
+  EXPECT_EQ(ReadPNG(At("old.png")), old);
+  // Into itself, through a link, with its permissions.
+  std::filesystem::create_symlink("old.png", At("link.png"));
+  std::filesystem::permissions(At("old.png"),
+                               std::filesystem::perms::owner_read | std::filesystem::perms::owner_write);
+  Do({"convert", "in.png", "-o", "link.png"});
+  EXPECT_TRUE(std::filesystem::is_symlink(At("link.png")));
+  EXPECT_EQ(ReadPNG(At("old.png")), picture);
+  EXPECT_EQ(int(std::filesystem::status(At("old.png")).permissions()), 0600);
+  Do({"convert", "in.png", "--format", "gray", "-o", "in.png"});
+  EXPECT_EQ(ReadPNG(At("in.png")).Channels, 1);
+}
+
+TEST_F(Failures, NoRoomOnTheDisk) {
+  const Raster picture = Noise(300, 300, 3);
+  WritePNG(At("in.png"), picture);
+  for (const std::string out : {"out.png", "out.jpg", "out.tif"}) {
+    const Outcome outcome = Run({"convert", "in.png", "-o", out, "--quality", "100"}, 100'000);
+    EXPECT_EQ(outcome.Code, 2);
+    EXPECT_EQ(outcome.Error, "picturezor: " + out + ": File too large\n");
+    EXPECT_THAT(Files(), ElementsAre("in.png"));
+  }
+  const Outcome outcome = Run({"convert", "in.png", "-o", "out.png", "--store", "mapped"}, 100'000);
+  EXPECT_EQ(outcome.Code, 2);
+  EXPECT_THAT(outcome.Error, HasSubstr("no temporary file of 2 MB can be made there"));
+}
+
+TEST_F(Failures, ASignalLeavesNothingBehind) {
+  WriteEmptyTIFF("big.tif", 16000, 16000);
+  for (const int signal : {SIGTERM, SIGINT, SIGHUP}) {
+    const int null = open("/dev/null", O_RDWR);
+    const pid_t process =
+        Start({"convert", "big.tif", "--store", "mapped", "--format", "rgba", "-o", "out.png"}, null, null);
+    close(null);
+    // Its file of output is there once it is past the command line.
+    while (Files().size() < 2 && kill(process, 0) == 0) usleep(1000);
+    kill(process, signal);
+    EXPECT_EQ(WaitFor(process), -signal);
+    EXPECT_THAT(Files(), ElementsAre("big.tif"));
+    EXPECT_TRUE(std::filesystem::is_empty(Temporary));
+  }
+}
+
+}
+
+}
