@@ -80,8 +80,9 @@ TEST_F(Failures, BadInput) {
   WriteBytes(At("text.png"), {'h', 'e', 'l', 'l', 'o', ' ', 'y', 'o', 'u'});
   WriteBytes(At("empty.jpg"), {});
   // 100 bytes that claim 2^31 - 1 columns and rows.
-  Bytes huge = {0x89, 'P',  'N',  'G',  13,   10,   26,   10, 0, 0, 0, 13, 'I',  'H',  'D',  'R', 0x7F,
-                0xFF, 0xFF, 0xFF, 0x7F, 0xFF, 0xFF, 0xFF, 8,  2, 0, 0, 0,  0x9B, 0xAB, 0x9C, 0x31};
+  Bytes huge = {0x89, 'P',  'N',  'G',  13,   10,   26,   10,   0,    0,    0,   13,  'I', 'H',
+                'D',  'R',  0x7F, 0xFF, 0xFF, 0xFF, 0x7F, 0xFF, 0xFF, 0xFF, 8,   2,   0,   0,
+                0,    0x9B, 0xAB, 0x9C, 0x31, 0,    0,    0,    55,   'I',  'D', 'A', 'T'};
   huge.resize(100);
   WriteBytes(At("huge.png"), huge);
   Bytes wide = huge;
