@@ -8,7 +8,7 @@ namespace {
 /// Whether the row takes arguments of these types, as its first ones, and can do without the others.
 bool Takes(const MethodEntry& row, const std::string& lowerName, const std::vector<TypeName>& types) {
   const auto& parameters = row.Of.Parameters;
-  if (Lower(row.Of.Name) != lowerName || types.size() > parameters.size()) return false;
+  if (row.LowerName != lowerName || types.size() > parameters.size()) return false;
   for (std::size_t i = 0; i < types.size(); ++i)
     if (parameters[i].Type != types[i]) return false;
   return types.size() == parameters.size() || parameters[types.size()].Optional;
@@ -38,7 +38,7 @@ const zor::PropertyRecord& FindProperty(const Object& self, std::string_view nam
   if (!self) throw ModuleError(std::string(name) + ": read on nil");
   const std::string lowerName = Lower(name);
   for (const PropertyEntry& row : HeaderOf(self.Address()).Of->Properties)
-    if (Lower(row.Name) == lowerName && Lower(row.Type) == type) return *row.Record;
+    if (row.LowerName == lowerName && row.LowerType == type) return *row.Record;
   throw ModuleError("the class has no property " + std::string(name) + " as " + std::string(type));
 }
 

@@ -17,8 +17,8 @@ Runtime* MakeRuntime() {
   return runtime;
 }
 
-bool NamesObject(std::string_view type) {
-  const std::string name = Lower(type);
+/// Whether a property of this type, in lower case, is a reference.
+bool NamesObject(std::string_view name) {
   return name != "integer" && name != "int64" && name != "boolean" && name != "double" && name != "color" &&
          name != "string";
 }
@@ -26,7 +26,7 @@ bool NamesObject(std::string_view type) {
 /// Gives back the objects that this host has written into an object's fields.
 void ReleaseFields(void* object) {
   for (const PropertyEntry& row : HeaderOf(object).Of->Properties) {
-    if (row.Record->Setter != zor::DirectField || !NamesObject(row.Type)) continue;
+    if (row.Record->Setter != zor::DirectField || !NamesObject(row.LowerType)) continue;
     void* held;
     std::memcpy(&held, InstanceOf(object) + row.Record->FieldOffset, sizeof held);
     Unlock(held);
@@ -35,8 +35,11 @@ void ReleaseFields(void* object) {
 
 std::vector<MethodEntry> EntriesOf(const zor::MethodRecord* rows, std::size_t count) {
   std::vector<MethodEntry> entries;
-  for (std::size_t i = 0; i < count; ++i)
-    entries.push_back({&rows[i], ParseDeclaration(rows[i].Declaration)});
+  for (std::size_t i = 0; i < count; ++i) {
+    Declaration declaration = ParseDeclaration(rows[i].Declaration);
+    std::string lowerName = Lower(declaration.Name);
+    entries.push_back({&rows[i], std::move(declaration), std::move(lowerName)});
+  }
   return entries;
 }
 
@@ -77,9 +80,10 @@ void Register(zor::ClassRecord* record) {
   added.Record = record;
   added.Methods = EntriesOf(record->Methods, record->MethodCount);
   added.SharedMethods = EntriesOf(record->SharedMethods, record->SharedMethodCount);
-  for (std::size_t i = 0; i < record->PropertyCount; ++i)
-    added.Properties.push_back(
-        {&record->Properties[i], record->Properties[i].Name, record->Properties[i].Type});
+  for (std::size_t i = 0; i < record->PropertyCount; ++i) {
+    const zor::PropertyRecord& row = record->Properties[i];
+    added.Properties.push_back({&row, row.Name, row.Type, Lower(row.Name), Lower(row.Type)});
+  }
   for (std::size_t i = 0; i < record->ConstantCount; ++i) {
     const auto [name, value] = ParseConstant(record->Constants[i].Declaration);
     added.Constants[Lower(name)] = value;

@@ -19,11 +19,13 @@ namespace picturezor::model {
 struct MethodEntry {
   const zor::MethodRecord* Record;
   Declaration Of;
+  std::string LowerName;
 };
 
 struct PropertyEntry {
   const zor::PropertyRecord* Record;
   std::string Name, Type;
+  std::string LowerName, LowerType;
 };
 
 struct Class {
