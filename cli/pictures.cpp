@@ -221,9 +221,11 @@ void WriteFrom(const Picture& picture, ImageWriter& writer, Format format, Progr
   const bool opaque = HasAlpha(format) && !HasAlpha(from);
   const bool toInk = WithoutAlpha(format) == Format::CMYK && WithoutAlpha(from) == Format::G;
   const bool ofInk = WithoutAlpha(format) == Format::G && WithoutAlpha(from) == Format::CMYK;
+  // The rows of a view are its parent's.
+  const bool asStored = format == from && !picture.Parent();
   progress.Begin("writing", height);
   for (std::int32_t y = 0; y < height; ++y, progress.Step()) {
-    if (format == from) {
+    if (asStored) {
       writer.WriteRow(RowOf(picture, y));
       continue;
     }

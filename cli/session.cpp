@@ -72,13 +72,12 @@ void Target::Write(Session& session, const Picture& picture, Format format, Imag
   info.Height = picture.Height();
   info.Pixels = format;
   if (!ProfileFits(info.Profile, format)) info.Profile.clear();
-  {
-    const auto writer = CreateImage(Output->Descriptor(), File, Type, info, session.Writing);
-    WriteFrom(picture, *writer, format, session.Bar);
-    writer->Finish();
-  }
-  Output->Commit();
+  const auto writer = CreateImage(Output->Descriptor(), File, Type, info, session.Writing);
+  WriteFrom(picture, *writer, format, session.Bar);
+  writer->Finish();
 }
+
+void Target::Commit() { Output->Commit(); }
 
 std::int64_t ParseBytes(const std::string& text) {
   double number = 0;
@@ -116,6 +115,16 @@ std::vector<std::int64_t> ParseNumbers(const std::string& option, const std::str
     throw UsageFailure(option + ": " + text + " isn't " + std::to_string(count) + " whole numbers with '" +
                        between + "' between them");
   return numbers;
+}
+
+Color ParseColor(const std::string& option, const std::string& text) {
+  const std::string digits = text.starts_with('#') ? text.substr(1) : text;
+  std::uint32_t colour = 0;
+  const char* end = digits.data() + digits.size();
+  const auto [rest, failed] = std::from_chars(digits.data(), end, colour, 16);
+  if (failed != std::errc() || rest != end || digits.size() != 6)
+    throw UsageFailure(option + ": " + text + " isn't a colour like ff8000");
+  return {std::uint8_t(colour >> 16), std::uint8_t(colour >> 8), std::uint8_t(colour)};
 }
 
 }

@@ -59,6 +59,8 @@ class Target {
   /// Writes and completes the file. `info` tells what else goes into it: a profile only where its colours
   /// fit.
   void Write(Session& session, const Picture& picture, Format format, ImageInfo info);
+  /// The file stands under its name from now on.
+  void Commit();
 
  private:
   std::filesystem::path File;
@@ -72,8 +74,16 @@ std::int64_t ParseBytes(const std::string& text);
 std::vector<std::int64_t> ParseNumbers(const std::string& option, const std::string& text, char between,
                                        std::size_t count);
 
+/// 6 digits of hexadecimal, with or without a # before them. Throws UsageFailure naming the option.
+Color ParseColor(const std::string& option, const std::string& text);
+
+/// Each adds its command to the program.
 void AddScale(CLI::App& app, Session& session);
-void AddInfo(CLI::App& app, Session& session);
 void AddConvert(CLI::App& app, Session& session);
+void AddCrop(CLI::App& app, Session& session);
+void AddCombine(CLI::App& app, Session& session);
+void AddChannels(CLI::App& app, Session& session);
+void AddCompare(CLI::App& app, Session& session);
+void AddInfo(CLI::App& app, Session& session);
 
 }

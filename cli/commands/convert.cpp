@@ -33,6 +33,7 @@ int Convert(Session& session, const ConvertOptions& options) {
   const auto pictures = MakePictures(session.Stores, {source.Size()});
   source.ReadInto(session, pictures[0]);
   target.Write(session, pictures[0], format, source.Upright);
+  target.Commit();
   return Done;
 }
 

@@ -79,6 +79,7 @@ int Scale(Session& session, const ScaleOptions& options) {
   if (!scaled) throw Failure(options.In, "it can't be scaled");
   pictures[0] = pictures[2] = Picture();
   target.Write(session, pictures[1], format, source.Upright);
+  target.Commit();
   return Done;
 }
 

@@ -1,0 +1,68 @@
+#include <CLI/CLI.hpp>
+
+#include "failure.h"
+#include "session.h"
+
+namespace picturezor::cli {
+
+namespace {
+
+struct ChannelsOptions {
+  std::filesystem::path In;
+  std::string Pattern;
+};
+
+std::vector<std::string> ChannelNames(Format format) {
+  std::vector<std::string> names;
+  switch (WithoutAlpha(format)) {
+    case Format::G: names = {"gray"}; break;
+    case Format::RGB: names = {"red", "green", "blue"}; break;
+    default: names = {"cyan", "magenta", "yellow", "black"};
+  }
+  if (HasAlpha(format)) names.push_back("alpha");
+  return names;
+}
+
+int Channels(Session& session, const ChannelsOptions& options) {
+  const auto place = options.Pattern.find("{}");
+  if (place == std::string::npos)
+    throw UsageFailure("-o: " + options.Pattern + " has no {} for the name of the channel");
+  TypeByExtension(options.Pattern);
+  OpenedImage source(session, options.In);
+  const PictureSize size = source.Size();
+  std::vector<std::unique_ptr<Target>> targets;
+  for (const std::string& name : ChannelNames(size.Of)) {
+    std::string file = options.Pattern;
+    file.replace(place, 2, name);
+    targets.push_back(std::make_unique<Target>(file));
+    targets.back()->Start(size.Width, size.Height);
+  }
+  const auto pictures = MakePictures(session.Stores, {size});
+  source.ReadInto(session, pictures[0]);
+  for (std::size_t i = 0; i < targets.size(); ++i)
+    targets[i]->Write(session, pictures[0].Channel(std::int32_t(i)), Format::G, source.Upright);
+  for (const auto& target : targets) target->Commit();
+  return Done;
+}
+
+}
+
+void AddChannels(CLI::App& app, Session& session) {
+  CLI::App* command = app.add_subcommand("channels", "Write each channel to a gray image of its own");
+  command->footer(
+      "Of CMYK white is full ink. The names are gray; red, green, blue; cyan, magenta, yellow, black; and\n"
+      "alpha.\n\n"
+      "Example, which writes photo-red.png, photo-green.png and photo-blue.png:\n"
+      "  picturezor channels photo.jpg -o photo-{}.png");
+  auto options = std::make_shared<ChannelsOptions>();
+  command->add_option("IN", options->In, "Image to read: PNG, JPEG or TIFF")->required()->type_name("");
+  command->add_option("-o,--output", options->Pattern, "Images to write; {} becomes the name of the channel")
+      ->required()
+      ->type_name("PATTERN");
+  AddQualityOption(*command, session);
+  AddStoreOptions(*command, session);
+  command->callback(
+      [&session, options] { session.Work = [&session, options] { return Channels(session, *options); }; });
+}
+
+}
