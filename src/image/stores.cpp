@@ -20,6 +20,8 @@ void InitPageSize() { PageSize = std::max(getpagesize(), 4096); }
 
 namespace {
 
+static_assert(sizeof(off_t) == 8, "a file is larger than the memory that a 32-bit process can address");
+
 constexpr std::int64_t Int32Max = std::numeric_limits<std::int32_t>::max();
 
 /// The bytes that follow the last row of a file, so that its end is backed before anything is mapped.
