@@ -1,5 +1,6 @@
 #include "picturezor/picture.h"
 
+#include <algorithm>
 #include <cstring>
 #include <limits>
 
@@ -77,9 +78,11 @@ Picture::Picture(std::int32_t width, std::int32_t height, Format format) : Objec
 Picture::Picture(const MemoryBlock& block, std::int32_t width, std::int32_t height, Format format,
                  std::int32_t rowSize)
     : Object(NewPictureObject()) {
+  // Rows are read whole, the last one too, and pixels may reach beyond a row that is too short for them.
   if (block && width > 0 && height > 0)
     RequireBytes(block.Data(),
-                 std::int64_t{rowSize} * (height - 1) + std::int64_t{width} * BytesPerPixel(format));
+                 std::int64_t{rowSize} * (height - 1) +
+                     std::max(std::int64_t{rowSize}, std::int64_t{width} * BytesPerPixel(format)));
   Invoke<void>(*this, "Constructor", block, width, height, Code(format), rowSize);
 }
 

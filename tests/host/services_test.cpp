@@ -200,6 +200,8 @@ TEST(Bytes, AreCountedBeforeTheCall) {
   EXPECT_THROW(picture.SetDataStringInFormat(Format::RGB, row), std::invalid_argument);
   EXPECT_THROW(picture.SetRow(0, row), std::invalid_argument);
   EXPECT_THROW(Picture(MemoryBlock(17), 3, 2, Format::RGB, 9), std::invalid_argument);
+  EXPECT_THROW(Picture(MemoryBlock(39), 3, 2, Format::RGB, 20), std::invalid_argument);
+  EXPECT_THROW(Picture(MemoryBlock(12), 3, 2, Format::RGB, 4), std::invalid_argument);
   EXPECT_TRUE(Picture(MemoryBlock(18), 3, 2, Format::RGB, 9).Valid());
   EXPECT_FALSE(Picture(MemoryBlock(18), 3, 2, Format::RGB, -9).Valid());
 }
