@@ -34,6 +34,15 @@ inline std::int64_t PackedRowBytes(const PictureData& picture) {
   return std::int64_t{picture.Width} * picture.PixelSize;
 }
 
+/// Bytes of a stored row to the end of its last pixel, and `RowSize` at least. In a caller's block the pixels
+/// may reach further than the way from row to row; on a clip view the left edge counts.
+inline std::int64_t StoredRowBytes(const PictureData& picture) {
+  const std::int32_t lastOffset =
+      picture.ChannelCount > 0 ? picture.ChannelOffsets[std::size_t(picture.ChannelCount) - 1] : 0;
+  const std::int64_t extent = PackedRowBytes(picture) + lastOffset / picture.PixelSize * picture.PixelSize;
+  return extent > picture.RowSize ? extent : picture.RowSize;
+}
+
 /// The name of a format for people; null for the single planes, the plain buffer and unknown codes.
 const char* FormatName(std::uint32_t format);
 

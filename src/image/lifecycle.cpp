@@ -2,7 +2,6 @@
 
 #include <time.h>
 
-#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <limits>
@@ -52,12 +51,6 @@ PictureZOR* Acceptable(PictureZOR* picture, std::int32_t width, std::int32_t hei
   if (data.Valid && data.Width >= width && data.Height >= height) return picture;
   Unlock(picture);
   return nullptr;
-}
-
-/// Bytes from the start of a stored row to the end of its last pixel; on a clip view the left edge counts.
-std::int64_t RowExtent(const PictureData& data) {
-  const std::int32_t lastOffset = data.ChannelCount > 0 ? data.ChannelOffsets[data.ChannelCount - 1u] : 0;
-  return PackedRowBytes(data) + lastOffset / data.PixelSize * data.PixelSize;
 }
 
 bool CanAllocate(std::size_t size) {
@@ -141,8 +134,7 @@ PictureZOR* Clone(PictureZOR* self) {
   data.RowOffset = data.MappingBlockSize = 0;
 
   // In a caller's block the last row may be longer than the way from row to row.
-  data.TotalSize = std::int64_t{source.RowSize} * (source.Height - 1) +
-                   std::max(std::int64_t{source.RowSize}, RowExtent(source));
+  data.TotalSize = std::int64_t{source.RowSize} * (source.Height - 1) + StoredRowBytes(source);
   if (!UseOwnMemory(data)) {
     data.RowGetter = nullptr;
     data.PixelBase = nullptr;

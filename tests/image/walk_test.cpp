@@ -26,6 +26,18 @@ TEST(RowBand, HoldsTheRowsAround) {
     });
 }
 
+// In a caller's block a row may be longer than the way to the next one.
+TEST(RowBand, HoldsRowsThatOverlap) {
+  const MemoryBlock block(Noise(23).Many(4 * 5 + 9));
+  const Picture picture(block, 3, 6, Format::RGB, 4);
+  zor::RowBand band(DataOf(picture), 1);
+  for (int y = 0; y < 6; ++y) {
+    ASSERT_TRUE(band.MoveTo(y));
+    const auto row = block.Data().subspan(std::size_t(y) * 4, 9);
+    EXPECT_EQ(Samples(band[y], band[y] + 9), Samples(row.begin(), row.end())) << y;
+  }
+}
+
 // A walk that reads what it has written gives the same on a window that moves as in memory.
 TEST(Walk, ReadsAndWritesOnePicture) {
   for (const int down : {1, 2, 6})
