@@ -45,5 +45,8 @@ inline constexpr Service<"PtrToMemoryBlock", MemoryBlock*(void*)> PtrToMemoryBlo
 inline constexpr Service<"REALYieldToRB", void()> REALYieldToRB;
 inline constexpr Service<"REALFSRefFromFolderItem", unsigned char(FolderItem*, void*, void*)>
     REALFSRefFromFolderItem;
+inline constexpr Service<"RuntimeUBound", std::int32_t(IntegerArray*)> RuntimeUBound;
+inline constexpr Service<"RuntimeDirectReadIntArray", std::int32_t(IntegerArray*, std::int32_t)>
+    RuntimeDirectReadIntArray;
 
 }

@@ -1,0 +1,180 @@
+#include <benchmark/benchmark.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <cstring>
+#include <fstream>
+#include <iostream>
+#include <map>
+#include <memory>
+#include <utility>
+
+#include "picturezor/host.h"
+#include "race.h"
+
+// Runs the races and prints a table a room: medians, and ours as a multiple of each other's.
+
+namespace picturezor::bench {
+namespace {
+
+struct Race {
+  std::string Room, Work;
+  std::vector<std::string> Names;
+};
+
+std::vector<Race>& Races() {
+  static std::vector<Race> races;
+  return races;
+}
+
+std::map<std::string, std::string>& Peers() {
+  static std::map<std::string, std::string> peers;
+  return peers;
+}
+
+std::string Key(const std::string& room, const std::string& work, const std::string& name) {
+  return room + "/" + work + "/" + name;
+}
+
+/// Keeps every timing, in milliseconds; the other reporter shows that it goes on.
+class Collector : public benchmark::ConsoleReporter {
+ public:
+  Collector() : ConsoleReporter(OO_None) {
+    SetOutputStream(&std::cerr);
+    SetErrorStream(&std::cerr);
+  }
+  void ReportRuns(const std::vector<Run>& runs) override {
+    for (const Run& run : runs)
+      if (run.run_type == Run::RT_Iteration && !run.error_occurred)
+        Timings[run.run_name.function_name].push_back(run.GetAdjustedRealTime());
+    ConsoleReporter::ReportRuns(runs);
+  }
+  /// The median of a contender; negative where it didn't run.
+  double Median(const std::string& key) {
+    std::vector<double>& times = Timings[key];
+    if (times.empty()) return -1;
+    std::ranges::nth_element(times, times.begin() + std::ptrdiff_t(times.size() / 2));
+    return times[times.size() / 2];
+  }
+
+ private:
+  std::map<std::string, std::vector<double>> Timings;
+};
+
+std::string Processor() {
+  std::ifstream file("/proc/cpuinfo");
+  for (std::string line; std::getline(file, line);)
+    if (line.starts_with("model name")) return line.substr(line.find(':') + 2);
+  return "an unknown processor";
+}
+
+void PrintRoom(const std::string& room, Collector& times) {
+  std::vector<std::string> names;
+  for (const Race& race : Races())
+    if (race.Room == room)
+      for (const std::string& name : race.Names)
+        if (std::ranges::find(names, name) == names.end()) names.push_back(name);
+  std::printf("\n## %s\n\n| |", room.c_str());
+  for (const std::string& name : names) std::printf(" %s |", name.c_str());
+  std::printf("\n|---|");
+  for (std::size_t i = 0; i < names.size(); ++i) std::printf("--:|");
+  std::printf("\n");
+  for (const Race& race : Races()) {
+    if (race.Room != room) continue;
+    const double ours = times.Median(Key(room, race.Work, race.Names[0]));
+    if (ours < 0) continue;
+    std::printf("| %s |", race.Work.c_str());
+    for (const std::string& name : names) {
+      const double time = times.Median(Key(room, race.Work, name));
+      if (time < 0)
+        std::printf(" |");
+      else if (name == race.Names[0])
+        std::printf(" **%.3g** |", time);
+      else
+        std::printf(" %.3g (%.2f) |", time, ours / time);
+    }
+    std::printf("\n");
+  }
+}
+
+void PrintTables(Collector& times) {
+  std::printf("Machine: %s. Compiler: %s.", Processor().c_str(), PICTUREZOR_COMPILER);
+  const char* between = " Peers: ";
+  for (const auto& [name, version] : Peers())
+    std::printf("%s%s %s", std::exchange(between, ", "), name.c_str(), version.c_str());
+  std::printf("\n\nMilliseconds, medians; in parentheses PictureZOR's time divided by the other's.\n");
+  std::vector<std::string> rooms;
+  for (const Race& race : Races())
+    if (std::ranges::find(rooms, race.Room) == rooms.end()) rooms.push_back(race.Room);
+  std::ranges::sort(rooms);
+  for (const std::string& room : rooms) PrintRoom(room, times);
+}
+
+}
+
+bool AddRace(const std::string& room, const std::string& work, std::vector<Contender> contenders) {
+  Race race{room, work, {}};
+  for (Contender& contender : contenders) {
+    race.Names.push_back(contender.Name);
+    const auto run = [prepare = std::move(contender.Prepare)](benchmark::State& state) {
+      const auto work = prepare();
+      work();
+      for ([[maybe_unused]] auto _ : state) work();
+    };
+    benchmark::RegisterBenchmark(Key(room, work, contender.Name).c_str(), run)
+        ->Unit(benchmark::kMillisecond)
+        ->UseRealTime();
+  }
+  Races().push_back(std::move(race));
+  return true;
+}
+
+bool NamePeer(const std::string& name, const std::string& version) {
+  Peers()[name] = version;
+  return true;
+}
+
+Picture TestPicture(Format format, int width, int height) {
+  const Picture picture(width, height, format);
+  const int pixelSize = BytesPerPixel(format);
+  Bytes row(std::size_t(picture.RowSize()));
+  std::uint32_t noise = 1;
+  for (int y = 0; y < height; ++y) {
+    for (int x = 0; x < width; ++x)
+      for (int c = 0; c < pixelSize; ++c) {
+        noise = noise * 1664525 + 1013904223;
+        const int shape = (x * (3 + c) / 16 ^ y * (5 - c) / 16) & 127;
+        row[std::size_t(x * pixelSize + c)] = std::uint8_t(shape + (noise >> 26) + (x + y) / 64);
+      }
+    picture.SetRow(y, row);
+  }
+  return picture;
+}
+
+Contender Memcpy(std::size_t bytes) {
+  return {"memcpy", [bytes] {
+            auto from = std::make_shared<Bytes>(bytes, 1), into = std::make_shared<Bytes>(bytes, 2);
+            return [from, into] {
+              std::memcpy(into->data(), from->data(), into->size());
+              benchmark::ClobberMemory();
+            };
+          }};
+}
+
+}
+
+int main(int count, char** arguments) {
+  // Repetitions in random order, so that a machine that slows down slows all contenders.
+  std::vector<char*> all{arguments[0]};
+  for (const char* given : {"--benchmark_enable_random_interleaving=true", "--benchmark_repetitions=9",
+                            "--benchmark_min_time=0.05"})
+    all.push_back(const_cast<char*>(given));
+  all.insert(all.end(), arguments + 1, arguments + count);
+  int allCount = int(all.size());
+  benchmark::Initialize(&allCount, all.data());
+  if (benchmark::ReportUnrecognizedArguments(allCount, all.data())) return 1;
+  picturezor::Host::Load(PICTUREZOR_MODULE);
+  picturezor::bench::Collector collector;
+  benchmark::RunSpecifiedBenchmarks(&collector);
+  picturezor::bench::PrintTables(collector);
+}
