@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sys/mman.h>
+#include <sys/statvfs.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -51,9 +52,18 @@ void EndStore(Store* store) {
   std::free(store);
 }
 
+/// Whether the file system says that it has this many bytes left. Asked before a block is taken: a file that
+/// can't fit would fill the disk first and fail then, and others would find it full meanwhile.
+bool HasRoom(int fileDescriptor, std::int64_t bytes) {
+  struct statvfs system {};
+  if (fstatvfs(fileDescriptor, &system) != 0 || system.f_frsize == 0) return true;
+  return std::uint64_t(bytes) / system.f_frsize <= system.f_bavail;
+}
+
 /// Gives the file its size, with every block reserved: a sparse page that can't be backed later would end the
 /// process in the middle of a row.
 bool ReserveFile(int fileDescriptor, std::int64_t total) {
+  if (!HasRoom(fileDescriptor, total)) return false;
   if (ftruncate(fileDescriptor, off_t(total + PageSize)) != 0) return false;
   if (lseek(fileDescriptor, off_t(total), SEEK_SET) != off_t(total)) return false;
   static constexpr char zeros[TailSize] = {};
