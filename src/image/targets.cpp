@@ -9,7 +9,8 @@ Target BestTarget() {
   const bool avx2 = __builtin_cpu_supports("avx2") && __builtin_cpu_supports("fma");
   if (avx2 && __builtin_cpu_supports("avx512f") && __builtin_cpu_supports("avx512bw") &&
       __builtin_cpu_supports("avx512vl") && __builtin_cpu_supports("avx512dq"))
-    return __builtin_cpu_supports("avx512vbmi") ? Target::AVX512VBMI : Target::AVX512;
+    return __builtin_cpu_supports("avx512vbmi") && __builtin_cpu_supports("avx512vnni") ? Target::AVX512VBMI
+                                                                                        : Target::AVX512;
   if (avx2) return Target::AVX2;
 #endif
   return Target::Plain;
