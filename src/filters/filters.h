@@ -11,4 +11,75 @@ inline constexpr ConstantRecord DitherConstants[] = {
     {"DitherCluster8Matrix", 0, 10},
 };
 
+// Filters that look at one sample at a time. Those with a `dest` take it as RunFilter does: nil makes a new
+// picture, `dest` may be the source, and the result is the destination with a reference for the caller, or
+// nil. A group that a filter doesn't serve leaves the destination as it is.
+
+/// 255 - v for every sample of the rectangle, alpha included, in place.
+void Invert(PictureZOR* self, Integer x, Integer y, Integer w, Integer h);
+void Invert(PictureZOR* self);
+
+/// Stretches the levels of an RGB picture's rectangle, in place, so that about half a percent of its pixels
+/// becomes black and as many white. Luma counts, with its own weights of 0.177, 0.813 and 0.01; red, green
+/// and blue are stretched alike, alpha isn't touched. False for another family, an empty rectangle, or when a
+/// row can't be reached.
+Boolean AutoLevel(PictureZOR* self, Integer x, Integer y, Integer w, Integer h);
+Boolean AutoLevel(PictureZOR* self);
+
+/// Darkest in the middle and bright at both ends, all planes alike, alpha included.
+PictureZOR* SolarizeFilter(PictureZOR* self, PictureZOR* dest);
+
+/// 255 (v / 255)^(1 / gamma) to the nearest, for gray and RGB. Alpha is written only by those with an
+/// `alphaGamma`. Of three gammas a gray picture takes the weighted mean of their whole parts, truncated.
+PictureZOR* GammaFilter(PictureZOR* self, PictureZOR* dest, Double gamma);
+PictureZOR* GammaFilter(PictureZOR* self, PictureZOR* dest, Double gamma, Double alphaGamma);
+PictureZOR* GammaFilter(PictureZOR* self, PictureZOR* dest, Double redGamma, Double greenGamma,
+                        Double blueGamma);
+PictureZOR* GammaFilter(PictureZOR* self, PictureZOR* dest, Double redGamma, Double greenGamma,
+                        Double blueGamma, Double alphaGamma);
+
+/// An S-shaped curve through the middle, steeper with more `gain`, and then one that lifts with more `bias`;
+/// 0.5 and 0.5 leave all as it is, within 1. For gray and RGB, alpha included.
+PictureZOR* GainFilter(PictureZOR* self, PictureZOR* dest, Double gain, Double bias);
+
+/// Sends each plane of a gray or RGB picture through the low 8 bits of an array's first 256 elements; what
+/// the array doesn't have is 0, and nil has nothing. A gray picture takes `green` of three. Alpha is written
+/// only by those with an `alpha`.
+PictureZOR* TransferFilter(PictureZOR* self, PictureZOR* dest, IntegerArray* gray);
+PictureZOR* TransferFilter(PictureZOR* self, PictureZOR* dest, IntegerArray* gray, IntegerArray* alpha);
+PictureZOR* TransferFilter(PictureZOR* self, PictureZOR* dest, IntegerArray* red, IntegerArray* green,
+                           IntegerArray* blue);
+PictureZOR* TransferFilter(PictureZOR* self, PictureZOR* dest, IntegerArray* red, IntegerArray* green,
+                           IntegerArray* blue, IntegerArray* alpha);
+
+/// Pushes each sample away from that of `origpixels`, a blurred copy as a rule, by 4 `Amount` times their
+/// difference, alpha included; differences below `Threshold` are left alone. In place. False unless both
+/// pictures are usable and of one size and format, or when a row can't be reached.
+Boolean UnsharpFilter(PictureZOR* self, PictureZOR* origpixels, Double Amount, Integer Threshold);
+
+/// Ordered dithering of gray and RGB to `levels` evenly spaced levels, alpha included. `levels` below 2 count
+/// as 2, above 256 as 256; a `matrix` that isn't one of the constants leaves the destination as it is.
+PictureZOR* DitherFilter(PictureZOR* self, PictureZOR* dest, Integer matrix, Integer levels);
+
+// clang-format off
+inline constexpr MethodRow FilterMethods[] = {
+    Method<26, "SolarizeFilter(dest as PictureZOR) as PictureZOR", SolarizeFilter>,
+    Method<27, "GammaFilter(dest as PictureZOR, redGamma as double, greenGamma as double, blueGamma as double) as PictureZOR", GammaFilter>,
+    Method<28, "GammaFilter(dest as PictureZOR, redGamma as double, greenGamma as double, blueGamma as double, alphaGamma as double) as PictureZOR", GammaFilter>,
+    Method<29, "GammaFilter(dest as PictureZOR, gamma as double) as PictureZOR", GammaFilter>,
+    Method<30, "GammaFilter(dest as PictureZOR, gamma as double, alphaGamma as double) as PictureZOR", GammaFilter>,
+    Method<31, "DitherFilter(dest as PictureZOR, matrix as integer, levels as integer) as PictureZOR", DitherFilter>,
+    Method<32, "GainFilter(dest as PictureZOR, gain as double, bias as double) as PictureZOR", GainFilter>,
+    Method<34, "TransferFilter(dest as PictureZOR, red() as integer, green() as integer, blue() as integer) as PictureZOR", TransferFilter>,
+    Method<35, "TransferFilter(dest as PictureZOR, red() as integer, green() as integer, blue() as integer, alpha() as integer) as PictureZOR", TransferFilter>,
+    Method<36, "TransferFilter(dest as PictureZOR, gray() as integer) as PictureZOR", TransferFilter>,
+    Method<37, "TransferFilter(dest as PictureZOR, gray() as integer, alpha() as integer) as PictureZOR", TransferFilter>,
+    Method<38, "UnsharpFilter(origpixels as PictureZOR, Amount as double, Threshold as integer) as boolean", UnsharpFilter>,
+    Method<56, "Invert", Invert>,
+    Method<57, "Invert(x as integer, y as integer, w as integer, h as integer)", Invert>,
+    Method<58, "AutoLevel as boolean", AutoLevel>,
+    Method<59, "AutoLevel(x as integer, y as integer, w as integer, h as integer) as boolean", AutoLevel>,
+};
+// clang-format on
+
 }

@@ -11,8 +11,8 @@
 namespace zor {
 namespace {
 
-constexpr auto Methods = InTableOrder(ImageMethods);
-static_assert(Methods.size() == 27);
+constexpr auto Methods = InTableOrder(ImageMethods, FilterMethods);
+static_assert(Methods.size() == 43);
 MethodRecord MethodTable[Methods.size()];
 
 constexpr auto SharedMethods = InTableOrder(SharedPictureMethods);

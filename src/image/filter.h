@@ -30,7 +30,7 @@ struct FilterCall {
 /// The way into every method with a `dest`. Takes `dest`, or makes a picture of the source's size and format,
 /// and runs body once if the source's group is served. The result is the destination with a reference for the
 /// caller. Nil when a picture isn't usable, when `dest` is smaller than the result or lacks a plane that
-/// would be written, or when it is the source and may not be.
+/// would be written, when it is the source and may not be, or when a body that gives a Boolean gives false.
 template <class Body>
 PictureZOR* RunFilter(PictureZOR* self, PictureZOR* dest, const FilterRules& rules, Body&& body) {
   PictureData& source = DataOf(self);
@@ -46,9 +46,13 @@ PictureZOR* RunFilter(PictureZOR* self, PictureZOR* dest, const FilterRules& rul
   if (rules.Groups == FilterRules::GrayAndRGB && group >= Group::CMYK) group = Group::None;
   if (!HasPlanes(group, into, rules.WritesAlpha)) return nullptr;
   MayYield(into);
-  if (group != Group::None)
-    body(FilterCall{source, into, group, PlanesOf(group, source), PlanesOf(group, into),
-                    SharePixels(source, into)});
+  if (group == Group::None) return result.HandOn();
+  const FilterCall call{
+      source, into, group, PlanesOf(group, source), PlanesOf(group, into), SharePixels(source, into)};
+  if constexpr (std::is_void_v<decltype(body(call))>)
+    body(call);
+  else if (!body(call))
+    return nullptr;
   return result.HandOn();
 }
 
