@@ -11,8 +11,8 @@
 namespace zor {
 namespace {
 
-constexpr auto Methods = InTableOrder(ImageMethods, FilterMethods);
-static_assert(Methods.size() == 43);
+constexpr auto Methods = InTableOrder(ImageMethods, ScaleMethods, FilterMethods);
+static_assert(Methods.size() == 46);
 MethodRecord MethodTable[Methods.size()];
 
 constexpr auto SharedMethods = InTableOrder(SharedPictureMethods);

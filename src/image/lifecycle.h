@@ -31,6 +31,10 @@ class Held {
  public:
   explicit Held(PictureZOR* object) : Of(object) {}
   Held(Held&& other) : Of(other.HandOn()) {}
+  Held& operator=(Held&& other) {
+    std::swap(Of, other.Of);
+    return *this;
+  }
   ~Held() { Unlock(Of); }
   explicit operator bool() const { return Of != nullptr; }
   PictureData& Data() const { return DataOf(Of); }

@@ -1,0 +1,44 @@
+#include "race.h"
+
+// Scaling, beside what a user would pick instead for the same work: antialiased, two passes, 8 bits.
+
+namespace picturezor::bench {
+namespace {
+
+struct Sizes {
+  const char* Name;
+  int FromWidth, FromHeight, IntoWidth, IntoHeight;
+};
+constexpr Sizes AllSizes[] = {{"to a quarter", 4000, 3000, 1000, 750},
+                              {"to three quarters", 4000, 3000, 3000, 2250},
+                              {"up by 4", 1000, 750, 4000, 3000}};
+constexpr std::pair<const char*, Kernel> Kernels[] = {{"triangle", Kernel::Triangle},
+                                                      {"box", Kernel::Box},
+                                                      {"Lanczos 3", Kernel::Lanczos3},
+                                                      {"Lanczos 8", Kernel::Lanczos8}};
+constexpr std::pair<const char*, Format> Formats[] = {
+    {"RGB", Format::RGB}, {"RGBA", Format::RGBA}, {"gray", Format::G}};
+
+Contender Ours(const char* name, Format format, Kernel kernel, const Sizes& sizes, int threads) {
+  return {name, [=] {
+            return [=, source = TestPicture(format, sizes.FromWidth, sizes.FromHeight),
+                    dest = Picture(sizes.IntoWidth, sizes.IntoHeight, format)] {
+              threads == 1 ? dest.Scale(source, {}, kernel, sizes.IntoWidth, sizes.IntoHeight)
+                           : dest.ScaleMT(threads, source, {}, kernel, sizes.IntoWidth, sizes.IntoHeight);
+            };
+          }};
+}
+
+const auto registered = [] {
+  for (const auto& [formatName, format] : Formats)
+    for (const Sizes& sizes : AllSizes)
+      for (const auto& [kernelName, kernel] : Kernels)
+        AddRace("scale", std::string(formatName) + " " + sizes.Name + ", " + kernelName,
+                {Ours("PictureZOR", format, kernel, sizes, 1),
+                 Ours("PictureZOR, 2 threads", format, kernel, sizes, 2),
+                 Memcpy(std::size_t(sizes.FromWidth) * sizes.FromHeight * BytesPerPixel(format))});
+  return true;
+}();
+
+}
+}

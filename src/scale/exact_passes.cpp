@@ -1,0 +1,150 @@
+#include "scale/exact_passes.h"
+
+#include <algorithm>
+
+#include "image/targets.h"
+#include "image/walk.h"
+
+namespace zor {
+namespace {
+
+// Eight sums side by side, whatever the instruction set: of one pixel of a few rows, all channels of it.
+constexpr int Lanes = 8;
+using DoubleLanes [[gnu::vector_size(Lanes * sizeof(double))]] = double;
+
+/// Source pixels that are held widened at a time.
+constexpr int Window = 128;
+
+constexpr double RedShare = 0.3, GreenShare = 0.59, BlueShare = 0.11;
+
+constexpr int LanesOf(int channels) { return channels == 3 ? 4 : channels == 5 ? 8 : channels; }
+
+/// What the loop over a few rows works on.
+struct RowsInHand {
+  const Sample* const* From;
+  Sample* const* Into;
+  int Rows;
+};
+
+/// Pixels of a few rows as doubles, lane r * LanesOf(channels) + c being channel c of row r. Luma has three
+/// terms a pixel, other channels the first.
+template <int Terms>
+class WidePixels {
+ public:
+  WidePixels(const RowsInHand& rows, const ScalePair& pair, std::int32_t end)
+      : Rows(rows), Pair(pair), SourceEnd(end) {}
+
+  /// Makes sure of pixels from `first` on, up to `last` if so many fit.
+  void Need(std::int32_t first, std::int32_t last) {
+    if (first >= First && last < End) return;
+    if (first >= First && first < End && last - first >= Window) return;
+    First = first;
+    End = std::min(SourceEnd, first + std::min(Window, SourceEnd - first));
+    for (std::int32_t x = First; x < End; ++x)
+      for (int r = 0; r < Rows.Rows; ++r) Widen(Rows.From[r], x, r * LanesOf(Pair.Channels));
+  }
+  bool Has(std::int32_t x) const { return x >= First && x < End; }
+  const DoubleLanes* At(std::int32_t x) const { return Of[x - First]; }
+
+ private:
+  void Widen(const Sample* row, std::int32_t x, int lane) {
+    const Sample* pixel = row + std::ptrdiff_t{x} * Pair.Source.Step;
+    DoubleLanes* terms = Of[x - First];
+    const auto sample = [&](int plane) { return double(pixel[Pair.Source.Offset[plane]]); };
+    if constexpr (Terms == 3) {
+      terms[0][lane] = sample(0) * RedShare;
+      terms[1][lane] = sample(1) * GreenShare;
+      terms[2][lane] = sample(2) * BlueShare;
+      if (Pair.Channels == 2) terms[0][lane + 1] = sample(3);
+    } else {
+      for (int c = 0; c < Pair.Channels; ++c) terms[0][lane + c] = sample(c);
+    }
+  }
+
+  const RowsInHand& Rows;
+  const ScalePair& Pair;
+  std::int32_t SourceEnd, First = 0, End = 0;
+  DoubleLanes Of[Window][Terms] = {};
+};
+
+/// Stores one pixel of each row, zero bytes included.
+void StorePixel(const RowsInHand& rows, const ScalePair& pair, std::int32_t x, const DoubleLanes& sums,
+                float divisor) {
+  for (int r = 0; r < rows.Rows; ++r) {
+    Sample channels[5];
+    for (int c = 0; c < pair.Channels; ++c)
+      channels[c] = ExactQuotient(sums[r * LanesOf(pair.Channels) + c], divisor);
+    Sample* pixel = rows.Into[r] + std::ptrdiff_t{x} * pair.TempBytes;
+    for (int b = 0; b < pair.TempBytes; ++b)
+      pixel[b] = pair.ChannelOfByte[b] == ScalePair::Zero ? 0 : channels[pair.ChannelOfByte[b]];
+  }
+}
+
+template <int Terms>
+void SumRows(const RowsInHand* rows, const ScalePair* pair, const ContributionTable* table) {
+  std::int32_t end = 0;
+  for (std::int32_t x = 0; x < table->Count(); ++x)
+    if (const Contribution& line = (*table)[x]; line.Count > 0)
+      end = std::max(end, line.Entries[line.Count - 1].Pixel + 1);
+  WidePixels<Terms> wide(*rows, *pair, end);
+  for (std::int32_t x = 0; x < table->Count(); ++x) {
+    const Contribution& line = (*table)[x];
+    DoubleLanes sums = {};
+    for (std::int32_t i = 0; i < line.Count;) {
+      wide.Need(line.Entries[i].Pixel, line.Entries[line.Count - 1].Pixel);
+      for (; i < line.Count && wide.Has(line.Entries[i].Pixel); ++i) {
+        const double weight = line.Entries[i].Weight;
+        const DoubleLanes* terms = wide.At(line.Entries[i].Pixel);
+        for (int t = 0; t < Terms; ++t) sums += weight * terms[t];
+      }
+    }
+    StorePixel(*rows, *pair, x, sums, line.Sum);
+  }
+}
+constexpr auto SumPlanes = SumRows<1>, SumLuma = SumRows<3>;
+
+void AddScaled(double* sums, const Sample* row, int count, double weight) {
+  for (int i = 0; i < count; ++i) sums[i] += weight * row[i];
+}
+
+void StoreQuotients(const double* sums, double divisor, int count, Sample* into) {
+  for (int i = 0; i < count; ++i) {
+    const double quotient = sums[i] / divisor;
+    const double least = quotient > 0.0 ? quotient : 0.0;
+    into[i] = Sample(std::int32_t(least < 255.0 ? least : 255.0));
+  }
+}
+
+}
+
+Sample ExactQuotient(double sum, float divisor) {
+  Sample sample;
+  StoreQuotients(&sum, divisor, 1, &sample);
+  return sample;
+}
+
+int RowsTogether(int channels) { return Lanes / LanesOf(channels); }
+
+void ExactHorizontal(const Sample* const* from, Sample* const* into, int rows, const ScalePair& pair,
+                     const ContributionTable& table) {
+  const RowsInHand inHand{from, into, rows};
+  if (pair.Luma)
+    OnBestTarget<SumLuma>(&inHand, &pair, &table);
+  else
+    OnBestTarget<SumPlanes>(&inHand, &pair, &table);
+}
+
+void ExactVertical(PictureData& temp, const Contribution& line, std::ptrdiff_t first, int count,
+                   Sample* into) {
+  double sums[ExactTile] = {};
+  for (std::int32_t i = 0; i < line.Count; ++i) {
+    const double weight = line.Entries[i].Weight;
+    if (weight == 0.0) continue;
+    WithRow(temp, line.Entries[i].Pixel,
+            [&](const Sample* row) { OnBestTarget<AddScaled>(&sums[0], row + first, count, weight); });
+  }
+  const double divisor = line.Sum;
+  OnBestTarget<StoreQuotients>(&sums[0], divisor, count, into);
+}
+
+}

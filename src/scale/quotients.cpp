@@ -1,0 +1,119 @@
+#include "scale/quotients.h"
+
+#include <cmath>
+#include <numeric>
+
+namespace zor {
+namespace {
+
+constexpr double LatticeUnit = 4096.0;  // 2^12 multiples make 1
+constexpr float Disturbing = 0x1p-40F;
+
+/// The weight as a multiple of the lattice's unit; a disturbing one is 0 of them. False for none.
+bool Multiple(float weight, std::int64_t& multiple) {
+  multiple = 0;
+  if (weight > 0.0F && weight < Disturbing) return true;
+  const double units = double(weight) * LatticeUnit;
+  if (!(std::fabs(units) < 0x1p30) || units != std::floor(units)) return false;
+  multiple = std::int64_t(units);
+  return true;
+}
+
+/// How far a line's shares lie from what they stand for, and how large they are, summed up.
+struct Shares {
+  double Error = 0.0, Size = 0.0;
+  void Add(double share, double exact) {
+    Error += std::fabs(share - exact);
+    Size += std::fabs(share);
+  }
+};
+
+std::int64_t RoundedUp(std::int64_t a, std::int64_t b) { return a >= 0 ? (a + b - 1) / b : -(-a / b); }
+
+}
+
+Lattice LatticeOf(const Contribution& line) {
+  std::int64_t units = 0;
+  if (!Multiple(line.Sum, units) || units <= 0) return {};
+  std::int64_t divisor = units;
+  double disturbance = 0.0;
+  for (std::int32_t i = 0; i < line.Count; ++i) {
+    std::int64_t multiple = 0;
+    if (!Multiple(line.Entries[i].Weight, multiple)) return {};
+    divisor = std::gcd(divisor, multiple);
+    if (multiple == 0) disturbance += double(line.Entries[i].Weight) * 255.0 / line.Sum;
+  }
+  return {units / divisor, disturbance};
+}
+
+bool AlwaysInDoubt(const Contribution& line) {
+  if (line.Count == 0) return false;
+  if (!(line.Sum > 0.0F)) return true;
+  double largest = 0.0, all = 0.0;
+  for (std::int32_t i = 0; i < line.Count; ++i) {
+    const double size = std::fabs(double(line.Entries[i].Weight));
+    all += size;
+    largest = size > largest ? size : largest;
+  }
+  return line.Count > 1 && (all - largest) * 255.0 < line.Sum * 0x1p-8;
+}
+
+bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLine& made) {
+  made = {0, 0};
+  if (line.Count == 0) return true;
+  if (!(line.Sum > 0.0F)) return false;
+  constexpr double One = 1 << FixedPointLine::Bits;
+  constexpr double Largest = 127 * 65536.0;
+  const Lattice lattice = LatticeOf(line);
+  // Each share is rounded up by less than 1, so a quotient grows by less than 255 n / One.
+  const bool onLattice =
+      lattice.Denominator > 0 &&
+      (255.0 * line.Count + lattice.Disturbance * One + 2.0) * double(lattice.Denominator) < One;
+  if (!onLattice && AlwaysInDoubt(line)) return false;
+  std::int64_t sum = 0;
+  if (onLattice) Multiple(line.Sum, sum);
+  Shares sizes;
+  for (std::int32_t i = 0; i < line.Count; ++i) {
+    const double exact = double(line.Entries[i].Weight) / line.Sum * One;
+    if (!(std::fabs(exact) < Largest)) return false;
+    if (onLattice) {
+      std::int64_t multiple = 0;
+      Multiple(line.Entries[i].Weight, multiple);
+      shares[i] = std::int32_t(RoundedUp(multiple << FixedPointLine::Bits, sum));
+    } else {
+      shares[i] = std::int32_t(std::floor(exact + 0.5));
+    }
+    sizes.Add(shares[i], exact);
+  }
+  const double bound = std::floor(sizes.Error * 255.0) + 3.0;
+  if (!(sizes.Size * 255.0 + 2.0 * bound < 2147483647.0) || !(bound < One / 4)) return false;
+  if (!onLattice) made = {std::int32_t(bound), 2 * std::uint32_t(bound) + 1};
+  return true;
+}
+
+bool MakeFloat(const Contribution& line, float* shares, FloatLine& made) {
+  made = {0.0F, 0.0F};
+  if (line.Count == 0) return true;
+  if (!(line.Sum > 0.0F)) return false;
+  Shares sizes;
+  for (std::int32_t i = 0; i < line.Count; ++i) {
+    const double exact = double(line.Entries[i].Weight) / line.Sum;
+    shares[i] = float(exact);
+    sizes.Add(shares[i], exact);
+  }
+  // A product and a sum an entry round by 2^-24 of what they give at most; N. J. Higham, "Accuracy and
+  // Stability of Numerical Algorithms", 2002, lemma 3.1. 2^-14 covers the roundings of Start and Gap.
+  const double rounding = (line.Count + 3) * 0x1p-24 * 1.01;
+  const double bound = 255.0 * (sizes.Error + sizes.Size * rounding) + 0x1p-14;
+  if (!(sizes.Size < 64.0)) return false;
+  const Lattice lattice = LatticeOf(line);
+  if (lattice.Denominator > 0 && (2.0 * bound + lattice.Disturbance) * double(lattice.Denominator) < 0.5) {
+    made.Start = float(bound + lattice.Disturbance);
+    return true;
+  }
+  if (AlwaysInDoubt(line) || !(bound < 0.125)) return false;
+  made = {float(-bound), float(2.0 * bound)};
+  return true;
+}
+
+}

@@ -1,0 +1,58 @@
+#pragma once
+#include <cstdint>
+
+#include "scale/contributions.h"
+
+namespace zor {
+
+// Why sums in narrower arithmetic give the same bytes as the plain form.
+//
+// Let q be the real quotient of a line: the sum over its entries of w s, divided by its Sum S, for samples s
+// of 0 to 255. The plain form computes q but for its own roundings, relatively below (n + 2) 2^-53 for n
+// entries; it then cuts off and clamps. A fast form computes q' from rounded shares u = w / S and knows a
+// bound E with |q' - q| <= E, the roundings of the plain form included. There are two kinds of lines.
+//
+// In general, the plain form's byte is that of every number between q' - E and q' + E as soon as the bytes of
+// these two are the same, since cutting off and clamping never decrease. Where they differ, q' lies within E
+// of a whole number from 1 to 255: the sample is in doubt, and the plain form makes it. With E near 1/2000
+// that is one sample in a thousand of a picture that isn't flat.
+//
+// On a lattice, all weights are whole multiples m 2^-12 and so is S, as with boxes, and with triangles of
+// simple ratios; then with N the denominator that they leave, every q is a multiple of 1/N and whole numbers
+// are common. The sum of m 2^-12 s is exact in the plain form, and the division rounds no quotient of two
+// such numbers across a whole one. If 0 <= q' - q < 1/N, the whole number below q' is that below q, and
+// nothing is ever in doubt. Weights that ought to be 0 and came out as some 2^-54 disturb a lattice; as long
+// as they are positive, they only add to q, and their part counts in the bound of q' - q.
+
+/// The lattice of a line: N, and what its disturbing weights may add to a quotient; N is 0 off any lattice.
+struct Lattice {
+  std::int64_t Denominator;
+  double Disturbance;
+};
+Lattice LatticeOf(const Contribution& line);
+
+/// Whether almost all of a line comes from one source line, so that its quotients are nearly whole numbers
+/// and always in doubt off a lattice; or it has a Sum that nothing can be said about.
+bool AlwaysInDoubt(const Contribution& line);
+
+/// A line in whole numbers: q' = sum of Share s / 2^Bits. The sums fit 32 bits.
+struct FixedPointLine {
+  static constexpr int Bits = 22;
+  /// Added to the sum before it is cut off: E of a line in general, 0 on a lattice.
+  std::int32_t Bias;
+  /// The sample is in doubt where the Bits low bits of the biased sum are below this.
+  std::uint32_t Doubtful;
+};
+/// The shares of a line, one an entry. False where they don't fit, or the line is always in doubt.
+bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLine& made);
+
+/// A line in single precision: q' = Start + sum of share s, in the order of the entries.
+struct FloatLine {
+  /// Off a lattice q' - E; the sample is in doubt if q' + Gap becomes another byte. On a lattice no less
+  /// than q, and Gap is 0.
+  float Start, Gap;
+};
+/// The shares of a line, one an entry. False where the line is always in doubt.
+bool MakeFloat(const Contribution& line, float* shares, FloatLine& made);
+
+}
