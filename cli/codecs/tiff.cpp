@@ -61,7 +61,10 @@ class DecodedStrips : public PlaneSource {
     if (File->Get<std::uint16_t>(TIFFTAG_COMPRESSION, 1) == COMPRESSION_JPEG)
       File->Set(TIFFTAG_JPEGCOLORMODE, JPEGCOLORMODE_RGB);
     File->ReadingPixels();
-    Line.resize(std::size_t(TIFFScanlineSize64(*File)));
+    // By the number of its samples a pixel, a row can be far larger than the picture made of it.
+    const std::uint64_t rowBytes = TIFFScanlineSize64(*File);
+    RequireWithinLimit(file, std::int64_t(rowBytes), memoryLimit, "a row of this TIFF");
+    Line.resize(std::size_t(rowBytes));
   }
 
   const std::uint8_t* Row(std::int64_t y) override {

@@ -24,8 +24,12 @@ std::size_t RowBytes(const Picture& picture) {
   return std::size_t(picture.Width()) * std::size_t(picture.PixelSize());
 }
 
-/// Gives a mapped picture a window of five rows, the fewest that the module promises itself. Asked for, a
-/// window has at least 16 MiB, so that none would ever move under a picture as small as a test's.
+}
+
+zor::PictureData& DataOf(const Picture& picture) {
+  return *reinterpret_cast<zor::PictureData*>(model::InstanceOf(picture.Address()));
+}
+
 void MakeWindowSmall(const Picture& picture) {
   auto& data = DataOf(picture);
   munmap(data.PixelBase, std::size_t(data.MappingBlockSize));
@@ -35,12 +39,6 @@ void MakeWindowSmall(const Picture& picture) {
   data.WindowMapped = false;
   data.WindowFirstRow = data.WindowLastRow = -1;
   data.RowGetter(&data, 0);
-}
-
-}
-
-zor::PictureData& DataOf(const Picture& picture) {
-  return *reinterpret_cast<zor::PictureData*>(model::InstanceOf(picture.Address()));
 }
 
 TemporaryFile::TemporaryFile() {

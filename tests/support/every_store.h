@@ -59,6 +59,10 @@ class TemporaryFile {
 /// The instance data of a picture, for what can't be seen from outside.
 zor::PictureData& DataOf(const Picture& picture);
 
+/// Gives a mapped picture a window of five rows, the fewest that the module promises itself. Asked for, a
+/// window has at least 16 MiB, so that none would ever move under a picture as small as a test's.
+void MakeWindowSmall(const Picture& picture);
+
 /// The stored rows of a picture, filler and padding included.
 std::vector<Samples> StoredRows(const Picture& picture);
 void SetStoredRows(const Picture& picture, const std::vector<Samples>& rows);

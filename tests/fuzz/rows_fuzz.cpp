@@ -1,0 +1,224 @@
+#include <cstdio>
+#include <cstdlib>
+#include <stdexcept>
+#include <utility>
+#include <vector>
+
+#include "fuzz/input.h"
+#include "support/row_arguments.h"
+
+// An input is a program of small steps: pictures are made in all stores and formats, any row is called with
+// any objects and numbers, results are kept and called in turn, and everything goes in an order of the
+// input's.
+
+namespace picturezor {
+namespace {
+
+using model::MethodEntry;
+using model::Parameter;
+
+/// Rows that a picture must not have more of, so that a run of steps stays short.
+constexpr std::int64_t MostPixels = 4096;
+constexpr std::size_t MostPictures = 12, MostSteps = 200, BlockSize = 1 << 16;
+
+class Program {
+ public:
+  explicit Program(std::span<const std::uint8_t> bytes) : In(bytes) {
+    Block.Data()[0] = 1;
+    Host::OnYield([this] { Yielded(); });
+  }
+  ~Program() {
+    Host::OnYield({});
+    Host::FailCreationsAfter(-1);
+    PictureFactory::SetFactory({});
+    model::UnlockString(Text);
+    while (!Pictures.empty()) DropPicture();
+  }
+  Program(const Program&) = delete;
+
+  void Run() {
+    for (std::size_t step = 0; step < MostSteps && !In.AtEnd(); ++step) {
+      try {
+        Step();
+      } catch (const HostException&) {
+        // Bad indices raise; that is their failure.
+      } catch (const std::invalid_argument&) {
+      }
+    }
+  }
+
+ private:
+  void Step() {
+    switch (In.Between(0, 11)) {
+      case 0: return Keep(NewPicture());
+      case 1: return DropPicture();
+      case 2: return SetProperty();
+      case 3: return SetFactories();
+      case 4: return Host::FailCreationsAfter(In.Between(-3, 6));
+      case 5: return Assign();
+      default: return Call();
+    }
+  }
+
+  Picture NewPicture() {
+    const int width = In.Between(1, 40), height = In.Between(1, 24);
+    const auto format = Format(In.Between(0, 41));
+    switch (In.Between(0, 3)) {
+      case 0: return Filled(Picture::Mapped(File.Path(), width, height, format, 1));
+      case 1: {
+        // Just as many bytes as the rows need, so that a sanitizer sees the first one beyond.
+        const int pixels = width * BytesPerPixel(format), rowSize = In.Between(0, 2) ? pixels + 3 : 4;
+        const auto bytes = std::size_t(rowSize * (height - 1) + std::max(rowSize, pixels));
+        return Filled(Picture(MemoryBlock(bytes), width, height, format, rowSize));
+      }
+      default: return Filled(Picture(width, height, format));
+    }
+  }
+  static Picture Filled(Picture picture) {
+    if (!picture.Valid()) return picture;
+    if (picture.IsMapping()) MakeWindowSmall(picture);
+    FillWithNoise(picture, 5);
+    return picture;
+  }
+
+  void Keep(const Picture& picture) {
+    const bool large = picture && std::int64_t{picture.Width()} * picture.Height() > MostPixels;
+    if (!large && Pictures.size() < MostPictures) Pictures.push_back(picture);
+  }
+  void DropPicture() {
+    if (Pictures.empty()) return;
+    std::swap(Pictures[std::size_t(In.Byte()) % Pictures.size()], Pictures.back());
+    Pictures.pop_back();
+  }
+  /// Nil now and then.
+  Picture Any() {
+    const std::size_t pick = In.Byte() % (Pictures.size() + 1);
+    return pick < Pictures.size() ? Pictures[pick] : Picture();
+  }
+
+  void SetProperty() {
+    const Picture picture = Any();
+    if (!picture) return;
+    switch (In.Between(0, 3)) {
+      case 0: return picture.SetYieldTicks(In.Integer());
+      case 1: return picture.SetMappingBlockSize(In.Integer());
+      case 2: return picture.SetDebugPictureEnabled(In.Byte() & 1);
+      case 3: return picture.SetFactory(AnyFactory());
+    }
+  }
+  void SetFactories() { PictureFactory::SetFactory(AnyFactory()); }
+  /// A program's own pictures, whatever they are: kept ones, larger ones, none, or an exception.
+  PictureFactory AnyFactory() {
+    const int way = In.Between(0, 5);
+    if (way == 0) return {};
+    if (way == 1) return PictureFactory(PictureFactory::Handler());
+    // By its place, since a factory that held its picture would keep both alive for good.
+    const std::size_t place = In.Byte();
+    return PictureFactory([=, this](std::int32_t width, std::int32_t height, Format format) -> Picture {
+      if (way == 2) throw std::invalid_argument("no picture");
+      if (way == 3) return Pictures.empty() ? Picture() : Pictures[place % Pictures.size()];
+      if (std::int64_t{width} * height > MostPixels) return {};
+      return way == 4 ? Picture(width + 3, height + 1, Format::RGBA) : Picture(width, height, format);
+    });
+  }
+
+  /// Another part of the program runs while an operation is half done.
+  void Yielded() {
+    if (std::exchange(Yielding, true)) return;
+    const Picture picture(9, 5, Format::GA);
+    if (picture.Valid()) picture.Clone();
+    Yielding = false;
+  }
+
+  Value Argument(const Parameter& parameter) {
+    const model::TypeName& type = parameter.Type;
+    if (type == "integer" || type == "color") return {.Whole = In.Integer()};
+    if (type == "boolean") return {.Whole = In.Byte() & 1};
+    if (type == "double") return {.Real = In.Real()};
+    if (type == "picturezor") return {.Address = Any().Address()};
+    if (In.Between(0, 9) == 0) return {};
+    if (type == "memoryblock") return {.Address = Block.Address()};
+    if (type == "string") return {.Address = Text};
+    if (type == "folderitem") return {.Address = Folder.Address()};
+    if (type == "integer()") return {.Address = Arrays[std::size_t(In.Between(0, 2))].Address()};
+    return {};
+  }
+
+  const MethodEntry& AnyRow() {
+    const auto& rows = model::ClassNamed("PictureZOR").Methods;
+    return rows[std::size_t(In.Byte()) % rows.size()];
+  }
+
+  /// Sizes that would only take long, as asked of a row that makes pictures.
+  static bool IsLarge(const MethodEntry& row, const std::vector<Value>& arguments) {
+    std::int64_t pixels = 1;
+    bool makes = row.LowerName == "constructor" || row.LowerName == "createpicturezor";
+    for (std::size_t i = 0; makes && i < arguments.size(); ++i) {
+      const std::string name = model::Lower(row.Of.Parameters[i].Name);
+      if (name == "width" || name == "height")
+        pixels = arguments[i].Whole > MostPixels ? MostPixels + 1 : pixels * arguments[i].Whole;
+    }
+    return pixels > MostPixels;
+  }
+
+  void Call() {
+    const MethodEntry& row = AnyRow();
+    const bool constructs = row.LowerName == "constructor";
+    const Picture self = constructs && In.Between(0, 7) ? UnbuiltPicture() : Any();
+    if (!self) return;
+    std::vector<Value> arguments;
+    for (const Parameter& parameter : row.Of.Parameters) arguments.push_back(Argument(parameter));
+    if (IsLarge(row, arguments) || !KeepsPromises(row, arguments)) return;
+    Outcome outcome;
+    try {
+      outcome = CallRow(row, self.Address(), arguments);
+    } catch (const std::invalid_argument&) {
+      return;
+    }
+    if (constructs) Keep(self);
+    if (row.Of.Result == "picturezor")
+      Keep(Picture(Object::Adopt(outcome.Result.Address)));
+    else
+      GiveBack(row.Of.Result, outcome.Result);
+  }
+
+  /// What is assigned is long enough for every row, as the module must be able to trust.
+  void Assign() {
+    const MethodEntry& row = AnyRow();
+    const Picture self = Any();
+    if (!self || !row.Record->Setter) return;
+    std::vector<Value> arguments;
+    for (const Parameter& parameter : row.Of.Parameters) arguments.push_back(Argument(parameter));
+    AssignRow(row, self.Address(), arguments, Argument({"value", row.Of.Result}));
+  }
+
+  Input In;
+  TemporaryFile File;
+  std::vector<Picture> Pictures;
+  const MemoryBlock Block{BlockSize};
+  const FolderItem Folder{File.Path()};
+  const std::vector<IntegerArray> Arrays = {IntegerArray(std::vector<std::int32_t>(256, 200)),
+                                            IntegerArray({1, -2, 2147483647, 4, 5, 6, 7, 8, 9}),
+                                            IntegerArray(std::vector<std::int32_t>{})};
+  model::StringRecord* const Text = model::NewString(std::string(BlockSize, 'x'), model::UTF8);
+  bool Yielding = false;
+};
+
+}
+}
+
+extern "C" int LLVMFuzzerInitialize(int*, char***) {
+  picturezor::Host::Load(PICTUREZOR_MODULE);
+  return 0;
+}
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  using picturezor::Host;
+  const Host::Alive before = Host::Count();
+  picturezor::Program({data, size}).Run();
+  if (!(Host::Count() == before)) {
+    std::fputs("something is left alive in the host\n", stderr);
+    std::abort();
+  }
+  return 0;
+}
