@@ -61,8 +61,26 @@ Boolean UnsharpFilter(PictureZOR* self, PictureZOR* origpixels, Double Amount, I
 /// as 2, above 256 as 256; a `matrix` that isn't one of the constants leaves the destination as it is.
 PictureZOR* DitherFilter(PictureZOR* self, PictureZOR* dest, Integer matrix, Integer levels);
 
+// Filters that look at the surroundings of a pixel. `dest` is as RunFilter takes it: nil makes a new picture,
+// and the result is the destination with a reference for the caller, or nil. Each plane is treated by itself,
+// alpha like a colour. A group that a filter doesn't serve leaves the destination as it is.
+
+/// The mean of the 2r + 1 rows and then of the 2r + 1 columns around each sample, truncated each time; beyond
+/// the edges the nearest row or column counts again. r is the radius truncated; with less than 1 the picture
+/// is copied. Either direction may be left out; without both nothing is written. `dest` may not be the
+/// source; it may share memory with it, which then is copied first. Without memory the destination stays as
+/// it is.
+PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, Double radius, Boolean vertical,
+                          Boolean horizontal);
+/// The same so many times, each on what the one before gave. Only the first writes into `dest`; the others
+/// make new pictures. With less than 1 iteration the result is the source itself.
+PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, Double radius, Integer iterations,
+                          Boolean vertical, Boolean horizontal);
+
 // clang-format off
 inline constexpr MethodRow FilterMethods[] = {
+    Method<23, "BoxBlurFilter(dest as PictureZOR, Radius as double, Vertical as boolean = true, Horizontal as boolean = true) as PictureZOR", BoxBlurFilter>,
+    Method<24, "BoxBlurFilter(dest as PictureZOR, Radius as double, Iterations as integer, Vertical as boolean = true, Horizontal as boolean = true) as PictureZOR", BoxBlurFilter>,
     Method<26, "SolarizeFilter(dest as PictureZOR) as PictureZOR", SolarizeFilter>,
     Method<27, "GammaFilter(dest as PictureZOR, redGamma as double, greenGamma as double, blueGamma as double) as PictureZOR", GammaFilter>,
     Method<28, "GammaFilter(dest as PictureZOR, redGamma as double, greenGamma as double, blueGamma as double, alphaGamma as double) as PictureZOR", GammaFilter>,

@@ -12,7 +12,7 @@ namespace zor {
 namespace {
 
 constexpr auto Methods = InTableOrder(ImageMethods, ScaleMethods, FilterMethods);
-static_assert(Methods.size() == 46);
+static_assert(Methods.size() == 48);
 MethodRecord MethodTable[Methods.size()];
 
 constexpr auto SharedMethods = InTableOrder(SharedPictureMethods);

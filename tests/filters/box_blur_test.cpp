@@ -1,0 +1,156 @@
+#include <gtest/gtest.h>
+
+#include <cmath>
+
+#include "filters/box_mean.h"
+#include "support/area_filter.h"
+
+namespace picturezor {
+namespace {
+
+/// The mean of 2r + 1 rows or columns, straight from its definition.
+Planar Blurred(const Planar& source, std::int64_t r, int down, int across) {
+  Planar dest = source;
+  for (int c = 0; c < source.Count; ++c)
+    for (int y = 0; y < source.Height; ++y)
+      for (int x = 0; x < source.Width; ++x) {
+        std::int64_t sum = 0;
+        for (std::int64_t s = -r; s <= r; ++s) sum += source.Near(c, x + int(s) * across, y + int(s) * down);
+        dest(c, x, y) = std::uint8_t(sum / (2 * r + 1));
+      }
+  return dest;
+}
+
+AreaFilter Blur(double radius, std::int64_t r, bool vertical, bool horizontal) {
+  return {[=](const Picture& source, const Picture& dest) {
+            return source.BoxBlurFilter(dest, radius, vertical, horizontal);
+          },
+          [=](const Planar& source, Planar& dest) {
+            dest = source;
+            if (vertical) dest = Blurred(dest, r, 1, 0);
+            if (horizontal) dest = Blurred(dest, r, 0, 1);
+          },
+          true, AreaFilter::Refused};
+}
+
+TEST(BoxBlurFilter, IsTheMeanOfRowsThenOfColumns) {
+  ExpectLikeModel(Blur(2.9, 2, true, true), {{1, 1}, {9, 7}, {40, 6}});
+  ExpectLikeModel(Blur(1, 1, true, false), {{11, 5}});
+  ExpectLikeModel(Blur(3, 3, false, true), {{5, 5}});
+}
+
+// Where the sums become wider, and a radius that reaches over the whole picture on both sides.
+TEST(BoxBlurFilter, TakesLargeRadii) {
+  Noise noise(31);
+  for (const int r : {50, 127, 128, 1000})
+    for (const auto& [width, height] : {std::pair{300, 3}, {2, 290}, {1, 1}}) {
+      const Picture picture(width, height, Format::RGB);
+      SetPacked(picture, noise.Many(Packed(picture).size()));
+      Planar wanted(width, height, 3);
+      Blur(r, r, true, true).Model(PlanesIn(picture, width, height), wanted);
+      EXPECT_EQ(PlanesIn(picture.BoxBlurFilter({}, r), width, height).Of, wanted.Of)
+          << r << " " << width << " " << height;
+    }
+}
+
+// With r far beyond the picture, half of the rows are the first and half the last. Catches sums of 32 bits.
+TEST(BoxBlurFilter, TakesRadiiUpToTheLargestInteger) {
+  const Picture picture(3, 3, Format::G);
+  SetPacked(picture, {255, 255, 255, 0, 7, 0, 252, 252, 252});
+  for (const double radius : {8421504.0, 1e8, 2147483647.0, 1e300}) {
+    EXPECT_EQ(Packed(picture.BoxBlurFilter({}, radius, true, false)), Samples(9, 253)) << radius;
+    EXPECT_EQ(Packed(picture.BoxBlurFilter({}, radius, false, true)),
+              (Samples{255, 255, 255, 0, 0, 0, 252, 252, 252}))
+        << radius;
+  }
+}
+
+TEST(BoxBlurFilter, CopiesWithARadiusBelowOne) {
+  ExpectLikeModel(Blur(0.99, 0, true, true), {{4, 5}});
+  const Picture picture(4, 5, Format::BGRX);
+  FillWithNoise(picture, 36);
+  for (const double radius : {0.0, -0.5, -7.0, -1e300, std::nan("")})
+    for (const auto& [vertical, horizontal] : {std::pair{true, true}, {true, false}, {false, true}})
+      EXPECT_EQ(PlanesIn(picture.BoxBlurFilter({}, radius, vertical, horizontal), 4, 5).Of,
+                PlanesIn(picture, 4, 5).Of)
+          << radius;
+}
+
+TEST(BoxBlurFilter, WritesNothingInNoDirection) {
+  const Picture picture(2, 2, Format::G), dest(2, 2, Format::G);
+  SetPacked(picture, {1, 2, 3, 4});
+  SetPacked(dest, {5, 6, 7, 8});
+  EXPECT_TRUE(picture.BoxBlurFilter(dest, 3, false, false) == dest);
+  EXPECT_EQ(Packed(dest), (Samples{5, 6, 7, 8}));
+}
+
+TEST(BoxBlurFilter, Iterates) {
+  const Picture picture(7, 6, Format::RGBA), dest(7, 6, Format::RGBA);
+  FillWithNoise(picture, 32);
+  const Planar source = PlanesIn(picture, 7, 6);
+  Planar once = source, thrice = source;
+  Blur(2, 2, true, true).Model(source, once);
+  Blur(2, 2, true, true).Model(once, thrice);
+  Blur(2, 2, true, true).Model(Planar(thrice), thrice);
+
+  const Picture result = picture.BoxBlurFilter(dest, 2, 3);
+  EXPECT_EQ(PlanesIn(result, 7, 6).Of, thrice.Of);
+  EXPECT_FALSE(result == dest);
+  EXPECT_EQ(PlanesIn(dest, 7, 6).Of, once.Of);
+  EXPECT_TRUE(picture.BoxBlurFilter(dest, 2, 1, true, true) == dest);
+  EXPECT_TRUE(picture.BoxBlurFilter(dest, 2, 0, true, true) == picture);
+  EXPECT_TRUE(picture.BoxBlurFilter({}, 2, -5, true, true) == picture);
+  EXPECT_EQ(PlanesIn(picture.BoxBlurFilter(dest, 2, 2147483647), 7, 6).Of,
+            PlanesIn(picture.BoxBlurFilter({}, 2, 1000), 7, 6).Of);
+  EXPECT_FALSE(picture.BoxBlurFilter(picture, 2, 2, true, true));
+  EXPECT_FALSE(picture.BoxBlurFilter(Picture(6, 6, Format::RGBA), 2, 2, true, true));
+}
+
+// Catches a blur that reads its own output where the two overlap.
+TEST(BoxBlurFilter, TakesADestThatSharesMemory) {
+  for (const auto& from : {Rect{0, 0, 6, 6}, Rect{2, 3, 6, 6}}) {
+    const Picture whole(8, 9, Format::RGB);
+    FillWithNoise(whole, 33);
+    const Picture source = whole.ClipImage(from), dest = whole.ClipImage({1, 2, 6, 6});
+    Planar wanted(6, 6, 3);
+    const Planar before(PlanesIn(source.Clone(), 6, 6));
+    Blur(1, 1, true, true).Model(before, wanted);
+    EXPECT_TRUE(source.BoxBlurFilter(dest, 1) == dest);
+    EXPECT_EQ(PlanesIn(dest, 6, 6).Of, wanted.Of);
+  }
+  const Picture picture(6, 6, Format::BGR);
+  FillWithNoise(picture, 34);
+  Planar wanted(6, 6, 1);
+  Blur(1, 1, true, true).Model(PlanesIn(picture.RedChannel(), 6, 6), wanted);
+  const Planar green = PlanesIn(picture.GreenChannel(), 6, 6);
+  picture.RedChannel().BoxBlurFilter(picture.BlueChannel(), 1);
+  EXPECT_EQ(PlanesIn(picture.BlueChannel(), 6, 6).Of, wanted.Of);
+  EXPECT_EQ(PlanesIn(picture.GreenChannel(), 6, 6).Of, green.Of);
+}
+
+TEST(BoxBlurFilter, LeavesRawPixelsAlone) {
+  const Picture picture(3, 3, Format::Scaling3), dest(3, 3, Format::Scaling3);
+  FillWithNoise(picture, 35);
+  EXPECT_TRUE(picture.BoxBlurFilter(dest, 1) == dest);
+  EXPECT_EQ(Packed(dest), Samples(27, 0));
+}
+
+/// Every sum of n samples, narrow; the sums around each multiple of n, wide.
+TEST(BoxMean, EqualsTheDivision) {
+  for (std::int64_t n = 3; zor::BoxMean<std::uint16_t>::Holds(n); n += 2) {
+    const zor::BoxMean<std::uint16_t> mean(n);
+    for (std::int64_t sum = 0; sum <= 255 * n; ++sum)
+      ASSERT_EQ(mean(std::uint16_t(mean.Bias + sum)), sum / n) << sum << " / " << n;
+  }
+  for (std::int64_t n = 3; zor::BoxMean<std::uint32_t>::Holds(n); n += n < 100000 ? 2 : 12346) {
+    const zor::BoxMean<std::uint32_t> mean(n);
+    for (std::int64_t multiple = 0; multiple <= 255 * n; multiple += n)
+      for (const std::int64_t sum : {multiple - 1, multiple, multiple + n / 2})
+        if (sum >= 0 && sum <= 255 * n) {
+          ASSERT_EQ(mean(std::uint32_t(mean.Bias + sum)), sum / n) << sum << " / " << n;
+        }
+  }
+}
+
+}
+}
