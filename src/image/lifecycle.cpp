@@ -148,16 +148,26 @@ PictureZOR* Clone(PictureZOR* self) {
   return result.HandOn();
 }
 
-PictureZOR* CreatePictureThroughFactory(const PictureData* data, std::int32_t width, std::int32_t height,
-                                        std::int32_t format) {
+PictureZOR* AskFactories(const PictureData* data, std::int32_t width, std::int32_t height,
+                         std::int32_t format) {
   PictureFactoryZOR* const factories[] = {data ? data->Factory : nullptr, GlobalFactory};
   for (PictureFactoryZOR* factory : factories)
     if (PictureZOR* picture = Acceptable(AskFactory(factory, width, height, format), width, height))
       return picture;
+  return nullptr;
+}
+
+PictureZOR* NewPictureInMemory(std::int32_t width, std::int32_t height, std::int32_t format) {
   PictureZOR* picture = NewPictureObject();
   if (!picture) return nullptr;
   Constructor(picture, width, height, format);
   return Acceptable(picture, width, height);
+}
+
+PictureZOR* CreatePictureThroughFactory(const PictureData* data, std::int32_t width, std::int32_t height,
+                                        std::int32_t format) {
+  PictureZOR* picture = AskFactories(data, width, height, format);
+  return picture ? picture : NewPictureInMemory(width, height, format);
 }
 
 PictureZOR* CreatePictureZOR(PictureZOR* self, Integer width, Integer height, Integer format) {

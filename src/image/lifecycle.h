@@ -20,6 +20,14 @@ inline void Unlock(void* object) {
 /// A new, empty object of the class with a reference for the caller; nil when the host has none to give.
 PictureZOR* NewPictureObject();
 
+/// A picture of at least the given size that the picture's own factory gives, or the global one, with a
+/// reference for the caller; nil without a factory that gives one. `data` may be null.
+PictureZOR* AskFactories(const PictureData* data, std::int32_t width, std::int32_t height,
+                         std::int32_t format);
+
+/// A new picture in plain memory, with a reference for the caller; nil when there is none.
+PictureZOR* NewPictureInMemory(std::int32_t width, std::int32_t height, std::int32_t format);
+
 /// A new picture of at least the given size, with a reference for the caller: from the picture's own factory,
 /// from the global one, or else in plain memory. A factory may give a larger picture, or another format. Nil
 /// when there is none. `data` may be null.

@@ -3,7 +3,6 @@
 #include <algorithm>
 
 #include "image/targets.h"
-#include "image/walk.h"
 
 namespace zor {
 namespace {
@@ -24,6 +23,10 @@ struct RowsInHand {
   const Sample* const* From;
   Sample* const* Into;
   int Rows;
+  const ScalePair& Pair;
+  const PixelOrder& Order;
+  const ContributionTable& Table;
+  Columns Of;
 };
 
 /// Pixels of a few rows as doubles, lane r * LanesOf(channels) + c being channel c of row r. Luma has three
@@ -31,8 +34,7 @@ struct RowsInHand {
 template <int Terms>
 class WidePixels {
  public:
-  WidePixels(const RowsInHand& rows, const ScalePair& pair, std::int32_t end)
-      : Rows(rows), Pair(pair), SourceEnd(end) {}
+  WidePixels(const RowsInHand& rows, std::int32_t end) : Rows(rows), Pair(rows.Pair), SourceEnd(end) {}
 
   /// Makes sure of pixels from `first` on, up to `last` if so many fit.
   void Need(std::int32_t first, std::int32_t last) {
@@ -67,28 +69,27 @@ class WidePixels {
   DoubleLanes Of[Window][Terms] = {};
 };
 
-/// Stores one pixel of each row, zero bytes included.
-void StorePixel(const RowsInHand& rows, const ScalePair& pair, std::int32_t x, const DoubleLanes& sums,
-                float divisor) {
+/// Stores one pixel of each row, zeros included.
+void StorePixel(const RowsInHand& rows, std::int32_t x, const DoubleLanes& sums, float divisor) {
   for (int r = 0; r < rows.Rows; ++r) {
     Sample channels[5];
-    for (int c = 0; c < pair.Channels; ++c)
-      channels[c] = ExactQuotient(sums[r * LanesOf(pair.Channels) + c], divisor);
-    Sample* pixel = rows.Into[r] + std::ptrdiff_t{x} * pair.TempBytes;
-    for (int b = 0; b < pair.TempBytes; ++b)
-      pixel[b] = pair.ChannelOfByte[b] == ScalePair::Zero ? 0 : channels[pair.ChannelOfByte[b]];
+    for (int c = 0; c < rows.Pair.Channels; ++c)
+      channels[c] = ExactQuotient(sums[r * LanesOf(rows.Pair.Channels) + c], divisor);
+    Sample* pixel = rows.Into[r] + std::ptrdiff_t{x - rows.Of.First} * rows.Order.Count;
+    for (int b = 0; b < rows.Order.Count; ++b)
+      pixel[b] = rows.Order.Channel[b] == PixelOrder::Zero ? 0 : channels[rows.Order.Channel[b]];
   }
 }
 
 template <int Terms>
-void SumRows(const RowsInHand* rows, const ScalePair* pair, const ContributionTable* table) {
+void SumRows(const RowsInHand* rows) {
   std::int32_t end = 0;
-  for (std::int32_t x = 0; x < table->Count(); ++x)
-    if (const Contribution& line = (*table)[x]; line.Count > 0)
+  for (std::int32_t x = rows->Of.First; x < rows->Of.End; ++x)
+    if (const Contribution& line = rows->Table[x]; line.Count > 0)
       end = std::max(end, line.Entries[line.Count - 1].Pixel + 1);
-  WidePixels<Terms> wide(*rows, *pair, end);
-  for (std::int32_t x = 0; x < table->Count(); ++x) {
-    const Contribution& line = (*table)[x];
+  WidePixels<Terms> wide(*rows, end);
+  for (std::int32_t x = rows->Of.First; x < rows->Of.End; ++x) {
+    const Contribution& line = rows->Table[x];
     DoubleLanes sums = {};
     for (std::int32_t i = 0; i < line.Count;) {
       wide.Need(line.Entries[i].Pixel, line.Entries[line.Count - 1].Pixel);
@@ -98,14 +99,17 @@ void SumRows(const RowsInHand* rows, const ScalePair* pair, const ContributionTa
         for (int t = 0; t < Terms; ++t) sums += weight * terms[t];
       }
     }
-    StorePixel(*rows, *pair, x, sums, line.Sum);
+    StorePixel(*rows, x, sums, line.Sum);
   }
 }
 constexpr auto SumPlanes = SumRows<1>, SumLuma = SumRows<3>;
 
-void AddScaled(double* sums, const Sample* row, int count, double weight) {
-  for (int i = 0; i < count; ++i) sums[i] += weight * row[i];
+template <class Value>
+void AddScaled(double* sums, const Value* row, int count, double weight) {
+  for (int i = 0; i < count; ++i) sums[i] += weight * double(row[i]);
 }
+constexpr auto AddSamples = AddScaled<Sample>;
+constexpr auto AddFloats = AddScaled<float>;
 
 void StoreQuotients(const double* sums, double divisor, int count, Sample* into) {
   for (int i = 0; i < count; ++i) {
@@ -126,25 +130,22 @@ Sample ExactQuotient(double sum, float divisor) {
 int RowsTogether(int channels) { return Lanes / LanesOf(channels); }
 
 void ExactHorizontal(const Sample* const* from, Sample* const* into, int rows, const ScalePair& pair,
-                     const ContributionTable& table) {
-  const RowsInHand inHand{from, into, rows};
+                     const PixelOrder& order, const ContributionTable& table, Columns columns) {
+  const RowsInHand inHand{from, into, rows, pair, order, table, columns};
   if (pair.Luma)
-    OnBestTarget<SumLuma>(&inHand, &pair, &table);
+    OnBestTarget<SumLuma>(&inHand);
   else
-    OnBestTarget<SumPlanes>(&inHand, &pair, &table);
+    OnBestTarget<SumPlanes>(&inHand);
 }
 
-void ExactVertical(PictureData& temp, const Contribution& line, std::ptrdiff_t first, int count,
-                   Sample* into) {
-  double sums[ExactTile] = {};
-  for (std::int32_t i = 0; i < line.Count; ++i) {
-    const double weight = line.Entries[i].Weight;
-    if (weight == 0.0) continue;
-    WithRow(temp, line.Entries[i].Pixel,
-            [&](const Sample* row) { OnBestTarget<AddScaled>(&sums[0], row + first, count, weight); });
-  }
-  const double divisor = line.Sum;
-  OnBestTarget<StoreQuotients>(&sums[0], divisor, count, into);
+void ExactSums::Add(const Sample* row, float weight) {
+  OnBestTarget<AddSamples>(&Sums[0], row, Count, double(weight));
+}
+void ExactSums::Add(const float* row, float weight) {
+  OnBestTarget<AddFloats>(&Sums[0], row, Count, double(weight));
+}
+void ExactSums::Store(float divisor, Sample* into) const {
+  OnBestTarget<StoreQuotients>(static_cast<const double*>(Sums), double(divisor), Count, into);
 }
 
 }

@@ -5,26 +5,11 @@
 #include <limits>
 
 #include "image/targets.h"
-#include "scale/exact_passes.h"
+#include "scale/fixed_point_groups.h"
 #include "scale/quotients.h"
-
-#if defined(__x86_64__) || defined(__i386__)
-// g++ 12 takes the undefined vectors of its own header for mistakes (its bug 105593).
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
-#pragma GCC diagnostic ignored "-Wuninitialized"
-#include <immintrin.h>
-#pragma GCC diagnostic pop
-#define ZOR_VNNI [[gnu::target("avx512f,avx512bw,avx512vl,avx512dq,avx512vbmi,avx512vnni,bmi2")]]
-#define ZOR_HAS_VNNI 1
-#else
-#define ZOR_HAS_VNNI 0
-#endif
 
 namespace zor {
 namespace {
-
-constexpr int Lanes = 16, Taps = 4, VectorBytes = 64;
 
 /// Source pixels from the first to the last that a line takes in.
 std::int32_t FirstPixel(const Contribution& line) { return line.Entries[0].Pixel; }
@@ -47,24 +32,6 @@ std::int8_t TakeDigit(std::int32_t& share) {
 }
 
 }
-
-/// A few output pixels side by side.
-struct alignas(VectorBytes) FixedPointRows::ColumnGroup {
-  /// Which of 64 bytes goes where: Taps bytes a lane.
-  std::uint8_t Index[VectorBytes];
-  std::int32_t Bias[Lanes];
-  std::uint32_t Doubtful[Lanes];
-  /// Bytes from the row's first sample to the group's, and what each step adds to it.
-  std::int64_t Base;
-  std::int32_t Steps;
-  /// Steps whose 64 bytes all lie in the row.
-  std::int32_t WholeSteps;
-  std::int32_t FirstColumn;
-  std::int32_t Columns;
-  /// Lanes of lines that have no fixed-point form.
-  std::uint32_t AlwaysDoubtful;
-  const std::int8_t* Weights;
-};
 
 /// Lays out the groups.
 struct GroupMaker {
@@ -167,148 +134,6 @@ struct GroupMaker {
   }
 };
 
-#if ZOR_HAS_VNNI
-
-/// Runs the groups over one row or four.
-struct GroupRunner {
-  /// A lane's sum: its digits put together, the parts of a pixel added up.
-  template <int Digits>
-  ZOR_VNNI static __m512i Joined(const __m512i* digits) {
-    __m512i sum = digits[0];
-    if constexpr (Digits > 1) sum = _mm512_add_epi32(_mm512_slli_epi32(sum, 8), digits[1]);
-    if constexpr (Digits > 2) sum = _mm512_add_epi32(_mm512_slli_epi32(sum, 8), digits[2]);
-    return Digits < 3 ? _mm512_slli_epi32(sum, 8 * (3 - Digits)) : sum;
-  }
-
-  ZOR_VNNI static __m512i PartsAdded(__m512i sum, int parts, int lanesOfPart) {
-    const __m512i lane = _mm512_set_epi32(15, 14, 13, 12, 11, 10, 9, 8, 7, 6, 5, 4, 3, 2, 1, 0);
-    __m512i all = sum;
-    for (int part = 1; part < parts; ++part)
-      all = _mm512_add_epi32(
-          all, _mm512_permutexvar_epi32(_mm512_add_epi32(lane, _mm512_set1_epi32(part * lanesOfPart)), sum));
-    return all;
-  }
-
-  template <int Rows, int Digits>
-  ZOR_VNNI static void Run(const FixedPointRows& plan, const Sample* const* from, Sample* const* into) {
-    const ScalePair& pair = plan.Pair;
-    const int bytes = pair.TempBytes, lanesOfPart = plan.Pixels * pair.Channels;
-    // What becomes of 16 sums: the low byte of the lane that a byte of a temporary pixel shows.
-    alignas(VectorBytes) std::uint8_t index[VectorBytes] = {};
-    __mmask64 shown = 0;
-    for (int p = 0; p < plan.Pixels; ++p)
-      for (int b = 0; b < bytes; ++b)
-        if (const int channel = pair.ChannelOfByte[b]; channel != ScalePair::Zero) {
-          index[p * bytes + b] = std::uint8_t((p * pair.Channels + channel) * 4);
-          shown |= __mmask64{1} << (p * bytes + b);
-        }
-    const __m512i outIndex = _mm512_load_si512(index);
-    const __m512i fraction = _mm512_set1_epi32((1 << FixedPointLine::Bits) - 1);
-    const __m512i one = _mm512_set1_epi32(1 << FixedPointLine::Bits), zero = _mm512_setzero_si512();
-    const __m512i white = _mm512_set1_epi32(255);
-    const std::int64_t step = std::int64_t{Taps} * plan.Parts * pair.Source.Step;
-    const std::int64_t written = std::int64_t{plan.ResultWidth} * bytes;
-
-    for (std::int32_t g = 0; g < plan.GroupCount; ++g) {
-      const FixedPointRows::ColumnGroup& group = plan.Groups[g];
-      const __m512i take = _mm512_load_si512(group.Index);
-      __m512i sums[Rows][Digits];
-      const Sample* source[Rows];
-      for (int r = 0; r < Rows; ++r) {
-        source[r] = from[r] + plan.Lead + group.Base;
-        for (int d = 0; d < Digits; ++d) sums[r][d] = zero;
-      }
-      const std::int8_t* weights = group.Weights;
-      std::int32_t s = 0;
-      for (; s < group.WholeSteps; ++s, weights += Digits * VectorBytes) {
-        __m512i weight[Digits];
-        for (int d = 0; d < Digits; ++d) weight[d] = _mm512_load_si512(weights + d * VectorBytes);
-        for (int r = 0; r < Rows; ++r) {
-          const __m512i taps = _mm512_permutexvar_epi8(take, _mm512_loadu_si512(source[r] + s * step));
-          for (int d = 0; d < Digits; ++d) sums[r][d] = _mm512_dpbusd_epi32(sums[r][d], taps, weight[d]);
-        }
-      }
-      for (; s < group.Steps; ++s, weights += Digits * VectorBytes) {
-        const std::int64_t left = std::max<std::int64_t>(plan.RowBytes - group.Base - s * step, 0);
-        const __mmask64 inRow = left >= 64 ? ~__mmask64{0} : (__mmask64{1} << left) - 1;
-        for (int r = 0; r < Rows; ++r) {
-          const __m512i taps =
-              _mm512_permutexvar_epi8(take, _mm512_maskz_loadu_epi8(inRow, source[r] + s * step));
-          for (int d = 0; d < Digits; ++d)
-            sums[r][d] = _mm512_dpbusd_epi32(sums[r][d], taps, _mm512_load_si512(weights + d * VectorBytes));
-        }
-      }
-
-      const __m512i bias = _mm512_load_si512(group.Bias), doubtful = _mm512_load_si512(group.Doubtful);
-      const std::int64_t at = std::int64_t{group.FirstColumn} * bytes;
-      const int count = group.Columns * bytes;
-      for (int r = 0; r < Rows; ++r) {
-        __m512i sum = Joined<Digits>(sums[r]);
-        if (plan.Parts > 1) sum = PartsAdded(sum, plan.Parts, lanesOfPart);
-        sum = _mm512_add_epi32(sum, bias);
-        // Near 0 both sides give the same byte.
-        const __mmask16 above = _mm512_cmpge_epi32_mask(sum, _mm512_srli_epi32(one, 1));
-        __mmask16 doubt = _mm512_mask_cmplt_epu32_mask(above, _mm512_and_si512(sum, fraction), doubtful);
-        __m512i value = _mm512_srai_epi32(sum, FixedPointLine::Bits);
-        value = _mm512_min_epi32(_mm512_max_epi32(value, zero), white);
-        const __m512i pixels = _mm512_maskz_permutexvar_epi8(shown, outIndex, value);
-        Sample* out = into[r] + at;
-        if (count <= 32 && at + 32 <= written)
-          _mm256_storeu_si256(reinterpret_cast<__m256i*>(out), _mm512_castsi512_si256(pixels));
-        else
-          _mm512_mask_storeu_epi8(out, (count >= 64 ? 0 : __mmask64{1} << count) - 1, pixels);
-        doubt =
-            __mmask16(doubt | group.AlwaysDoubtful) & __mmask16((1U << (group.Columns * pair.Channels)) - 1);
-        if (doubt) [[unlikely]]
-          Settle(plan, group, doubt, from[r], into[r]);
-      }
-    }
-  }
-
-  /// Makes the samples in doubt by the plain form.
-  [[gnu::noinline, gnu::cold]] static void Settle(const FixedPointRows& plan,
-                                                  const FixedPointRows::ColumnGroup& group,
-                                                  std::uint32_t doubt, const Sample* from, Sample* into) {
-    const ScalePair& pair = plan.Pair;
-    for (; doubt != 0; doubt &= doubt - 1) {
-      const int lane = std::countr_zero(doubt), channel = lane % pair.Channels;
-      const std::int32_t x = group.FirstColumn + lane / pair.Channels;
-      const Contribution& line = plan.Table[x];
-      const Sample* plane = from + pair.Source.Offset[channel];
-      double sum = 0.0;
-      for (std::int32_t i = 0; i < line.Count; ++i)
-        sum +=
-            double(line.Entries[i].Weight) * plane[std::ptrdiff_t{line.Entries[i].Pixel} * pair.Source.Step];
-      const Sample sample = ExactQuotient(sum, line.Sum);
-      Sample* pixel = into + std::ptrdiff_t{x} * pair.TempBytes;
-      for (int b = 0; b < pair.TempBytes; ++b)
-        if (pair.ChannelOfByte[b] == channel) pixel[b] = sample;
-    }
-  }
-
-  template <int Rows>
-  static void RunDigits(const FixedPointRows& plan, const Sample* const* from, Sample* const* into) {
-    switch (plan.Digits) {
-      case 1: return Run<Rows, 1>(plan, from, into);
-      case 2: return Run<Rows, 2>(plan, from, into);
-      default: return Run<Rows, 3>(plan, from, into);
-    }
-  }
-};
-
-void FixedPointRows::Run(const Sample* const* from, Sample* const* into, int rows) const {
-  if (rows == RowsTogether)
-    GroupRunner::RunDigits<RowsTogether>(*this, from, into);
-  else
-    GroupRunner::RunDigits<1>(*this, from, into);
-}
-
-#else
-
-void FixedPointRows::Run(const Sample* const*, Sample* const*, int) const {}
-
-#endif
-
 /// The shares of all lines, in their order.
 struct FixedPointRows::Shares {
   Buffer EntryMemory, LineMemory, FitMemory;
@@ -353,7 +178,7 @@ FixedPointRows::FixedPointRows(const ScalePair& pair, const ContributionTable& t
   Lead = *least;
   Spread = *most - *least;
   RowBytes = (std::int64_t{sourceWidth} - 1) * Pair.Source.Step + Spread + 1;
-  Built = ZOR_HAS_VNNI && CurrentTarget == Target::AVX512VBMI && !Pair.Luma && Build();
+  Built = CurrentTarget == Target::AVX512VBMI && !Pair.Luma && Build();
 }
 
 bool FixedPointRows::Build() {
@@ -365,17 +190,17 @@ bool FixedPointRows::Build() {
   if (!shares || shares.Unfit > ResultWidth / 8) return false;
   Digits = (shares.Used & 0xFF) != 0 ? 3 : (shares.Used & 0xFF00) != 0 ? 2 : 1;
 
-  GroupCount = (ResultWidth + Pixels - 1) / Pixels;
-  GroupMemory = NewBuffer(std::size_t(GroupCount + 1) * sizeof(ColumnGroup));
+  const std::int32_t groups = (ResultWidth + Pixels - 1) / Pixels;
+  GroupMemory = NewBuffer(std::size_t(groups + 1) * sizeof(ColumnGroup));
   if (!GroupMemory) return false;
   Groups = reinterpret_cast<ColumnGroup*>(Aligned(GroupMemory));
   std::size_t steps = 0;
-  for (std::int32_t g = 0; g < GroupCount; ++g) steps += std::size_t(maker.PlaceGroup(Groups[g], g));
+  for (std::int32_t g = 0; g < groups; ++g) steps += std::size_t(maker.PlaceGroup(Groups[g], g));
   WeightMemory = NewBuffer((steps + 1) * std::size_t(Digits) * VectorBytes);
   if (!WeightMemory) return false;
   auto* weights = reinterpret_cast<std::int8_t*>(Aligned(WeightMemory));
   const std::int32_t* lineShares = shares.Entries();
-  for (std::int32_t g = 0; g < GroupCount; ++g) {
+  for (std::int32_t g = 0; g < groups; ++g) {
     ColumnGroup& group = Groups[g];
     group.Weights = weights;
     for (std::int32_t p = 0; p < group.Columns; ++p) {
@@ -386,6 +211,7 @@ bool FixedPointRows::Build() {
         group.Bias[lane] = shares.Line(x).Bias;
         group.Doubtful[lane] = shares.Line(x).Doubtful;
         if (!shares.Fits(x)) group.AlwaysDoubtful |= 1U << lane;
+        group.MayBeDoubtful |= !shares.Fits(x) || shares.Line(x).Doubtful > 0;
       }
     }
     weights += std::ptrdiff_t{group.Steps} * Digits * VectorBytes;

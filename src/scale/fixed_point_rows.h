@@ -1,7 +1,6 @@
 #pragma once
 #include "image/walk.h"
-#include "scale/contributions.h"
-#include "scale/pairs.h"
+#include "scale/exact_passes.h"
 
 namespace zor {
 
@@ -21,8 +20,14 @@ class FixedPointRows {
   /// False where there is no such form: on another processor, for luma, where too many lines are always in
   /// doubt, and without memory for it.
   explicit operator bool() const { return Built; }
-  /// Makes RowsTogether rows of temp, or one, from as many rows of the source.
-  void Run(const Sample* const* from, Sample* const* into, int rows) const;
+  /// Columns are made in groups of so many pixels; a run of columns begins with a group.
+  int GroupPixels() const { return Pixels; }
+  /// Makes some columns of RowsTogether rows, or of one, out of as many rows of the source. into[r] is where
+  /// the first pixel goes; as floats, 16 of them have to fit from each group's first on.
+  void Run(const Sample* const* from, Sample* const* into, int rows, const PixelOrder& order,
+           Columns columns) const;
+  void Run(const Sample* const* from, float* const* into, int rows, const PixelOrder& order,
+           Columns columns) const;
 
  private:
   friend struct GroupMaker;
@@ -40,7 +45,6 @@ class FixedPointRows {
   std::int64_t RowBytes = 0;
   /// Output pixels of a group, lanes that share a sample, digits of a share.
   int Pixels = 0, Parts = 0, Digits = 0;
-  std::int32_t GroupCount = 0;
   bool Built = false;
   Buffer GroupMemory, WeightMemory;
   ColumnGroup* Groups = nullptr;

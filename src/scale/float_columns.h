@@ -1,51 +1,54 @@
 #pragma once
 #include "image/walk.h"
-#include "scale/contributions.h"
-#include "scale/pairs.h"
+#include "scale/line_sums.h"
+#include "scale/passes.h"
 
 namespace zor {
 
-/// The samples of a pixel between temp and dest: which bytes of a temporary pixel, and which of them each
-/// plane of dest gets.
-struct SampleOrder {
-  int Count = 0;
-  std::array<int, 5> Byte{}, OfPlane{};
-  /// Whether they are all of dest's pixel, in its order, so that a run of them can be copied.
-  bool Direct = false;
-};
-
-/// The second pass in single precision, over a stripe of columns. Each row of temp is widened to floats once
-/// and kept while lines need it; a line is then a sum of a few rows, many samples at a time.
+/// The second pass in single precision, over a stripe of columns. The rows between the passes are kept as
+/// floats while lines look at them; a line is then a sum of a few rows, many samples at a time.
 class FloatColumns {
  public:
-  FloatColumns(PictureData& temp, const ScalePair& pair, const ContributionTable& table);
-  /// False without memory, and where a line takes in so many rows that the stripes become too narrow.
+  FloatColumns(const ScaleContext& context, const ContributionTable& table, const HorizontalPass* pass);
+  /// False without memory, and where a line looks at so many rows that stripes become too narrow.
   explicit operator bool() const { return Memory != nullptr; }
-  const SampleOrder& Order() const { return Samples; }
+  const PixelScatter& Scatter() const { return Samples; }
   /// Pixels of a stripe at most.
   std::int32_t StripePixels() const { return Stripe; }
+  /// How many lines are made best together.
+  int LinesTogether() const { return Together; }
   /// Goes on with a stripe.
-  void Begin(std::int32_t firstPixel, std::int32_t pixels);
-  /// The samples of one line of the stripe, ordered as `Order` says; good until the next call. Lines come in
-  /// rising order. Null where the line is always in doubt.
-  const Sample* Line(const Contribution& line);
+  void Begin(Columns columns);
+  /// Makes the samples of `count` lines from y on, into[i] being where those of line y + i go; lines come in
+  /// rising order. False when a row of the source can't be reached.
+  bool Make(std::int32_t y, int count, Sample* const* into);
+  /// Room for a line of the stripe, one of LinesTogether.
+  Sample* Scratch(int line) const { return ScratchMemory + line * Rows.Room; }
 
  private:
-  const float* Widened(std::int32_t row);
-  void Settle(const Contribution& line);
+  /// The rows that some lines look at, first to last; empty where they look at none.
+  struct RowRange {
+    std::int32_t First, Last;
+  };
+  RowRange RowsOf(std::int32_t y, int count) const;
+  bool Need(RowRange range);
+  bool Fill(std::int32_t row, int count);
+  void MakeTogether(std::int32_t y, int count, Sample* const* into, LineSums& sums);
+  void MakePlain(const Contribution& line, Sample* into) const;
 
-  PictureData& Temp;
-  int TempBytes;
-  SampleOrder Samples;
-  std::int32_t Slots = 0, Stripe = 0, FirstPixel = 0, Pixels = 0;
-  /// Samples between the rows in memory: those of a stripe, rounded up to whole vectors.
-  std::ptrdiff_t Room = 0;
-  Buffer Memory, ShareMemory;
-  float *Rows = nullptr, *Shares = nullptr;
-  const float** RowsOfLine = nullptr;
-  /// By slot, the row of temp that it holds, or -1.
-  std::int32_t* RowOfSlot = nullptr;
-  Sample *Packed = nullptr, *Lower = nullptr, *Upper = nullptr;
+  const ScaleContext& Context;
+  const ContributionTable& Table;
+  const HorizontalPass* Pass;
+  PixelScatter Samples;
+  int Together = 1;
+  std::int32_t Stripe = 0;
+  Columns Of{};
+  /// The first row that isn't there yet.
+  std::int32_t NextRow = 0;
+  RowRing Rows{};
+  Buffer Memory;
+  float* Shares = nullptr;
+  Sample* ScratchMemory = nullptr;
 };
 
 }

@@ -1,5 +1,6 @@
 #include "scale/pairs.h"
 
+#include <algorithm>
 #include <cstring>
 
 #include "image/formats.h"
@@ -7,9 +8,9 @@
 namespace zor {
 namespace {
 
-/// A pair with its two forms. In `Source` a digit is a plane of the source's group; in `Temp` it is the
-/// channel that a byte of a temporary pixel holds, and - one that is 0; in `Dest` it is the byte that a plane
-/// of dest's group gets.
+/// A form of a pair. In `Source` a digit is a plane of the source's group, in `Dest` the channel that a plane
+/// of dest's group gets, and in `Temp` the channel that a byte of a temporary pixel holds, or - where it is
+/// 0.
 struct Form {
   const char *Source, *Temp, *Dest;
 };
@@ -21,8 +22,8 @@ struct PairRow {
 
 constexpr PairRow Pairs[] = {
     {Family::Gray, Family::Gray, false, {"0", "0", "0"}, {"01", "01", "01"}},
-    {Family::Gray, Family::RGB, false, {"0", "-0--", "111"}, {"01", "-0-1", "1113"}},
-    {Family::Gray, Family::CMYK, false, {"0", "0000", "0123"}, {"01", "00001", "01234"}},
+    {Family::Gray, Family::RGB, false, {"0", "-0--", "000"}, {"01", "-0-1", "0001"}},
+    {Family::Gray, Family::CMYK, false, {"0", "0000", "0000"}, {"01", "00001", "00001"}},
     {Family::RGB, Family::Gray, true, {"012", "0", "0"}, {"0123", "01", "01"}},
     {Family::RGB, Family::RGB, false, {"012", "012-", "012"}, {"0123", "0123", "0123"}},
     {Family::CMYK, Family::Gray, false, {"3", "0", "0"}, {"34", "01", "01"}},
@@ -46,13 +47,29 @@ ScalePair Filled(const PairRow& row, const PictureData& source, const PictureDat
   for (int i = 0; i < pair.Source.Count; ++i) pair.Source.Offset[i] = planes.Offset[form.Source[i] - '0'];
   pair.Luma = row.Luma;
   pair.Channels = row.Luma ? pair.Source.Count - 2 : pair.Source.Count;
-  pair.TempBytes = int(std::strlen(form.Temp));
-  pair.TempFormat = ScalingFormat[pair.TempBytes];
-  for (int i = 0; i < pair.TempBytes; ++i)
-    pair.ChannelOfByte[i] = form.Temp[i] == '-' ? ScalePair::Zero : form.Temp[i] - '0';
   pair.Dest = PlanesOf(GroupFor(row.Into, alpha), dest);
-  for (int i = 0; i < pair.Dest.Count; ++i) pair.ByteOfPlane[i] = form.Dest[i] - '0';
+  for (int i = 0; i < pair.Dest.Count; ++i) pair.ChannelOfPlane[i] = form.Dest[i] - '0';
+  pair.Temp.Count = int(std::strlen(form.Temp));
+  for (int i = 0; i < pair.Temp.Count; ++i)
+    pair.Temp.Channel[i] = form.Temp[i] == '-' ? PixelOrder::Zero : form.Temp[i] - '0';
+  pair.TempFormat = ScalingFormat[pair.Temp.Count];
   return pair;
+}
+
+std::int32_t FirstOffset(const PlaneList& planes) {
+  return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
+}
+
+/// The planes by their place in the pixel.
+std::array<int, 5> InPixelOrder(const PlaneList& planes) {
+  std::array<int, 5> sorted{};
+  for (int p = 0; p < planes.Count; ++p) {
+    int place = 0;
+    for (int other = 0; other < planes.Count; ++other)
+      if (planes.Offset[other] < planes.Offset[p]) ++place;
+    sorted[place] = p;
+  }
+  return sorted;
 }
 
 }
@@ -64,6 +81,47 @@ bool FindScalePair(const PictureData& source, const PictureData& dest, ScalePair
       return true;
     }
   return false;
+}
+
+PixelOrder OrderOfDest(const ScalePair& pair) {
+  const std::array<int, 5> planes = InPixelOrder(pair.Dest);
+  PixelOrder order;
+  for (int place = 0; place < pair.Dest.Count; ++place) {
+    const int channel = pair.ChannelOfPlane[planes[place]];
+    const auto end = order.Channel.begin() + order.Count;
+    if (std::find(order.Channel.begin(), end, channel) == end) order.Channel[order.Count++] = channel;
+  }
+  return order;
+}
+
+PixelScatter::PixelScatter(const ScalePair& pair, const PixelOrder& order) : Order(order), Planes(pair.Dest) {
+  const std::array<int, 5> planes = InPixelOrder(Planes);
+  Direct = order.Count == Planes.Count && Planes.Count == Planes.Step;
+  for (int place = 0; place < Planes.Count; ++place) {
+    const int plane = planes[place];
+    const auto found =
+        std::find(order.Channel.begin(), order.Channel.begin() + order.Count, pair.ChannelOfPlane[plane]);
+    PlaceOfPlane[plane] = int(found - order.Channel.begin());
+    Direct = Direct && PlaceOfPlane[plane] == place;
+  }
+}
+
+Sample* PixelScatter::Place(Sample* row, std::int32_t x) const {
+  return row + std::ptrdiff_t{x} * Planes.Step + FirstOffset(Planes);
+}
+
+void PixelScatter::Store(const Sample* samples, Sample* row, std::int32_t x, std::int32_t count) const {
+  if (Direct) {
+    std::memcpy(Place(row, x), samples, std::size_t(count) * std::size_t(Order.Count));
+    return;
+  }
+  ForPlaneCount(Planes.Count, [&](auto n) {
+    const PlaneRow<n> dest(row + std::ptrdiff_t{x} * Planes.Step, Planes);
+    const std::ptrdiff_t step = Order.Count;
+    const auto place = PlaceOfPlane;
+    for (std::ptrdiff_t i = 0; i < count; ++i)
+      for (int p = 0; p < n; ++p) dest(p, i) = samples[i * step + place[p]];
+  });
 }
 
 }

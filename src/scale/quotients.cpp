@@ -91,18 +91,20 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
   return true;
 }
 
-bool MakeFloat(const Contribution& line, float* shares, FloatLine& made) {
+bool MakeFloat(const Contribution& line, float* shares, std::int32_t firstRow, int stride, FloatLine& made) {
   made = {0.0F, 0.0F};
   if (line.Count == 0) return true;
   if (!(line.Sum > 0.0F)) return false;
   Shares sizes;
   for (std::int32_t i = 0; i < line.Count; ++i) {
     const double exact = double(line.Entries[i].Weight) / line.Sum;
-    shares[i] = float(exact);
-    sizes.Add(shares[i], exact);
+    const auto share = float(exact);
+    shares[std::ptrdiff_t{line.Entries[i].Pixel - firstRow} * stride] = share;
+    sizes.Add(share, exact);
   }
   // A product and a sum an entry round by 2^-24 of what they give at most; N. J. Higham, "Accuracy and
-  // Stability of Numerical Algorithms", 2002, lemma 3.1. 2^-14 covers the roundings of Start and Gap.
+  // Stability of Numerical Algorithms", 2002, lemma 3.1. Rows between the entries add nothing and round
+  // nothing. 2^-14 covers the roundings of Start and Gap.
   const double rounding = (line.Count + 3) * 0x1p-24 * 1.01;
   const double bound = 255.0 * (sizes.Error + sizes.Size * rounding) + 0x1p-14;
   if (!(sizes.Size < 64.0)) return false;

@@ -52,7 +52,8 @@ struct FloatLine {
   /// than q, and Gap is 0.
   float Start, Gap;
 };
-/// The shares of a line, one an entry. False where the line is always in doubt.
-bool MakeFloat(const Contribution& line, float* shares, FloatLine& made);
+/// Puts the share of each entry at its row's place: that of row `firstRow` at shares[0], the next one's
+/// `stride` further. False where the line is always in doubt.
+bool MakeFloat(const Contribution& line, float* shares, std::int32_t firstRow, int stride, FloatLine& made);
 
 }

@@ -8,10 +8,9 @@ namespace zor {
 /// each other but for RGB and CMYK; alpha is a channel like the others, and is left alone where one of the
 /// two pictures lacks it.
 ///
-/// `temp` is nil, or a picture that keeps what stands between the passes: of the pixel size that the pair asks
-/// for, all of it its own, at least `width` wide and as high as `source`. It shares no samples with the other
-/// two. `source` may be
-/// this picture, whose samples are read before the first is written.
+/// `temp` is nil, or a picture that keeps what stands between the passes: of the pixel size that the pair
+/// asks for, all of it its own, at least `width` wide and as high as `source`. It shares no samples with the
+/// other two. `source` may be this picture, whose samples are read before the first is written.
 ///
 /// False, and nothing written, when the size is below 1 or passes this picture, for another mode, for
 /// pictures that aren't usable or have no way to each other, and when `temp` doesn't fit or can't be made in

@@ -1,3 +1,5 @@
+#include <atomic>
+
 #include "scale/scale.h"
 #include "scale/scale_request.h"
 #include "scale/workers.h"
@@ -5,12 +7,18 @@
 namespace zor {
 namespace {
 
-/// Runs pass(first, last) over the rows on several threads.
-template <class Pass>
-void OnThreads(std::int32_t threads, std::int32_t rows, Pass& pass) {
-  ParallelFor(threads, rows, &pass, [](std::int32_t first, std::int32_t last, void* context) {
-    if (first <= last) (*static_cast<Pass*>(context))(first, last);
+/// Makes rows on several threads; whether all of them could be made.
+template <class Make>
+bool OnThreads(std::int32_t threads, std::int32_t rows, Make& make) {
+  struct Work {
+    Make& Of;
+    std::atomic<bool> Done;
+  } work{make, true};
+  ParallelFor(threads, rows, &work, [](std::int32_t first, std::int32_t last, void* context) {
+    auto& shared = *static_cast<Work*>(context);
+    if (first <= last && !shared.Of(first, last)) shared.Done = false;
   });
+  return work.Done;
 }
 
 }
@@ -22,25 +30,12 @@ Boolean ScaleMT(PictureZOR* self, Integer threads, PictureZOR* source, PictureZO
   if (DataOf(source).IsMapping || DataOf(self).IsMapping || (temp && DataOf(temp).IsMapping))
     return Scale(self, source, temp, mode, width, height);
   if (!IsKernel(mode)) return false;
-  const ScaleRequest request{self, source, temp, ScaleKernel(mode), width, height};
-  const ScalePreparation prepared(request);
+  ScalePreparation prepared({self, source, temp, ScaleKernel(mode), width, height});
   if (prepared.Result() == ScalePreparation::Outcome::Refused) return false;
   if (prepared.Result() == ScalePreparation::Outcome::WrongFactoryFormat)
     return Scale(self, source, nullptr, mode, width, height);
-  const ScaleContext& context = prepared.Context();
-  return RunPasses(
-      context, request.Kernel, nullptr,
-      [&](const HorizontalPass& pass, std::int32_t rows) {
-        auto run = [&](std::int32_t first, std::int32_t last) { pass.Run(first, last, nullptr); };
-        OnThreads(threads, rows, run);
-        return true;
-      },
-      [&](const ContributionTable& table) {
-        auto run = [&](std::int32_t first, std::int32_t last) {
-          VerticalPass(context, table, first, last, nullptr);
-        };
-        OnThreads(threads, context.ResultHeight, run);
-      });
+  return prepared.Run(nullptr,
+                      [threads](std::int32_t rows, auto&& make) { return OnThreads(threads, rows, make); });
 }
 
 }

@@ -1,6 +1,4 @@
 #pragma once
-#include <optional>
-
 #include "image/lifecycle.h"
 #include "scale/kernels.h"
 #include "scale/passes.h"
@@ -14,8 +12,8 @@ struct ScaleRequest {
   std::int32_t Width, Height;
 };
 
-/// A scale whose pictures are all there and fit, with a temporary picture that is given back if it was made
-/// here.
+/// A scale whose pictures are all there and fit. A temporary picture that was made here is given back at the
+/// end.
 class ScalePreparation {
  public:
   enum class Outcome { Refused, WrongFactoryFormat, Ready };
@@ -23,35 +21,54 @@ class ScalePreparation {
   explicit ScalePreparation(const ScaleRequest& request);
   /// WrongFactoryFormat: a factory gave a temporary picture of another format than it was asked for.
   Outcome Result() const { return Of; }
-  const ScaleContext& Context() const { return Pictures; }
+  /// Runs both passes. Rows of a pass are made by onRows(count, make), which calls make(first, last) for
+  /// ranges that together are 0 to count - 1, and gives whether all of them gave true.
+  template <class OnRows>
+  bool Run(PictureData* yields, OnRows&& onRows);
 
  private:
   Outcome Prepare(const ScaleRequest& request);
   Outcome FindTemp(const ScaleRequest& request);
+  bool MakeTemp();
+  template <class OnRows>
+  bool RunInPassing(PictureData* yields, OnRows&& onRows) const;
+  ContributionTable AcrossTable(PictureData* yields) const;
+  ContributionTable DownTable(PictureData* yields) const;
 
   ScaleContext Pictures{};
+  ScaleKernel Kernel;
   Held Made{nullptr};
   Outcome Of;
 };
 
-/// Runs both passes; how rows are made, on which thread, is up to the two functions, which get the prepared
-/// pass. False without memory, or when rows says so.
-template <class Rows, class Lines>
-bool RunPasses(const ScaleContext& context, ScaleKernel kernel, PictureData* yields, Rows&& rows,
-               Lines&& lines) {
-  const PictureData& source = *context.Source;
-  const std::int32_t height = source.Height;
-  const double xScale = double(context.ResultWidth) / source.Width;
-  const double yScale = double(context.ResultHeight) / height;
-  {
-    const ContributionTable table(context.ResultWidth, source.Width, xScale, kernel, yields);
-    if (!table || !rows(HorizontalPass(context, table), height)) return false;
+/// Without a temporary picture: the rows between the passes are made when a line looks at them.
+template <class OnRows>
+bool ScalePreparation::RunInPassing(PictureData* yields, OnRows&& onRows) const {
+  const ContributionTable across = AcrossTable(yields), down = DownTable(yields);
+  if (!across || !down) return false;
+  const HorizontalPass pass(Pictures, across);
+  return onRows(Pictures.ResultHeight, [&](std::int32_t first, std::int32_t last) {
+    return VerticalPass(Pictures, down, &pass, first, last, yields);
+  });
+}
+
+template <class OnRows>
+bool ScalePreparation::Run(PictureData* yields, OnRows&& onRows) {
+  if (!Pictures.Temp) {
+    if (RunInPassing(yields, onRows)) return true;
+    if (!MakeTemp()) return false;
   }
-  // Of a temporary picture that is higher only the rows that have just been made count.
-  const ContributionTable table(context.ResultHeight, height, yScale, kernel, yields);
-  if (!table) return false;
-  lines(table);
-  return true;
+  {
+    const ContributionTable table = AcrossTable(yields);
+    if (!table) return false;
+    const HorizontalPass pass(Pictures, table);
+    const auto make = [&](std::int32_t first, std::int32_t last) { return pass.Run(first, last, yields); };
+    if (!onRows(Pictures.Source->Height, make)) return false;
+  }
+  const ContributionTable table = DownTable(yields);
+  return table && onRows(Pictures.ResultHeight, [&](std::int32_t first, std::int32_t last) {
+           return VerticalPass(Pictures, table, nullptr, first, last, yields);
+         });
 }
 
 }

@@ -1,0 +1,222 @@
+#include <algorithm>
+#include <bit>
+#include <type_traits>
+
+#include "scale/fixed_point_groups.h"
+#include "scale/quotients.h"
+
+#if defined(__x86_64__) || defined(__i386__)
+
+// g++ 12 takes the undefined vectors of its own header for mistakes (its bug 105593).
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
+#pragma GCC diagnostic ignored "-Wuninitialized"
+#include <immintrin.h>
+#pragma GCC diagnostic pop
+
+#define ZOR_VNNI [[gnu::target("avx512f,avx512bw,avx512vl,avx512dq,avx512vbmi,avx512vnni")]]
+#define ZOR_VNNI_INLINE \
+  [[gnu::target("avx512f,avx512bw,avx512vl,avx512dq,avx512vbmi,avx512vnni"), gnu::always_inline]] inline
+
+namespace zor {
+namespace {
+
+/// The lowest `count` of 64 bytes.
+constexpr __mmask64 Lowest(std::int64_t count) {
+  return count >= VectorBytes ? ~__mmask64{0} : (__mmask64{1} << count) - 1;
+}
+
+/// Stores bytes: of each lane the lowest, in the order that a pixel has.
+struct ByteWriter {
+  using Value = Sample;
+
+  ZOR_VNNI_INLINE ByteWriter(const PixelOrder& order, int channels, int pixels) : Count(order.Count) {
+    alignas(VectorBytes) std::uint8_t index[VectorBytes] = {};
+    for (int p = 0; p < pixels; ++p)
+      for (int b = 0; b < Count; ++b)
+        if (const int channel = order.Channel[b]; channel != PixelOrder::Zero) {
+          index[p * Count + b] = std::uint8_t((p * channels + channel) * 4);
+          Shown |= __mmask64{1} << (p * Count + b);
+        }
+    Index = _mm512_load_si512(index);
+  }
+  /// `room` values may be overwritten; those behind the group's own are made later.
+  ZOR_VNNI_INLINE void Write(__m512i lanes, Sample* into, int count, std::int64_t room) const {
+    const __m512i pixels = _mm512_maskz_permutexvar_epi8(Shown, Index, lanes);
+    if (count <= 32 && room >= 32)
+      _mm256_storeu_si256(reinterpret_cast<__m256i*>(into), _mm512_castsi512_si256(pixels));
+    else
+      _mm512_mask_storeu_epi8(into, Lowest(count), pixels);
+  }
+
+  int Count;
+  __m512i Index;
+  __mmask64 Shown = 0;
+};
+
+/// Stores floats, a lane each, in the order that a pixel has.
+struct FloatWriter {
+  using Value = float;
+
+  ZOR_VNNI_INLINE FloatWriter(const PixelOrder& order, int channels, int pixels) : Count(order.Count) {
+    alignas(VectorBytes) std::int32_t index[Lanes] = {};
+    for (int p = 0; p < pixels; ++p)
+      for (int b = 0; b < Count; ++b) index[p * Count + b] = p * channels + order.Channel[b];
+    Index = _mm512_load_si512(index);
+  }
+  ZOR_VNNI_INLINE void Write(__m512i lanes, float* into, int, std::int64_t) const {
+    _mm512_storeu_ps(into, _mm512_permutexvar_ps(Index, _mm512_cvtepi32_ps(lanes)));
+  }
+
+  int Count;
+  __m512i Index;
+};
+
+}
+
+/// Runs groups over one row or four.
+struct GroupRunner {
+  /// A lane's sum, its digits put together.
+  template <int Digits>
+  ZOR_VNNI_INLINE static __m512i Joined(const __m512i* digits) {
+    __m512i sum = digits[0];
+    if constexpr (Digits > 1) sum = _mm512_add_epi32(_mm512_slli_epi32(sum, 8), digits[1]);
+    if constexpr (Digits > 2) sum = _mm512_add_epi32(_mm512_slli_epi32(sum, 8), digits[2]);
+    return Digits < 3 ? _mm512_slli_epi32(sum, 8 * (3 - Digits)) : sum;
+  }
+
+  /// The parts of a pixel added up.
+  ZOR_VNNI_INLINE static __m512i PartsAdded(__m512i sum, int parts, int lanesOfPart) {
+    const __m512i lane = _mm512_set_epi32(15, 14, 13, 12, 11, 10, 9, 8, 7, 6, 5, 4, 3, 2, 1, 0);
+    __m512i all = sum;
+    for (int part = 1; part < parts; ++part)
+      all = _mm512_add_epi32(
+          all, _mm512_permutexvar_epi32(_mm512_add_epi32(lane, _mm512_set1_epi32(part * lanesOfPart)), sum));
+    return all;
+  }
+
+  template <int Rows, int Digits, class Writer>
+  ZOR_VNNI static void Run(const FixedPointRows& plan, const Sample* const* from,
+                           typename Writer::Value* const* into, const PixelOrder& order, Columns columns) {
+    const int channels = plan.Pair.Channels, lanesOfPart = plan.Pixels * channels;
+    const Writer writer(order, channels, plan.Pixels);
+    const __m512i fraction = _mm512_set1_epi32((1 << FixedPointLine::Bits) - 1),
+                  zero = _mm512_setzero_si512();
+    const __m512i half = _mm512_set1_epi32(1 << (FixedPointLine::Bits - 1)), white = _mm512_set1_epi32(255);
+    const std::int64_t step = std::int64_t{Taps} * plan.Parts * plan.Pair.Source.Step;
+
+    const auto *group = plan.Groups + columns.First / plan.Pixels, *end = group;
+    for (end += (columns.Count() + plan.Pixels - 1) / plan.Pixels; group != end; ++group) {
+      const __m512i take = _mm512_load_si512(group->Index);
+      __m512i sums[Rows][Digits];
+      const Sample* source[Rows];
+      for (int r = 0; r < Rows; ++r) {
+        source[r] = from[r] + plan.Lead + group->Base;
+        for (int d = 0; d < Digits; ++d) sums[r][d] = zero;
+      }
+      const std::int8_t* weights = group->Weights;
+      std::int32_t s = 0;
+      for (; s < group->WholeSteps; ++s, weights += Digits * VectorBytes) {
+        __m512i weight[Digits];
+        for (int d = 0; d < Digits; ++d) weight[d] = _mm512_load_si512(weights + d * VectorBytes);
+        for (int r = 0; r < Rows; ++r) {
+          const __m512i taps = _mm512_permutexvar_epi8(take, _mm512_loadu_si512(source[r] + s * step));
+          for (int d = 0; d < Digits; ++d) sums[r][d] = _mm512_dpbusd_epi32(sums[r][d], taps, weight[d]);
+        }
+      }
+      for (; s < group->Steps; ++s, weights += Digits * VectorBytes) {
+        const std::int64_t left = std::max<std::int64_t>(plan.RowBytes - group->Base - s * step, 0);
+        for (int r = 0; r < Rows; ++r) {
+          const __m512i taps =
+              _mm512_permutexvar_epi8(take, _mm512_maskz_loadu_epi8(Lowest(left), source[r] + s * step));
+          for (int d = 0; d < Digits; ++d)
+            sums[r][d] = _mm512_dpbusd_epi32(sums[r][d], taps, _mm512_load_si512(weights + d * VectorBytes));
+        }
+      }
+
+      const std::int64_t at = std::int64_t{group->FirstColumn - columns.First} * writer.Count;
+      const std::int64_t room = std::int64_t{columns.Count()} * writer.Count - at;
+      for (int r = 0; r < Rows; ++r) {
+        __m512i sum = Joined<Digits>(sums[r]);
+        if (plan.Parts > 1) sum = PartsAdded(sum, plan.Parts, lanesOfPart);
+        sum = _mm512_add_epi32(sum, _mm512_load_si512(group->Bias));
+        const __m512i value = _mm512_srai_epi32(sum, FixedPointLine::Bits);
+        writer.Write(_mm512_min_epi32(_mm512_max_epi32(value, zero), white), into[r] + at,
+                     group->Columns * writer.Count, room);
+        if (!group->MayBeDoubtful) continue;
+        // Near 0 both sides give the same byte.
+        const __mmask16 above = _mm512_cmpge_epi32_mask(sum, half);
+        const __mmask16 near = _mm512_mask_cmplt_epu32_mask(above, _mm512_and_si512(sum, fraction),
+                                                            _mm512_load_si512(group->Doubtful));
+        const std::uint32_t doubt = near | group->AlwaysDoubtful;
+        if (doubt) [[unlikely]]
+          Settle(plan, *group, doubt, from[r], into[r] + at, order);
+      }
+    }
+  }
+
+  /// Makes the samples in doubt by the plain form.
+  template <class Value>
+  [[gnu::noinline, gnu::cold]] static void Settle(const FixedPointRows& plan,
+                                                  const FixedPointRows::ColumnGroup& group,
+                                                  std::uint32_t doubt, const Sample* from, Value* into,
+                                                  const PixelOrder& order) {
+    const PlaneList& planes = plan.Pair.Source;
+    for (; doubt != 0; doubt &= doubt - 1) {
+      const int lane = std::countr_zero(doubt), pixel = lane / plan.Pair.Channels;
+      const int channel = lane % plan.Pair.Channels;
+      if (pixel >= group.Columns) return;
+      const Contribution& line = plan.Table[group.FirstColumn + pixel];
+      const Sample* plane = from + planes.Offset[channel];
+      double sum = 0.0;
+      for (std::int32_t i = 0; i < line.Count; ++i)
+        sum += double(line.Entries[i].Weight) * plane[std::ptrdiff_t{line.Entries[i].Pixel} * planes.Step];
+      const Sample sample = ExactQuotient(sum, line.Sum);
+      for (int b = 0; b < order.Count; ++b)
+        if (order.Channel[b] == channel) into[pixel * order.Count + b] = sample;
+    }
+  }
+
+  template <int Rows, class Writer, class Value = typename Writer::Value>
+  static void RunDigits(const FixedPointRows& plan, const Sample* const* from, Value* const* into,
+                        const PixelOrder& order, Columns columns) {
+    switch (plan.Digits) {
+      case 1: return Run<Rows, 1, Writer>(plan, from, into, order, columns);
+      case 2: return Run<Rows, 2, Writer>(plan, from, into, order, columns);
+      default: return Run<Rows, 3, Writer>(plan, from, into, order, columns);
+    }
+  }
+
+  template <class Writer, class Value = typename Writer::Value>
+  static void RunRows(const FixedPointRows& plan, const Sample* const* from, Value* const* into, int rows,
+                      const PixelOrder& order, Columns columns) {
+    if (rows == FixedPointRows::RowsTogether)
+      RunDigits<FixedPointRows::RowsTogether, Writer>(plan, from, into, order, columns);
+    else
+      RunDigits<1, Writer>(plan, from, into, order, columns);
+  }
+};
+
+void FixedPointRows::Run(const Sample* const* from, Sample* const* into, int rows, const PixelOrder& order,
+                         Columns columns) const {
+  GroupRunner::RunRows<ByteWriter>(*this, from, into, rows, order, columns);
+}
+
+void FixedPointRows::Run(const Sample* const* from, float* const* into, int rows, const PixelOrder& order,
+                         Columns columns) const {
+  GroupRunner::RunRows<FloatWriter>(*this, from, into, rows, order, columns);
+}
+
+}
+
+#else
+
+namespace zor {
+
+// No other processor has such a form, so none is ever built.
+void FixedPointRows::Run(const Sample* const*, Sample* const*, int, const PixelOrder&, Columns) const {}
+void FixedPointRows::Run(const Sample* const*, float* const*, int, const PixelOrder&, Columns) const {}
+
+}
+
+#endif
