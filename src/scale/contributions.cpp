@@ -1,6 +1,7 @@
 #include "scale/contributions.h"
 
 #include <algorithm>
+#include <bit>
 #include <cmath>
 #include <cstdlib>
 
@@ -17,7 +18,9 @@ class KnownValues {
     for (Known& known : Values) known.Distance = -1.0;
   }
   bool At(double a, double& value) {
-    Known& known = Values[std::size_t(a * 4096.0) % std::size(Values)];
+    // Distances of one ratio differ in high bits or in low ones.
+    const std::uint64_t bits = std::bit_cast<std::uint64_t>(a) * 0x9E3779B97F4A7C15U;
+    Known& known = Values[bits >> (64 - SizeBits)];
     if (known.Distance != a) {
       known.Distance = a;
       known.InReach = KernelValue(Kernel, a, known.Value);
@@ -32,7 +35,8 @@ class KnownValues {
     bool InReach;
   };
   ScaleKernel Kernel;
-  Known Values[1024];
+  static constexpr int SizeBits = 10;
+  Known Values[1 << SizeBits];
 };
 
 struct Axis {

@@ -19,13 +19,15 @@ bool Multiple(float weight, std::int64_t& multiple) {
   return true;
 }
 
-/// How far a line's shares lie from what they stand for, and how large they are, summed up.
+/// A line's shares, those above 0 and those below, and how far they lie above or below what they stand for;
+/// the sizes of each summed up.
 struct Shares {
-  double Error = 0.0, Size = 0.0;
+  double Positive = 0.0, Negative = 0.0, TooLarge = 0.0, TooSmall = 0.0;
   void Add(double share, double exact) {
-    Error += std::fabs(share - exact);
-    Size += std::fabs(share);
+    (share > 0.0 ? Positive : Negative) += std::fabs(share);
+    (share > exact ? TooLarge : TooSmall) += std::fabs(share - exact);
   }
+  double Size() const { return Positive + Negative; }
 };
 
 std::int64_t RoundedUp(std::int64_t a, std::int64_t b) { return a >= 0 ? (a + b - 1) / b : -(-a / b); }
@@ -85,9 +87,13 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
     }
     sizes.Add(shares[i], exact);
   }
-  const double bound = std::floor(sizes.Error * 255.0) + 3.0;
-  if (!(sizes.Size * 255.0 + 2.0 * bound < 2147483647.0) || !(bound < One / 4)) return false;
-  if (!onLattice) made = {std::int32_t(bound), 2 * std::uint32_t(bound) + 1};
+  // The 3 cover the rounding of these bounds and of the plain form.
+  const double tooLarge = std::floor(sizes.TooLarge * 255.0) + 3.0;
+  const double tooSmall = std::floor(sizes.TooSmall * 255.0) + 3.0;
+  // A sum lies between the two; what happens on the way to it may pass 32 bits, and comes back.
+  const double farthest = std::fmax(sizes.Positive, sizes.Negative) * 255.0 + tooLarge + tooSmall;
+  if (!(farthest < 2147483647.0) || !(tooLarge + tooSmall < One / 2)) return false;
+  if (!onLattice) made = {std::int32_t(tooSmall), std::uint32_t(tooLarge + tooSmall) + 1};
   return true;
 }
 
@@ -106,8 +112,9 @@ bool MakeFloat(const Contribution& line, float* shares, std::int32_t firstRow, i
   // Stability of Numerical Algorithms", 2002, lemma 3.1. Rows between the entries add nothing and round
   // nothing. 2^-14 covers the roundings of Start and Gap.
   const double rounding = (line.Count + 3) * 0x1p-24 * 1.01;
-  const double bound = 255.0 * (sizes.Error + sizes.Size * rounding) + 0x1p-14;
-  if (!(sizes.Size < 64.0)) return false;
+  const double error = std::fmax(sizes.TooLarge, sizes.TooSmall);
+  const double bound = 255.0 * (error + sizes.Size() * rounding) + 0x1p-14;
+  if (!(sizes.Size() < 64.0)) return false;
   const Lattice lattice = LatticeOf(line);
   if (lattice.Denominator > 0 && (2.0 * bound + lattice.Disturbance) * double(lattice.Denominator) < 0.5) {
     made.Start = float(bound + lattice.Disturbance);

@@ -9,13 +9,15 @@ namespace zor {
 //
 // Let q be the real quotient of a line: the sum over its entries of w s, divided by its Sum S, for samples s
 // of 0 to 255. The plain form computes q but for its own roundings, relatively below (n + 2) 2^-53 for n
-// entries; it then cuts off and clamps. A fast form computes q' from rounded shares u = w / S and knows a
-// bound E with |q' - q| <= E, the roundings of the plain form included. There are two kinds of lines.
+// entries; it then cuts off and clamps. A fast form computes q' from rounded shares u = w / S and knows
+// bounds D and E with q' - E <= q <= q' + D, the roundings of the plain form included. As s goes from 0 to
+// 255, the rounded shares that are too large by d in all add between 0 and 255 d to q', and those too small
+// take as much away. There are two kinds of lines.
 //
-// In general, the plain form's byte is that of every number between q' - E and q' + E as soon as the bytes of
-// these two are the same, since cutting off and clamping never decrease. Where they differ, q' lies within E
-// of a whole number from 1 to 255: the sample is in doubt, and the plain form makes it. With E near 1/2000
-// that is one sample in a thousand of a picture that isn't flat.
+// In general, the plain form's byte is that of every number between q' - E and q' + D as soon as the bytes of
+// these two are the same, since cutting off and clamping never decrease. Where they differ, q' lies close to
+// a whole number from 1 to 255: the sample is in doubt, and the plain form makes it. With D + E near 1/2000
+// that is one sample in two thousand of a picture that isn't flat.
 //
 // On a lattice, all weights are whole multiples m 2^-12 and so is S, as with boxes, and with triangles of
 // simple ratios; then with N the denominator that they leave, every q is a multiple of 1/N and whole numbers
@@ -38,9 +40,9 @@ bool AlwaysInDoubt(const Contribution& line);
 /// A line in whole numbers: q' = sum of Share s / 2^Bits. The sums fit 32 bits.
 struct FixedPointLine {
   static constexpr int Bits = 22;
-  /// Added to the sum before it is cut off: E of a line in general, 0 on a lattice.
+  /// Added to the sum before it is cut off: D of a line in general, 0 on a lattice.
   std::int32_t Bias;
-  /// The sample is in doubt where the Bits low bits of the biased sum are below this.
+  /// The sample is in doubt where the Bits low bits of the biased sum are below this, which is D + E.
   std::uint32_t Doubtful;
 };
 /// The shares of a line, one an entry. False where they don't fit, or the line is always in doubt.
@@ -48,8 +50,8 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
 
 /// A line in single precision: q' = Start + sum of share s, in the order of the entries.
 struct FloatLine {
-  /// Off a lattice q' - E; the sample is in doubt if q' + Gap becomes another byte. On a lattice no less
-  /// than q, and Gap is 0.
+  /// Off a lattice the sums are q' - E and Gap is E + D, so the sample is in doubt if adding Gap makes
+  /// another byte. On a lattice they are no less than q, and Gap is 0.
   float Start, Gap;
 };
 /// Puts the share of each entry at its row's place: that of row `firstRow` at shares[0], the next one's
