@@ -39,6 +39,8 @@ inline constexpr Service<"REALUnlockString", void(HostString*)> REALUnlockString
 inline constexpr Service<"RuntimeRaiseException", void(void*)> RuntimeRaiseException;
 inline constexpr Service<"REALSetPropValueString", unsigned char(void*, const char*, HostString*)>
     REALSetPropValueString;
+inline constexpr Service<"REALGetPropValueInt", unsigned char(void*, const char*, std::int32_t*)>
+    REALGetPropValueInt;
 inline constexpr Service<"newMemoryBlock", MemoryBlock*(std::int32_t)> newMemoryBlock;
 inline constexpr Service<"memoryBlockGetPtr", void*(MemoryBlock*)> memoryBlockGetPtr;
 inline constexpr Service<"PtrToMemoryBlock", MemoryBlock*(void*)> PtrToMemoryBlock;
@@ -48,5 +50,33 @@ inline constexpr Service<"REALFSRefFromFolderItem", unsigned char(FolderItem*, v
 inline constexpr Service<"RuntimeUBound", std::int32_t(IntegerArray*)> RuntimeUBound;
 inline constexpr Service<"RuntimeDirectReadIntArray", std::int32_t(IntegerArray*, std::int32_t)>
     RuntimeDirectReadIntArray;
+
+inline constexpr Service<"lockPictureDescription", void(HostPicture*, PictureDescription*)>
+    lockPictureDescription;
+inline constexpr Service<"REALLockPictureDescription",
+                         unsigned char(HostPicture*, PictureDescription*, std::int32_t)>
+    REALLockPictureDescription;
+inline constexpr Service<"unlockPictureDescription", void(HostPicture*)> unlockPictureDescription;
+inline constexpr Service<"newPicture", HostPicture*(std::int32_t, std::int32_t, std::int32_t)> newPicture;
+inline constexpr Service<"REALPictureClearCache", void(HostPicture*)> REALPictureClearCache;
+inline constexpr Service<"pluginPictureGraphicsGetter", void*(HostPicture*)> pluginPictureGraphicsGetter;
+inline constexpr Service<"REALGetPictureMask",
+                         HostPicture*(HostPicture*, std::int32_t, std::int32_t, std::int32_t)>
+    REALGetPictureMask;
+inline constexpr Service<"REALLoadObjectMethod", void*(void*, const char*)> REALLoadObjectMethod;
+
+// QuickDraw, where the host has one.
+inline constexpr Service<"GetGWorldPixMap", void*(void*)> GetGWorldPixMap;
+inline constexpr Service<"GetPortPixMap", void*(void*)> GetPortPixMap;
+inline constexpr Service<"GetPixDepth", std::int32_t(void*)> GetPixDepth;
+inline constexpr Service<"LockPixels", unsigned char(void*)> LockPixels;
+inline constexpr Service<"UnlockPixels", void(void*)> UnlockPixels;
+inline constexpr Service<"GetPixBaseAddr", void*(void*)> GetPixBaseAddr;
+inline constexpr Service<"GetPixRowBytes", std::int32_t(void*)> GetPixRowBytes;
+inline constexpr Service<"NewGWorld", std::int32_t(void**, std::int32_t, const QuickDrawBounds*, void*, void*,
+                                                   std::uint32_t)>
+    NewGWorld;
+inline constexpr Service<"DisposeGWorld", void(void*)> DisposeGWorld;
+inline constexpr Service<"GetCTable", void*(std::int32_t)> GetCTable;
 
 }

@@ -11,8 +11,8 @@
 namespace zor {
 namespace {
 
-constexpr auto Methods = InTableOrder(ImageMethods, ScaleMethods, FilterMethods);
-static_assert(Methods.size() == 48);
+constexpr auto Methods = InTableOrder(ImageMethods, ScaleMethods, FilterMethods, ExchangeMethods);
+static_assert(Methods.size() == 74);
 MethodRecord MethodTable[Methods.size()];
 
 constexpr auto SharedMethods = InTableOrder(SharedPictureMethods);

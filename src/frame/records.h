@@ -79,6 +79,32 @@ static_assert(offsetof(ClassRecord, Constants) == 18 * sizeof(Word));
 static_assert(offsetof(ClassRecord, ClassFlags) == 20 * sizeof(Word));
 static_assert(offsetof(ClassRecord, SharedMethods) == 23 * sizeof(Word));
 
+/// What the host tells of a picture while its description is open.
+struct PictureDescription {
+  /// The form that the pixels are given in.
+  std::int32_t Kind;
+  void* Data;
+  std::int32_t Width, Height, Reserved[2];
+};
+
+/// Forms whose pixels can be reached: `Data` is a GWorld, or a record with a table of rows.
+inline constexpr std::int32_t GWorldForm = 4, RowTableForm = 10;
+
+/// Where the fields of the record behind a picture with a table of rows stand, in bytes. None is aligned.
+struct RowRecord {
+  static constexpr std::size_t Zero = 0, Width = 4, Height = 8, NotZero = 7224, Rows = 7228,
+                               Size = Rows + sizeof(void*);
+};
+
+/// Where an instance of GWorldZOR holds its GWorld, in bytes from the object itself, and the byte 1 behind
+/// it.
+inline constexpr std::size_t GWorldAt = 24, GWorldMarkAt = GWorldAt + sizeof(void*);
+
+/// The bounds of a GWorld.
+struct QuickDrawBounds {
+  std::int16_t Top, Left, Bottom, Right;
+};
+
 /// The address of a service by its name, or null.
 using Resolver = void* (*)(const char* name);
 

@@ -63,8 +63,12 @@ Rectangle FilterRect(const PictureData& picture, Rectangle r) {
 }
 
 Block CopyRect(const PictureData& dest, const PictureData& source, Block block) {
-  const Span columns = ClipAxes(block.Dest.X, block.Dest.Width, block.SourceX, dest.Width, source.Width);
-  const Span rows = ClipAxes(block.Dest.Y, block.Dest.Height, block.SourceY, dest.Height, source.Height);
+  return CopyRect(dest, source.Width, source.Height, block);
+}
+
+Block CopyRect(const PictureData& dest, std::int32_t sourceWidth, std::int32_t sourceHeight, Block block) {
+  const Span columns = ClipAxes(block.Dest.X, block.Dest.Width, block.SourceX, dest.Width, sourceWidth);
+  const Span rows = ClipAxes(block.Dest.Y, block.Dest.Height, block.SourceY, dest.Height, sourceHeight);
   const Rectangle clipped = Clipped(columns, rows);
   if (clipped.Empty()) return {};
   return {clipped, std::int32_t(columns.SourceAt), std::int32_t(rows.SourceAt)};

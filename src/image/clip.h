@@ -23,5 +23,6 @@ struct Block {
 /// source origin moves the destination's origin left or up by as much and shortens the block; then a
 /// negative width or height means to the left or upwards of the destination's origin.
 Block CopyRect(const PictureData& dest, const PictureData& source, Block block);
+Block CopyRect(const PictureData& dest, std::int32_t sourceWidth, std::int32_t sourceHeight, Block block);
 
 }

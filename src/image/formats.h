@@ -10,6 +10,7 @@ namespace zor {
 /// The codes that operations name themselves; the table in formats.cpp has all 39.
 enum FormatCode : std::int32_t {
   FormatRGB = 1,
+  FormatARGB = 4,
   FormatXRGB = 5,
   FormatBGR = 6,
   FormatXBGR = 10,

@@ -25,9 +25,6 @@ bool SizeInMemory(PictureData& data) {
   return data.RowSize > 0;
 }
 
-/// A constructor builds a picture once: on one that was built before, closed or not, it does nothing.
-bool IsNew(const PictureData& data) { return !data.Valid && !data.Samples; }
-
 /// The platform's clock in sixtieths of a second, as 32 bits that wrap round.
 std::uint32_t TickCount() {
   timespec now{};

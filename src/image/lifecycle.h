@@ -17,6 +17,9 @@ inline void Unlock(void* object) {
   if (object) REALUnlockObject(object);
 }
 
+/// A constructor builds a picture once: on one that was built before, closed or not, it does nothing.
+inline bool IsNew(const PictureData& data) { return !data.Valid && !data.Samples; }
+
 /// A new, empty object of the class with a reference for the caller; nil when the host has none to give.
 PictureZOR* NewPictureObject();
 
