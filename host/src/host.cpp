@@ -42,6 +42,8 @@ void Host::Load(const std::filesystem::path& module, const Options& options) {
   Runtime& runtime = TheRuntime();
   runtime.Version = options.Version;
   runtime.Hidden = options.Hidden;
+  runtime.Pictures = options.Pictures;
+  runtime.BytesOfDepth24 = options.BytesOfDepth24;
   entry([](const char* name) { return ServiceNamed(name); });
   ThrowPending();
   LoadedModule() = path;
@@ -50,6 +52,8 @@ void Host::Load(const std::filesystem::path& module, const Options& options) {
 bool Host::IsLoaded() { return !LoadedModule().empty(); }
 
 void Host::OnYield(std::function<void()> hook) { TheRuntime().OnYield = std::move(hook); }
+
+void Host::MakePicturesAs(PictureForm form) { TheRuntime().Pictures = form; }
 
 void Host::Hide(const std::string& service, bool hidden) {
   auto& names = TheRuntime().Hidden;

@@ -6,14 +6,17 @@
 #include <new>
 #include <utility>
 
+#include "quickdraw.h"
+
 namespace picturezor::model {
 namespace {
 
 Runtime* MakeRuntime() {
   auto* runtime = new Runtime;
-  for (const char* name :
-       {"OutOfBoundsException", "NilObjectException", "MemoryBlock", "FolderItem", "IntegerArray"})
+  for (const char* name : {"OutOfBoundsException", "NilObjectException", "MemoryBlock", "FolderItem",
+                           "IntegerArray", "Picture", "Graphics"})
     runtime->Classes[Lower(name)] = {.Name = name};
+  runtime->Classes["gworldzor"] = {.Name = "GWorldZOR", .Destructor = quickdraw::DisposeOfInstance};
   return runtime;
 }
 
@@ -91,6 +94,10 @@ void Register(zor::ClassRecord* record) {
   TheRuntime().Classes[Lower(added.Name)] = std::move(added);
 }
 
+bool IsHidden(std::string_view name) {
+  return std::ranges::find(TheRuntime().Hidden, name) != TheRuntime().Hidden.end();
+}
+
 bool MayCreate() {
   int& left = TheRuntime().CreationsLeft;
   if (left == 0) return false;
@@ -100,8 +107,8 @@ bool MayCreate() {
 
 void* NewObject(const Class& of, std::unique_ptr<Payload> holds) {
   void* memory = ::operator new (InstanceOffset + of.DataSize, std::align_val_t{InstanceOffset});
+  std::memset(memory, 0, InstanceOffset + of.DataSize);
   new (memory) ObjectHeader{&of, 1, std::move(holds)};
-  std::memset(InstanceOf(memory), 0, of.DataSize);
   ++TheRuntime().Alive.Objects;
   ++TheRuntime().AliveOf[&of];
   return memory;

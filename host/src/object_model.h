@@ -68,6 +68,10 @@ struct Runtime {
   std::vector<std::string> Hidden;
   std::function<void()> OnYield;
   double Version = 0;
+  PictureForm Pictures = PictureForm::GWorld32;
+  int BytesOfDepth24 = 3;
+  /// Told the name of each service of pictures and QuickDraw that is called.
+  std::function<void(const char* service)> OnPictureService;
   int CreationsLeft = -1;
   Host::Alive Alive;
   std::map<const Class*, int> AliveOf;
@@ -136,8 +140,20 @@ void* Created(Make&& make) {
   }
 }
 
+bool IsHidden(std::string_view name);
+
 /// Throws what the module raised, or what code called by it threw, during the call that has just returned.
 void ThrowPending();
+
+struct Service {
+  const char* Name;
+  void* Address;
+};
+
+template <class Function>
+void* AddressOf(Function* function) {
+  return reinterpret_cast<void*>(function);
+}
 
 /// The address of a service by its name, or null.
 void* ServiceNamed(const char* name);

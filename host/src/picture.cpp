@@ -86,6 +86,10 @@ Picture::Picture(const MemoryBlock& block, std::int32_t width, std::int32_t heig
   Invoke<void>(*this, "Constructor", block, width, height, Code(format), rowSize);
 }
 
+Picture::Picture(const HostPicture& picture, bool useAlpha) : Object(NewPictureObject()) {
+  Invoke<void>(*this, "Constructor", picture, useAlpha);
+}
+
 Picture Picture::Mapped(const std::filesystem::path& file, std::int32_t width, std::int32_t height,
                         Format format, std::int32_t blockSize) {
   const Picture picture{NewPictureObject()};
@@ -154,6 +158,8 @@ PictureFactory Picture::Factory() const { return Get<PictureFactory>(*this, "Fac
 void Picture::SetFactory(const PictureFactory& factory) const { Set(*this, "Factory", factory); }
 Picture Picture::Parent() const { return Get<Picture>(*this, "Parent"); }
 MemoryBlock Picture::MemoryTarget() const { return Get<MemoryBlock>(*this, "MemoryTarget"); }
+HostPicture Picture::Target() const { return Get<HostPicture>(*this, "Target"); }
+HostPicture Picture::DebugPicture() const { return Get<HostPicture>(*this, "DebugPicture"); }
 bool Picture::DebugPictureEnabled() const { return BooleanProperty("DebugPictureEnabled"); }
 void Picture::SetDebugPictureEnabled(bool enabled) const { Set(*this, "DebugPictureEnabled", enabled); }
 MemoryBlock Picture::Memory() const { return Get<MemoryBlock>(*this, "Memory"); }

@@ -2,11 +2,13 @@
 #include <climits>
 #include <cstring>
 #include <filesystem>
+#include <span>
 #include <stdexcept>
 #include <utility>
 
 #include "host_strings.h"
-#include "object_model.h"
+#include "pictures.h"
+#include "quickdraw.h"
 
 // The services that the module asks for by name. Each has the C type that the module calls it by.
 
@@ -24,7 +26,7 @@ void PluginRegisterClass(void* record) {
 }
 
 void* PluginNewInstance(const char* className) {
-  const Class* of = FindClass(className);
+  const Class* of = IsHidden(className) ? nullptr : FindClass(className);
   if (!of) return nullptr;
   const bool exception = of->Name.ends_with("Exception");
   return Created([&] { return NewObject(*of, exception ? std::make_unique<ExceptionPayload>() : nullptr); });
@@ -142,16 +144,6 @@ std::int32_t RuntimeDirectReadIntArray(void* array, std::int32_t index) {
   });
 }
 
-struct Service {
-  const char* Name;
-  void* Address;
-};
-
-template <class Function>
-void* AddressOf(Function* function) {
-  return reinterpret_cast<void*>(function);
-}
-
 void* ResolveSecond(const char* name) { return ServiceNamed(name); }
 
 const Service Services[] = {
@@ -181,11 +173,12 @@ const Service Services[] = {
 }
 
 void* ServiceNamed(const char* name) {
-  const auto& hidden = TheRuntime().Hidden;
-  if (std::ranges::find(hidden, name) != hidden.end()) return nullptr;
-  const auto found = std::ranges::find_if(
-      Services, [&](const Service& service) { return !std::strcmp(service.Name, name); });
-  return found == std::end(Services) ? nullptr : found->Address;
+  if (IsHidden(name)) return nullptr;
+  for (const std::span<const Service> services :
+       {std::span<const Service>(Services), PictureServices(), quickdraw::Services()})
+    for (const Service& service : services)
+      if (!std::strcmp(service.Name, name)) return service.Address;
+  return nullptr;
 }
 
 }

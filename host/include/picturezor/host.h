@@ -28,6 +28,11 @@ class HostException : public std::runtime_error {
   std::string Name;
 };
 
+/// The ways in which a host can hold the pixels of its pictures: in a GWorld of 32, 24 or 16 bits, in one of
+/// three forms that nobody can look into but that can be drawn, in a table of rows, or in a way that can't be
+/// asked for at all.
+enum class PictureForm { GWorld32, GWorld24, GWorld16, Form1, Form2, Form3, Rows, None };
+
 /// The host that the module runs in: object model, strings, memory blocks, events, exceptions and services.
 ///
 /// There is one a process, since the module keeps process-wide state and stays loaded. All calls come from
@@ -40,6 +45,10 @@ class Host {
     double Version = 2011.01;
     /// Names of services that this host doesn't know.
     std::vector<std::string> Hidden;
+    /// How its pictures hold their pixels. The module takes the first one that it meets for all.
+    PictureForm Pictures = PictureForm::GWorld32;
+    /// Bytes of a pixel in a new GWorld of 24 bits, 3 or 4.
+    int BytesOfDepth24 = 3;
   };
 
   /// Loads the module; once more with the same path does nothing. Throws ModuleError.
@@ -51,7 +60,11 @@ class Host {
   /// out of the call that yielded, once the module has returned.
   static void OnYield(std::function<void()> hook);
 
-  /// Hides a service from now on, or shows it again. What the module has looked up already it keeps.
+  /// The form of pictures that are made from now on.
+  static void MakePicturesAs(PictureForm form);
+
+  /// Hides a service from now on, or shows it again. What the module has looked up already it keeps; services
+  /// of pictures and of QuickDraw fail then. A class can be hidden too, and "DrawPicture".
   static void Hide(const std::string& service, bool hidden = true);
   /// Makes services that create something fail: the next `successes` creations of objects, strings and blocks
   /// work, all later ones give null. A negative number ends it.
@@ -60,6 +73,8 @@ class Host {
   /// What is alive now. A program that has dropped all it holds sees zeros.
   struct Alive {
     int Objects = 0, Strings = 0, MemoryBlocks = 0;
+    /// Descriptions of pictures that are open, GWorlds, and times that pixels were locked and not unlocked.
+    int OpenDescriptions = 0, GWorlds = 0, PixelLocks = 0;
     bool operator==(const Alive&) const = default;
   };
   static Alive Count();

@@ -3,6 +3,7 @@
 #include <optional>
 
 #include "picturezor/host.h"
+#include "picturezor/host_picture.h"
 #include "picturezor/object.h"
 
 namespace picturezor {
@@ -93,11 +94,6 @@ enum class DitherMatrix : std::int32_t {
   Cluster8,
 };
 
-struct Color {
-  std::uint8_t Red = 0, Green = 0, Blue = 0;
-  std::int32_t Packed() const { return Red << 16 | Green << 8 | Blue; }
-};
-
 /// A rectangle of pixels. A negative width or height means to the left or upwards; what lies outside a
 /// picture is left out.
 struct Rect {
@@ -124,6 +120,8 @@ class Picture : public Object {
   /// too small for it.
   Picture(const MemoryBlock& block, std::int32_t width, std::int32_t height, Format format,
           std::int32_t rowSize);
+  /// Over the pixels of a host picture; see Constructor in the module. Alpha only `useAlpha`.
+  explicit Picture(const HostPicture& picture, bool useAlpha = false);
   /// In a temporary file, which is created or overwritten and goes away with the last picture using it. About
   /// `blockSize` bytes of it, at least 16 MiB and five rows, are in the address space at a time. Needs 5
   /// rows.
@@ -195,9 +193,12 @@ class Picture : public Object {
   Picture Parent() const;
   /// The caller's block that holds the samples, or nil.
   MemoryBlock MemoryTarget() const;
-  /// Whether the module may show this picture to a debugger.
+  /// The host picture that holds the samples, or nil.
+  HostPicture Target() const;
+  /// Whether the module may show this picture to a debugger, and the corner that it shows.
   bool DebugPictureEnabled() const;
   void SetDebugPictureEnabled(bool enabled) const;
+  HostPicture DebugPicture() const;
   /// The start of the store, or of the window of a mapped one; nil without either. It has no size of its own.
   MemoryBlock Memory() const;
 
@@ -237,6 +238,47 @@ class Picture : public Object {
   Picture ClipImage() const;
   Picture ClipImage(const Rect& rect) const;
   Picture MirroredView() const;
+
+  // Into new host pictures; nil where it fails. Alpha becomes a gray picture, white where it is 255.
+  HostPicture CopyPicture() const;
+  HostPicture CopyPicture(const Rect& rect) const;
+  HostPicture CopyMask() const;
+  HostPicture CopyMask(const Rect& rect) const;
+  HostPicture CopyPictureWithMask() const;
+  HostPicture CopyPictureWithMask(const Rect& rect) const;
+  GWorld CopyGWorld() const;
+
+  // From host pictures, without scaling: all of one, or a block of it, to a place in this picture. Nothing
+  // changes where it fails.
+  void DrawPictureRedToGrayChannel(const HostPicture& picture, const Rect& dest) const;
+  void DrawPictureRedToGrayChannel(const HostPicture& picture, const Rect& dest, std::int32_t sourceX,
+                                   std::int32_t sourceY) const;
+  void DrawPictureGreenToGrayChannel(const HostPicture& picture, const Rect& dest) const;
+  void DrawPictureGreenToGrayChannel(const HostPicture& picture, const Rect& dest, std::int32_t sourceX,
+                                     std::int32_t sourceY) const;
+  void DrawPictureBlueToGrayChannel(const HostPicture& picture, const Rect& dest) const;
+  void DrawPictureBlueToGrayChannel(const HostPicture& picture, const Rect& dest, std::int32_t sourceX,
+                                    std::int32_t sourceY) const;
+  void DrawPictureRGB(const HostPicture& picture) const;
+  void DrawPictureRGB(const HostPicture& picture, std::int32_t x, std::int32_t y) const;
+  void DrawPictureRGB(const HostPicture& picture, const Rect& dest) const;
+  void DrawPictureRGB(const HostPicture& picture, const Rect& dest, std::int32_t sourceX,
+                      std::int32_t sourceY) const;
+  /// The mask becomes alpha.
+  void DrawMaskedPictureRGB(const HostPicture& picture, bool invertMask = false) const;
+  void DrawMaskedPictureRGB(const HostPicture& picture, std::int32_t x, std::int32_t y,
+                            bool invertMask = false) const;
+  void DrawMaskedPictureRGB(const HostPicture& picture, const Rect& dest, bool invertMask = false) const;
+  void DrawMaskedPictureRGB(const HostPicture& picture, const Rect& dest, std::int32_t sourceX,
+                            std::int32_t sourceY, bool invertMask = false) const;
+  /// The mask says how much of this picture stays: all where it is white, or none with `invertMask`.
+  void DrawMaskedPictureApplyMaskRGB(const HostPicture& picture, bool invertMask = false) const;
+  void DrawMaskedPictureApplyMaskRGB(const HostPicture& picture, std::int32_t x, std::int32_t y,
+                                     bool invertMask = false) const;
+  void DrawMaskedPictureApplyMaskRGB(const HostPicture& picture, const Rect& dest,
+                                     bool invertMask = false) const;
+  void DrawMaskedPictureApplyMaskRGB(const HostPicture& picture, const Rect& dest, std::int32_t sourceX,
+                                     std::int32_t sourceY, bool invertMask = false) const;
 
   // Scaling: `source`, resampled, into the top left width x height pixels of this picture. False where the
   // formats have no way to each other, or the size doesn't fit.
