@@ -1,8 +1,6 @@
 #include <dlfcn.h>
 #include <gmock/gmock.h>
 
-#include <cstdio>
-#include <cstdlib>
 #include <functional>
 #include <map>
 #include <string>
@@ -10,6 +8,7 @@
 
 #include "frame/records.h"
 #include "picturezor/picture.h"
+#include "support/in_child.h"
 
 // What happens at load: a module loads once a process, so each case runs in a child.
 
@@ -19,17 +18,6 @@ namespace {
 using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
-
-/// Runs the body in a child process, and fails where an expectation in it failed.
-void InChild(const std::function<void()>& body) {
-  const auto run = [&] {
-    body();
-    // At once: an exception that can't be raised is nobody's to free, and no leak of the module's.
-    std::fflush(nullptr);
-    std::_Exit(testing::Test::HasFailure() ? 1 : 0);
-  };
-  EXPECT_EXIT(run(), testing::ExitedWithCode(0), "");
-}
 
 std::string MessageOf(const std::function<void()>& call) {
   try {

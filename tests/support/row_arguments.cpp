@@ -42,6 +42,12 @@ RowArguments::RowArguments(StoredPicture::Kind kind, Format format)
       EmptyFactory(PictureFactory::Handler{}),
       Text(model::NewString(std::string(BlockSize, 'x'), model::UTF8)),
       EmptyText(model::NewString("", model::UTF8)) {
+  for (const PictureForm form : {PictureForm::GWorld32, PictureForm::GWorld24, PictureForm::GWorld16,
+                                 PictureForm::Form2, PictureForm::None}) {
+    Hosts.emplace_back(Width, Height, form);
+    Hosts.back().MakeMask();
+  }
+  Hosts.emplace_back(1, 1);
   const Picture closed(Width, Height, format);
   closed.Close();
   Odd = {UnbuiltPicture(),
@@ -88,6 +94,7 @@ Value RowArguments::Ordinary(const MethodEntry& row, const Parameter& parameter)
   }
   if (type == "double") return {.Real = row.LowerName == "rotate" ? 30.0 : 1.5};
   if (type == "picturezor") return Of(Second.Get());
+  if (type == "picture") return Of(Hosts[0]);
   if (type == "memoryblock") return Of(Block);
   if (type == "integer()") return Of(Numbers);
   if (type == "folderitem") return Of(File);
@@ -122,6 +129,8 @@ std::vector<Value> RowArguments::Hostile(const model::TypeName& type) const {
     values.push_back(Of(Self()));
     for (const Picture& picture : Odd) values.push_back(Of(picture));
   }
+  if (type == "picture")
+    for (const HostPicture& picture : Hosts) values.push_back(Of(picture));
   if (type == "memoryblock") values.push_back(Of(EmptyBlock));
   if (type == "string") values.push_back({.Address = EmptyText});
   if (type == "integer()")

@@ -36,6 +36,7 @@ class RowArguments {
   TemporaryFile Path;
   FolderItem File, NoFile, Folder;
   PictureFactory Factory, EmptyFactory;
+  std::vector<HostPicture> Hosts;
   model::StringRecord *Text, *EmptyText;
 };
 

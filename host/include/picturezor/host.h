@@ -44,7 +44,7 @@ class Host {
     /// The version that the host says it has.
     double Version = 2011.01;
     /// Names of services that this host doesn't know.
-    std::vector<std::string> Hidden;
+    std::vector<std::string> Hidden{};
     /// How its pictures hold their pixels. The module takes the first one that it meets for all.
     PictureForm Pictures = PictureForm::GWorld32;
     /// Bytes of a pixel in a new GWorld of 24 bits, 3 or 4.
