@@ -122,6 +122,8 @@ Outcome CallShape(const std::string& letters, std::uintptr_t function, void* obj
     model::ThrowPending();
   } catch (const HostException& exception) {
     outcome.Raised = exception.ClassName();
+  } catch (const std::exception& exception) {
+    outcome.Raised = exception.what();
   }
   return outcome;
 }

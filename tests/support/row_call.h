@@ -20,7 +20,8 @@ struct Value {
   void* Address = nullptr;
 };
 
-/// What a call gave, and the class of the exception that it raised; empty for none.
+/// What a call gave, and the class of the exception that it raised; empty for none. Of one that the program's
+/// own code threw meanwhile, what it says.
 struct Outcome {
   Value Result;
   std::string Raised;
