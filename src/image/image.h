@@ -16,7 +16,8 @@ void Constructor(PictureZOR* self, MemoryBlock* buf, Integer width, Integer heig
                  Integer rowSize);
 /// A picture in a temporary file, which is created or overwritten, takes up its full size on the disk from
 /// the start, and is removed when the last picture using it has been closed. About `blockSize` bytes of it
-/// are mapped at a time, as ComputeBlockSize says. A picture of fewer than 5 rows isn't `Valid`.
+/// are mapped at a time, as ComputeBlockSize says. A picture of fewer than 5 rows isn't `Valid`, nor one on a
+/// file that another picture of the process is using, or on what isn't a plain file.
 void Constructor(PictureZOR* self, Integer width, Integer height, Integer format, Integer blockSize,
                  FolderItem* filePath);
 /// Ends the picture; also the destructor. Its store lives on while a view uses it. More than once is

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sys/mman.h>
+#include <sys/stat.h>
 #include <sys/statvfs.h>
 #include <unistd.h>
 
@@ -9,6 +10,7 @@
 #include <cerrno>
 #include <cstdlib>
 #include <limits>
+#include <utility>
 
 #include "frame/host_services.h"
 #include "image/formats.h"
@@ -37,6 +39,22 @@ Store* NewStore(PictureData& data) {
   return store;
 }
 
+/// All stores on files.
+Store* StoresOnFiles = nullptr;
+
+/// Whether a picture may be put on the file. One that another picture is on would lose its rows, and touching
+/// those would end the process; a device, or a pipe, is no place for one.
+bool MayBeOverwritten(int fileDescriptor) {
+  struct stat file {};
+  if (fstat(fileDescriptor, &file) != 0 || !S_ISREG(file.st_mode)) return false;
+  for (const Store* store = StoresOnFiles; store; store = store->NextOnFile) {
+    struct stat used {};
+    if (fstat(store->FileDescriptor, &used) != 0) return false;
+    if (used.st_dev == file.st_dev && used.st_ino == file.st_ino) return false;
+  }
+  return true;
+}
+
 void EndFile(int fileDescriptor, char* path) {
   // Where the file can't be cut, removing it frees its blocks all the same.
   if (ftruncate(fileDescriptor, 0) != 0) errno = 0;
@@ -47,7 +65,12 @@ void EndFile(int fileDescriptor, char* path) {
 
 void EndStore(Store* store) {
   std::free(store->Memory);
-  if (store->Path) EndFile(store->FileDescriptor, store->Path);
+  if (store->Path) {
+    Store** place = &StoresOnFiles;
+    while (*place != store) place = &(*place)->NextOnFile;
+    *place = store->NextOnFile;
+    EndFile(store->FileDescriptor, store->Path);
+  }
   if (store->Keeper) REALUnlockObject(store->Keeper);
   std::free(store);
 }
@@ -63,7 +86,7 @@ bool HasRoom(int fileDescriptor, std::int64_t bytes) {
 /// Gives the file its size, with every block reserved: a sparse page that can't be backed later would end the
 /// process in the middle of a row.
 bool ReserveFile(int fileDescriptor, std::int64_t total) {
-  if (!HasRoom(fileDescriptor, total)) return false;
+  if (ftruncate(fileDescriptor, 0) != 0 || !HasRoom(fileDescriptor, total)) return false;
   if (ftruncate(fileDescriptor, off_t(total + PageSize)) != 0) return false;
   if (lseek(fileDescriptor, off_t(total), SEEK_SET) != off_t(total)) return false;
   static constexpr char zeros[TailSize] = {};
@@ -170,8 +193,10 @@ bool UseHostMemory(PictureData& data, void* base, void* keeper) {
 }
 
 bool UseMappedFile(PictureData& data, char* path, std::int32_t blockSize) {
-  const int fileDescriptor = open(path, O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, S_IRUSR | S_IWUSR);
-  if (fileDescriptor < 0) {
+  // Cut once it is known that nobody is on it. Not waiting, since a pipe would wait for its other end.
+  const int fileDescriptor = open(path, O_RDWR | O_CREAT | O_CLOEXEC | O_NONBLOCK, S_IRUSR | S_IWUSR);
+  if (fileDescriptor < 0 || !MayBeOverwritten(fileDescriptor)) {
+    if (fileDescriptor >= 0) close(fileDescriptor);
     std::free(path);
     return false;
   }
@@ -182,6 +207,7 @@ bool UseMappedFile(PictureData& data, char* path, std::int32_t blockSize) {
   }
   store->FileDescriptor = fileDescriptor;
   store->Path = path;
+  store->NextOnFile = std::exchange(StoresOnFiles, store);
   data.WindowFirstRow = data.WindowLastRow = -1;
   data.PixelBase = nullptr;
   data.IsMapping = true;

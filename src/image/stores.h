@@ -19,6 +19,7 @@ struct Store {
   /// The mapped file with its `calloc`ed path, or a null path.
   char* Path;
   int FileDescriptor;
+  Store* NextOnFile;
 };
 
 /// Bytes of a page as the stores count them: the system's, but at least 4096.
@@ -37,8 +38,9 @@ bool UseOwnMemory(PictureData& data);
 bool UseHostMemory(PictureData& data, void* base, void* keeper);
 
 /// Puts the picture on a new file, whose `calloc`ed path it takes over, and maps the first window, of about
-/// `blockSize` bytes. An existing file is overwritten. False when the file can't be made at its full size:
-/// then it is removed. When only the window fails, the file stays until `LeaveStore`.
+/// `blockSize` bytes. An existing file is overwritten, but for one that a picture of this process is using,
+/// and for what isn't a plain file: these are refused and stay. False when the file can't be made at its full
+/// size: then it is removed. When only the window fails, the file stays until `LeaveStore`.
 bool UseMappedFile(PictureData& data, char* path, std::int32_t blockSize);
 
 /// Puts a view, whose size, layout and `RowGetter` stand, on its parent's store. On a mapped store it gets a

@@ -64,7 +64,8 @@ class Program {
     const int width = In.Between(1, 40), height = In.Between(1, 24);
     const auto format = Format(In.Between(0, 41));
     switch (In.Between(0, 3)) {
-      case 0: return Filled(Picture::Mapped(File.Path(), width, height, format, 1));
+      case 0:
+        return Filled(Picture::Mapped(Files[std::size_t(In.Between(0, 3))].Path(), width, height, format, 1));
       case 1: {
         // Just as many bytes as the rows need, so that a sanitizer sees the first one beyond.
         const int pixels = width * BytesPerPixel(format), rowSize = In.Between(0, 2) ? pixels + 3 : 4;
@@ -188,10 +189,10 @@ class Program {
   }
 
   Input In;
-  TemporaryFile File;
+  const TemporaryFile Files[4];
   std::vector<Picture> Pictures;
   const MemoryBlock Block{BlockSize};
-  const FolderItem Folder{File.Path()};
+  const FolderItem Folder{Files[0].Path()};
   const std::vector<IntegerArray> Arrays = {IntegerArray(std::vector<std::int32_t>(256, 200)),
                                             IntegerArray({1, -2, 2147483647, 4, 5, 6, 7, 8, 9}),
                                             IntegerArray(std::vector<std::int32_t>{})};

@@ -144,6 +144,30 @@ TEST(MappedStore, IsRefusedWithoutAFile) {
   EXPECT_FALSE(std::filesystem::exists(file.Path()));
 }
 
+// A second picture on the file would cut it, and the first row of the first one that is touched then would
+// end the process.
+TEST(MappedStore, SharesItsFileWithNobody) {
+  const TemporaryFile file, link;
+  const Picture picture = Picture::Mapped(file.Path(), 40, 20, Format::RGB, 1);
+  FillWithNoise(picture, 31);
+  const std::vector<Samples> rows = StoredRows(picture);
+  std::filesystem::create_symlink(file.Path(), link.Path());
+  for (const auto& path : {file.Path(), link.Path()}) {
+    EXPECT_FALSE(Picture::Mapped(path, 9, 9, Format::G, 1).Valid());
+    EXPECT_EQ(StoredRows(picture), rows);
+  }
+  const Picture view = picture.MirroredView();
+  picture.Close();
+  EXPECT_FALSE(Picture::Mapped(file.Path(), 9, 9, Format::G, 1).Valid()) << "a view is on it still";
+  view.Close();
+  EXPECT_TRUE(Picture::Mapped(file.Path(), 9, 9, Format::G, 1).Valid());
+}
+
+TEST(MappedStore, LeavesDevicesAlone) {
+  EXPECT_FALSE(Picture::Mapped("/dev/null", 9, 9, Format::G, 1).Valid());
+  EXPECT_TRUE(std::filesystem::exists("/dev/null"));
+}
+
 TEST(MemoryStore, TakesABlockSizeToo) {
   if (OtherPages()) GTEST_SKIP();
   const Picture picture(10, 9, Format::G);
