@@ -65,6 +65,18 @@ PictureZOR* DitherFilter(PictureZOR* self, PictureZOR* dest, Integer matrix, Int
 // and the result is the destination with a reference for the caller, or nil. Each plane is treated by itself,
 // alpha like a colour. A group that a filter doesn't serve leaves the destination as it is.
 
+/// Sums up the samples around each sample, weighted by a square of numbers, row by row, whose middle or the
+/// place right of and below it is the sample itself; beyond the edges the nearest row or column counts again.
+/// The result is (sum + delta) scaleFactor, truncated and clamped. A weight of 255 or more leaves its place
+/// out. Numbers that `matrix` doesn't have are 0, nil has none; a dimension below 1 has no places. Nil for a
+/// dimension above 50. Where `dest` shares memory with the source, as when it is the source, pixels are read
+/// as those before them have left them, row by row.
+PictureZOR* ApplyMatrix(PictureZOR* self, PictureZOR* dest, Integer matrixDimension, IntegerArray* matrix);
+PictureZOR* ApplyMatrix(PictureZOR* self, PictureZOR* dest, Integer matrixDimension, IntegerArray* matrix,
+                        Integer delta);
+PictureZOR* ApplyMatrix(PictureZOR* self, PictureZOR* dest, Integer matrixDimension, IntegerArray* matrix,
+                        Integer delta, Double scaleFactor);
+
 /// The mean of the 2r + 1 rows and then of the 2r + 1 columns around each sample, truncated each time; beyond
 /// the edges the nearest row or column counts again. r is the radius truncated; with less than 1 the picture
 /// is copied. Either direction may be left out; without both nothing is written. `dest` may not be the
@@ -76,11 +88,38 @@ PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, Double radius, Boo
 /// make new pictures. With less than 1 iteration the result is the source itself.
 PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, Double radius, Integer iterations,
                           Boolean vertical, Boolean horizontal);
+/// A blur by less than a pixel: k (c + f (p + n)), truncated, down and then along, where f is the fraction of
+/// the radius, k is 1 / (2 f + 1), and p and n are the neighbours of c. Beyond the edges c itself counts; the
+/// first row and the last column count it for both neighbours. An infinite radius has no fraction. `dest` may
+/// be the source. Nil for a picture of no group; without memory the destination stays as it is.
+PictureZOR* BoxBlurFractionalFilter(PictureZOR* self, PictureZOR* dest, Double radius);
+
+/// The mean of the most frequent among `levels` classes of values, the lowest of them on a tie, within
+/// `range` pixels around each sample, as far as there are any. `levels` below 1 count as 1, above 256 as 256;
+/// a negative range counts as 0. Nil for a `dest` with another `PixelSize`; one that shares memory with the
+/// source as in ApplyMatrix.
+PictureZOR* OilFilter(PictureZOR* self, PictureZOR* dest, Integer levels, Integer range);
+/// Each pixel comes from a place up to `level` columns and rows away, chosen by the process's `rand`, or from
+/// the edge where that is nearer; a negative level counts as 0. For gray and RGB. A `dest` that shares memory
+/// with the source as in ApplyMatrix.
+PictureZOR* DiffuseFilter(PictureZOR* self, PictureZOR* dest, Integer level);
+/// 128 and the difference of each sample to the one `level` columns and rows further on, or at the edge,
+/// clamped. For gray and RGB. A `dest` that shares memory with the source as in ApplyMatrix.
+PictureZOR* EngraveFilter(PictureZOR* self, PictureZOR* dest, Integer level);
+/// The root of 2 (a^2 + b^2), at most 255, where a and b are the differences to the samples below and right.
+/// Below the last row lies 0, and right of the last column what the row holds there: padding, on a clip view
+/// the next pixel, or 0 where the row ends. `dest` may be the source. Without memory it stays as it is.
+PictureZOR* NeonFilter(PictureZOR* self, PictureZOR* dest);
 
 // clang-format off
 inline constexpr MethodRow FilterMethods[] = {
+    Method<19, "OilFilter(dest as PictureZOR, levels as integer, range as integer) as PictureZOR", OilFilter>,
+    Method<20, "DiffuseFilter(dest as PictureZOR, level as integer) as PictureZOR", DiffuseFilter>,
+    Method<21, "EngraveFilter(dest as PictureZOR, level as integer) as PictureZOR", EngraveFilter>,
+    Method<22, "NeonFilter(dest as PictureZOR) as PictureZOR", NeonFilter>,
     Method<23, "BoxBlurFilter(dest as PictureZOR, Radius as double, Vertical as boolean = true, Horizontal as boolean = true) as PictureZOR", BoxBlurFilter>,
     Method<24, "BoxBlurFilter(dest as PictureZOR, Radius as double, Iterations as integer, Vertical as boolean = true, Horizontal as boolean = true) as PictureZOR", BoxBlurFilter>,
+    Method<25, "BoxBlurFractionalFilter(dest as PictureZOR, Radius as double) as PictureZOR", BoxBlurFractionalFilter>,
     Method<26, "SolarizeFilter(dest as PictureZOR) as PictureZOR", SolarizeFilter>,
     Method<27, "GammaFilter(dest as PictureZOR, redGamma as double, greenGamma as double, blueGamma as double) as PictureZOR", GammaFilter>,
     Method<28, "GammaFilter(dest as PictureZOR, redGamma as double, greenGamma as double, blueGamma as double, alphaGamma as double) as PictureZOR", GammaFilter>,
@@ -97,6 +136,9 @@ inline constexpr MethodRow FilterMethods[] = {
     Method<57, "Invert(x as integer, y as integer, w as integer, h as integer)", Invert>,
     Method<58, "AutoLevel as boolean", AutoLevel>,
     Method<59, "AutoLevel(x as integer, y as integer, w as integer, h as integer) as boolean", AutoLevel>,
+    Method<117, "ApplyMatrix(dest as PictureZOR, MatrixDimension as integer, matrix() as integer) as PictureZOR", ApplyMatrix>,
+    Method<118, "ApplyMatrix(dest as PictureZOR, MatrixDimension as integer, matrix() as integer, delta as integer) as PictureZOR", ApplyMatrix>,
+    Method<119, "ApplyMatrix(dest as PictureZOR, MatrixDimension as integer, matrix() as integer, delta as integer, ScaleFactor as double) as PictureZOR", ApplyMatrix>,
 };
 // clang-format on
 

@@ -7,6 +7,14 @@ std::int32_t FirstOffset(const PlaneList& planes) {
   return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
 }
 
+void Gather(Sample* row, const PlaneList& planes, std::ptrdiff_t width, Sample* packed) {
+  ForPlaneCount(planes.Count, [&](auto n) {
+    const PlaneRow<n> in(row, planes);
+    for (std::ptrdiff_t x = 0; x < width; ++x)
+      for (int c = 0; c < n; ++c) packed[x * n + c] = in(c, x);
+  });
+}
+
 }
 
 PackedRows::PackedRows(const FilterCall& call)
@@ -17,16 +25,26 @@ PackedRows::PackedRows(const FilterCall& call)
       FirstOut(FirstOffset(Out)),
       Whole(In.Step == In.Count && Out.Step == Out.Count) {
   for (int c = 0; c < In.Count; ++c) Whole = Whole && In.Offset[c] - FirstIn == Out.Offset[c] - FirstOut;
+  if (!Whole) return;
+  for (int c = 0; c < In.Count; ++c) {
+    In.Offset[c] = FirstIn + c;
+    Out.Offset[c] = FirstOut + c;
+  }
+}
+
+void PackedRows::Load(Sample* sourceRow, Sample* packed) const {
+  if (Whole) return void(std::memcpy(packed, sourceRow + FirstIn, std::size_t(Samples())));
+  Gather(sourceRow, In, Width, packed);
+}
+
+void PackedRows::LoadDest(Sample* destRow, Sample* packed) const {
+  if (Whole) return void(std::memcpy(packed, destRow + FirstOut, std::size_t(Samples())));
+  Gather(destRow, Out, Width, packed);
 }
 
 const Sample* PackedRows::Packed(Sample* sourceRow, Sample* buffer) const {
   if (Whole) return sourceRow + FirstIn;
-  ForPlaneCount(In.Count, [&](auto n) {
-    const PlaneRow<n> in(sourceRow, In);
-    const std::ptrdiff_t width = Width;
-    for (std::ptrdiff_t x = 0; x < width; ++x)
-      for (int c = 0; c < n; ++c) buffer[x * n + c] = in(c, x);
-  });
+  Load(sourceRow, buffer);
   return buffer;
 }
 
@@ -38,6 +56,20 @@ void PackedRows::Store(const Sample* packed, Sample* destRow) const {
     for (std::ptrdiff_t x = 0; x < width; ++x)
       for (int c = 0; c < n; ++c) out(c, x) = packed[x * n + c];
   });
+}
+
+bool PackedBand::MoveTo(std::int32_t y) {
+  bool reached = true;
+  for (std::int32_t r = y == 0 ? -Before : y + After; reached && r <= y + After; ++r) {
+    Sample *first = (*this)[r], *end = first + Packing.Samples();
+    const int pixel = Packing.Count();
+    reached = WithRow(Of, std::clamp(r, 0, Of.Height - 1), [&](Sample* row) { Packing.Load(row, first); });
+    for (std::ptrdiff_t i = pixel; i <= Margin; i += pixel) {
+      std::copy_n(first, pixel, first - i);
+      std::copy_n(end - pixel, pixel, end + i - pixel);
+    }
+  }
+  return reached;
 }
 
 }

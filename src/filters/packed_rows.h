@@ -14,11 +14,17 @@ class PackedRows {
   explicit PackedRows(const FilterCall& call);
 
   int Count() const { return In.Count; }
+  /// The planes of the source in the order of packed rows.
+  const PlaneList& SourcePlanes() const { return In; }
   /// Samples of a packed row.
   std::ptrdiff_t Samples() const { return std::ptrdiff_t{Width} * In.Count; }
 
   /// The samples of a source row, copied into buffer where they don't lie packed.
   const Sample* Packed(Sample* sourceRow, Sample* buffer) const;
+  /// Copies a source row into a packed one.
+  void Load(Sample* sourceRow, Sample* packed) const;
+  /// Copies a row of the destination into a packed one.
+  void LoadDest(Sample* destRow, Sample* packed) const;
   /// Brings a packed row into a row of the destination.
   void Store(const Sample* packed, Sample* destRow) const;
   /// Calls work(out), which writes a packed row: right into the row of the destination, or by way of buffer.
@@ -33,6 +39,40 @@ class PackedRows {
   PlaneList In, Out;
   std::int32_t Width, FirstIn, FirstOut;
   bool Whole;
+};
+
+/// Packed copies of the source's rows around y, the edge rows repeated beyond the edges, and the first and
+/// last pixel of each repeated to both sides. Each row is fetched once.
+class PackedBand {
+ public:
+  /// Holds rows y - before .. y + after, with `margin` pixels to both sides.
+  PackedBand(PictureData& source, const PackedRows& packing, std::int32_t before, std::int32_t after,
+             std::int32_t margin)
+      : Of(source),
+        Packing(packing),
+        Before(before),
+        After(after),
+        Margin(std::ptrdiff_t{margin} * packing.Count()),
+        RowBytes(std::size_t(packing.Samples() + 2 * Margin)),
+        Memory(NewBuffer((std::size_t(before) + std::size_t(after) + 1) * RowBytes)) {}
+  explicit operator bool() const { return Memory != nullptr; }
+
+  /// Makes the rows around y available; y is 0 first, then one more each time. False when a row can't be
+  /// reached.
+  bool MoveTo(std::int32_t y);
+  /// The first sample of row y, counted in the picture; any of those around.
+  Sample* operator[](std::int32_t y) const {
+    const std::size_t rows = std::size_t(Before) + std::size_t(After) + 1;
+    return Memory.get() + std::size_t(y + Before) % rows * RowBytes + Margin;
+  }
+
+ private:
+  PictureData& Of;
+  const PackedRows& Packing;
+  std::int32_t Before, After;
+  std::ptrdiff_t Margin;
+  std::size_t RowBytes;
+  Buffer Memory;
 };
 
 }

@@ -33,6 +33,8 @@ struct AreaFilter {
   bool ServesCMYK = true;
   /// Where `dest` is the source, or shares samples with it.
   enum { Refused, SameResult, ReadsWhatItWrote } InPlace = SameResult;
+  /// Whether pixels of another size can be written.
+  bool AnyPixelSize = true;
 };
 
 /// Compares a filter with its model on noise: in all formats that it serves and on every store, into new

@@ -1,0 +1,217 @@
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cmath>
+#include <cstdlib>
+
+#include "support/area_filter.h"
+#include "support/every_target.h"
+
+namespace picturezor {
+namespace {
+
+AreaFilter Oil(int levels, int range) {
+  return {[=](const Picture& source, const Picture& dest) { return source.OilFilter(dest, levels, range); },
+          [=](const Planar& source, Planar& dest) {
+            const int classCount = std::clamp(levels, 1, 256), reach = std::max(range, 0);
+            for (int y = 0; y < source.Height; ++y)
+              for (int x = 0; x < source.Width; ++x)
+                for (int c = 0; c < source.Count; ++c) {
+                  std::vector<int> counts(256), sums(256);
+                  for (int row = std::max(y - reach, 0); row <= std::min(y + reach, source.Height - 1); ++row)
+                    for (int column = std::max(x - reach, 0); column <= std::min(x + reach, source.Width - 1);
+                         ++column) {
+                      const int value = source(c, column, row);
+                      ++counts[std::size_t(classCount * value / 256)];
+                      sums[std::size_t(classCount * value / 256)] += value;
+                    }
+                  const auto best = std::ranges::max_element(counts) - counts.begin();
+                  dest(c, x, y) = std::uint8_t(sums[std::size_t(best)] / counts[std::size_t(best)]);
+                }
+          },
+          true, AreaFilter::ReadsWhatItWrote, false};
+}
+
+// The classes of values around each sample, in few levels so that there are ties, with neighbourhoods that
+// the picture holds and such that it doesn't.
+TEST(OilFilter, TakesTheMeanOfTheMostFrequentClass) {
+  for (const int levels : {1, 5, 20, 100, 255, 256, 1000, 0, -4})
+    for (const int range : {0, 1, 3, 7, 8, 20, 2000, -1}) {
+      SCOPED_TRACE(testing::Message() << levels << " levels, range " << range);
+      const Picture picture(33, 21, Format::RGBA);
+      FillWithNoise(picture, unsigned(60 + range));
+      const Planar source = PlanesIn(picture, 33, 21);
+      Planar wanted = source;
+      Oil(levels, std::min(range, 40)).Model(source, wanted);
+      ForEveryTarget(
+          [&] { EXPECT_EQ(PlanesIn(picture.OilFilter({}, levels, range), 33, 21).Of, wanted.Of); });
+    }
+}
+
+// More samples in a neighbourhood than 16 bits count.
+TEST(OilFilter, TakesWideRanges) {
+  const Picture picture(300, 290, Format::G);
+  FillWithNoise(picture, 61);
+  for (const int range : {127, 128}) {
+    std::vector<int> counts(64), sums(64);
+    const Samples pixels = Packed(picture);
+    for (int y = 140 - range; y <= std::min(140 + range, 289); ++y)
+      for (int x = 150 - range; x <= 150 + range; ++x) {
+        const int value = pixels[std::size_t(y * 300 + x)];
+        ++counts[std::size_t(value / 4)];
+        sums[std::size_t(value / 4)] += value;
+      }
+    const auto best = std::size_t(std::ranges::max_element(counts) - counts.begin());
+    EXPECT_EQ(Packed(picture.OilFilter({}, 64, range))[140 * 300 + 150], sums[best] / counts[best]) << range;
+  }
+}
+
+TEST(OilFilter, WorksOnAllFormatsAndStores) {
+  ExpectLikeModel(Oil(6, 1), {{6, 5}});
+  ExpectLikeModel(Oil(256, 2), {{3, 6}});
+}
+
+TEST(OilFilter, RefusesADestWithPixelsOfAnotherSize) {
+  const Picture picture(2, 2, Format::RGB), dest(4, 4, Format::RGBX);
+  EXPECT_FALSE(picture.OilFilter(dest, 4, 1));
+  EXPECT_EQ(Packed(dest), Samples(64, 0));
+}
+
+// The places are drawn in the order of the pixels, the column before the row.
+TEST(DiffuseFilter, TakesPixelsFromNearby) {
+  for (const int level : {3, 0, -2, 1000})
+    ExpectLikeModel({[=](const Picture& source, const Picture& dest) {
+                       std::srand(7);
+                       return source.DiffuseFilter(dest, level);
+                     },
+                     [=](const Planar& source, Planar& dest) {
+                       std::srand(7);
+                       const int reach = std::max(level, 0);
+                       for (int y = 0; y < source.Height; ++y)
+                         for (int x = 0; x < source.Width; ++x) {
+                           const int dx = std::rand() % (2 * reach + 1) - reach;
+                           const int dy = std::rand() % (2 * reach + 1) - reach;
+                           for (int c = 0; c < source.Count; ++c)
+                             dest(c, x, y) = source.Near(c, x + dx, y + dy);
+                         }
+                     },
+                     false, AreaFilter::ReadsWhatItWrote},
+                    {{6, 5}});
+}
+
+TEST(DiffuseFilter, TakesTheLargestLevel) {
+  const Picture picture(2, 2, Format::G);
+  SetPacked(picture, {1, 1, 1, 1});
+  EXPECT_EQ(Packed(picture.DiffuseFilter({}, 2147483647)), Samples(4, 1));
+}
+
+AreaFilter Engrave(int level) {
+  return {[=](const Picture& source, const Picture& dest) { return source.EngraveFilter(dest, level); },
+          [=](const Planar& source, Planar& dest) {
+            const int by = std::clamp(level, -1000, 1000);
+            for (int y = 0; y < source.Height; ++y)
+              for (int x = 0; x < source.Width; ++x)
+                for (int c = 0; c < source.Count; ++c)
+                  dest(c, x, y) = std::uint8_t(
+                      std::clamp(source(c, x, y) - source.Near(c, x + by, y + by) + 128, 0, 255));
+          },
+          false, AreaFilter::ReadsWhatItWrote};
+}
+
+TEST(EngraveFilter, IsTheDifferenceToADiagonalNeighbour) {
+  for (const int level : {1, -2, 6, 2147483647, -2147483647 - 1}) {
+    SCOPED_TRACE(level);
+    ExpectLikeModel(Engrave(level), {{6, 5}});
+  }
+  const Picture picture(150, 3, Format::RGB);
+  FillWithNoise(picture, 62);
+  Planar wanted(150, 3, 3);
+  Engrave(-1).Model(PlanesIn(picture, 150, 3), wanted);
+  ForEveryTarget([&] { EXPECT_EQ(PlanesIn(picture.EngraveFilter({}, -1), 150, 3).Of, wanted.Of); });
+}
+
+TEST(EngraveFilter, IsGrayWhereNothingDiffers) {
+  const Picture picture(3, 2, Format::GA);
+  FillWithNoise(picture, 63);
+  EXPECT_EQ(Packed(picture.EngraveFilter({}, 0)), Samples(12, 128));
+  SetPacked(picture, {9, 200, 9, 200, 9, 200, 9, 200, 9, 200, 9, 200});
+  EXPECT_EQ(Packed(picture.EngraveFilter({}, 1)), Samples(12, 128));
+}
+
+std::uint8_t EdgeStrength(int sample, int below, int right) {
+  const double e = (sample - below) * (sample - below) + (sample - right) * (sample - right);
+  return std::uint8_t(std::min(float(std::sqrt(2 * e)), 255.f));
+}
+
+// What stands behind the last pixel: padding, the next pixel of the whole on a clip view, or nothing. It is
+// looked up in the stored rows here.
+TEST(NeonFilter, IsTheStrengthOfEdges) {
+  for (const Format format : {Format::G, Format::AG, Format::RGB, Format::XBGR, Format::ARGB, Format::TwoOf3,
+                              Format::CMYK, Format::AKYMC})
+    for (const int width : {1, 16, 64, 71})
+      ForEveryStore(width, 5, format, [&](const Picture& picture) {
+        SetPacked(picture, Noise(64).Many(Packed(picture).size()));
+        const std::vector<Samples> rows = StoredRows(picture);
+        const int pixel = picture.PixelSize();
+        std::vector<int> offsets;
+        for (const char* plane :
+             {"Gray", "Red", "Green", "Blue", "Cyan", "Magenta", "Yellow", "Black", "Alpha"})
+          if (picture.BooleanProperty("Has" + std::string(plane)))
+            offsets.push_back(picture.IntegerProperty(std::string(plane) + "Offset"));
+        Planar wanted(width, 5, int(offsets.size()));
+        for (int c = 0; c < wanted.Count; ++c)
+          for (int y = 0; y < 5; ++y)
+            for (int x = 0; x < width; ++x) {
+              const auto at = std::size_t(offsets[std::size_t(c)] + x * pixel),
+                         right = at + std::size_t(pixel);
+              const Samples& row = rows[std::size_t(y)];
+              wanted(c, x, y) = EdgeStrength(row[at], y < 4 ? rows[std::size_t(y) + 1][at] : 0,
+                                             right < row.size() ? row[right] : 0);
+            }
+        ForEveryTarget([&] { EXPECT_EQ(PlanesIn(picture.NeonFilter(), width, 5).Of, wanted.Of) << width; });
+        const Picture dest(width + 1, 6, format);
+        EXPECT_TRUE(picture.NeonFilter(dest) == dest);
+        EXPECT_EQ(PlanesIn(dest, width, 5).Of, wanted.Of);
+        EXPECT_TRUE(picture.NeonFilter(picture) == picture);
+        EXPECT_EQ(PlanesIn(picture, width, 5).Of, wanted.Of) << "in place";
+      });
+}
+
+TEST(NeonFilter, IsDarkInsideAnEvenPicture) {
+  const Picture picture(64, 3, Format::G);  // without padding
+  SetPacked(picture, Samples(3 * 64, 100));
+  const Samples out = Packed(picture.NeonFilter());
+  EXPECT_EQ(out[0], 0);
+  EXPECT_EQ(out[63], 141);  // the root of 2 * 100 * 100
+  EXPECT_EQ(out[2 * 64], 141);
+  EXPECT_EQ(out[2 * 64 + 63], 200);
+}
+
+// Every strength that two differences can have.
+TEST(NeonFilter, RoundsNoRootUp) {
+  const Picture picture(256, 2, Format::G);
+  for (int below = 0; below < 256; ++below) {
+    Samples pixels(512, std::uint8_t(below));
+    for (std::size_t x = 0; x < 256; x += 2) pixels[x] = std::uint8_t(x / 2 * 2 % 256), pixels[x + 1] = 0;
+    SetPacked(picture, pixels);
+    const Samples out = Packed(picture.NeonFilter());
+    for (std::size_t x = 0; x < 255; ++x)
+      ASSERT_EQ(out[x], EdgeStrength(pixels[x], below, pixels[x + 1])) << x << " " << below;
+  }
+}
+
+TEST(AreaFilters, LeaveRawPixelsAlone) {
+  const Picture picture(3, 3, Format::Scaling5);
+  FillWithNoise(picture, 65);
+  for (const Picture& result :
+       {picture.OilFilter({}, 4, 1), picture.DiffuseFilter({}, 1), picture.EngraveFilter({}, 1),
+        picture.NeonFilter(), picture.ApplyMatrix({}, 1, IntegerArray({1}))})
+    EXPECT_EQ(Packed(result), Samples(45, 0));
+  const Picture inks(2, 2, Format::CMYK);
+  FillWithNoise(inks, 66);
+  EXPECT_EQ(Packed(inks.DiffuseFilter({}, 1)), Samples(16, 0));
+  EXPECT_EQ(Packed(inks.EngraveFilter({}, 1)), Samples(16, 0));
+}
+
+}
+}
