@@ -1,5 +1,6 @@
 #include "filters/plane_tables.h"
 
+#include "image/targets.h"
 #include "image/walk.h"
 
 namespace zor {
@@ -19,6 +20,10 @@ std::array<const SampleTable*, 5> TablesOf(Group group, const PlaneTables& t) {
   return {};
 }
 
+std::int32_t FirstOffset(const PlaneList& planes) {
+  return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
+}
+
 /// The planes that have a table, as they lie in both pictures.
 struct MappedPlanes {
   PlaneList In, Out;
@@ -34,15 +39,31 @@ struct MappedPlanes {
         Out.Offset[Out.Count++] = out.Offset[c];
       }
   }
+  /// Whether a pixel is the same bytes in both pictures.
+  bool LieAlike() const {
+    bool alike = In.Count > 0 && In.Step == Out.Step;
+    for (int c = 0; c < In.Count; ++c)
+      alike = alike && In.Offset[c] - In.Offset[0] == Out.Offset[c] - Out.Offset[0];
+    return alike;
+  }
 };
 
-bool MapRows(Lane from, Lane into, std::int32_t width, std::int32_t height, const MappedPlanes& planes) {
+/// The rows of two pictures that are to be mapped.
+struct MappedRows {
+  Lane From, Into;
+  std::int32_t Width, Height;
+  /// Whether a vector of samples may be read before any of them is written.
+  bool ManyAtOnce;
+};
+
+bool MapSamples(const MappedRows& rows, const MappedPlanes& planes) {
   bool done = true;
   ForPlaneCount(planes.In.Count, [&](auto n) {
-    done = Walk(from, into).Rows(height, [&](std::int32_t, Sample* source, Sample* dest) {
+    done = Walk(rows.From, rows.Into).Rows(rows.Height, [&](std::int32_t, Sample* source, Sample* dest) {
       // In locals, since a write through a Sample * may change anything else.
       const PlaneRow<n> in(source, planes.In), out(dest, planes.Out);
       const auto table = planes.Table;
+      const std::ptrdiff_t width = rows.Width;
       for (std::ptrdiff_t x = 0; x < width; ++x)
         for (int c = 0; c < n; ++c) out(c, x) = (*table[c])[in(c, x)];
     });
@@ -50,17 +71,28 @@ bool MapRows(Lane from, Lane into, std::int32_t width, std::int32_t height, cons
   return done;
 }
 
+bool MapRows(const MappedRows& rows, const MappedPlanes& planes) {
+  if (CurrentTarget != Target::AVX512VBMI || !rows.ManyAtOnce || !planes.LieAlike() || rows.Width < 1)
+    return MapSamples(rows, planes);
+  const ByteTables tables(planes.In, planes.Table, rows.Width);
+  const std::int32_t in = FirstOffset(planes.In), out = FirstOffset(planes.Out);
+  return Walk(rows.From, rows.Into).Rows(rows.Height, [&](std::int32_t, Sample* source, Sample* dest) {
+    MapBytesVBMI(tables, source + in, dest + out);
+  });
+}
+
 }
 
 bool MapPlanes(const FilterCall& call, const PlaneTables& tables) {
-  return MapRows(From(call.Source), Into(call.Dest), call.Source.Width, call.Source.Height,
+  return MapRows({From(call.Source), Into(call.Dest), call.Source.Width, call.Source.Height,
+                  !call.SharesPixels || &call.Source == &call.Dest},
                  {call.Of, call.In, call.Out, tables});
 }
 
 bool MapPlanes(PictureData& picture, const Rectangle& part, const PlaneTables& tables) {
   const Group group = GroupOf(picture);
   const PlaneList planes = PlanesOf(group, picture, part.X);
-  return MapRows(From(picture, part.Y), Into(picture, part.Y), part.Width, part.Height,
+  return MapRows({From(picture, part.Y), Into(picture, part.Y), part.Width, part.Height, true},
                  {group, planes, planes, tables});
 }
 

@@ -1,12 +1,9 @@
 #pragma once
-#include <array>
-
+#include "filters/byte_tables.h"
 #include "image/clip.h"
 #include "image/filter.h"
 
 namespace zor {
-
-using SampleTable = std::array<Sample, 256>;
 
 /// A table for each plane; null leaves that plane of the destination alone.
 struct PlaneTables {

@@ -1,0 +1,158 @@
+#include <array>
+#include <memory>
+
+#include "race.h"
+
+#ifdef PICTUREZOR_OPENCV
+#include <opencv2/core.hpp>
+#endif
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+#include <magick/api.h>
+#endif
+
+// Filters that look at one sample at a time, from one picture into another one; Invert, AutoLevel and
+// UnsharpFilter in place.
+
+namespace picturezor::bench {
+namespace {
+
+using Work = std::function<void(const Picture& source, const Picture& dest)>;
+
+Contender Ours(Format format, Work work) {
+  return {"PictureZOR", [=] {
+            return [source = TestPicture(format), dest = TestPicture(format), work] { work(source, dest); };
+          }};
+}
+
+/// All samples of the test picture, packed.
+std::shared_ptr<Bytes> PackedSamples(Format format) {
+  return std::make_shared<Bytes>(TestPicture(format).DataStringInFormat(format));
+}
+
+#ifdef PICTUREZOR_OPENCV
+using CVWork = std::function<void(const cv::Mat& source, cv::Mat& dest)>;
+
+Contender OpenCV(int channels, CVWork work) {
+  return {"OpenCV", [=] {
+            cv::setNumThreads(1);
+            const auto samples = PackedSamples(channels == 1   ? Format::G
+                                               : channels == 3 ? Format::RGB
+                                                               : Format::RGBA);
+            const cv::Mat source(Height, Width, CV_8UC(channels), samples->data());
+            return [samples, source, dest = std::make_shared<cv::Mat>(source.clone()), work] {
+              work(source, *dest);
+            };
+          }};
+}
+
+/// A table of so many channels, other values in each.
+cv::Mat LookUpTable(int channels) {
+  cv::Mat table(1, 256, CV_8UC(channels));
+  for (int i = 0; i < 256 * channels; ++i) table.data[i] = std::uint8_t(255 - i / channels + i % channels);
+  return table;
+}
+
+CVWork LookUp(int tables) {
+  return
+      [table = LookUpTable(tables)](const cv::Mat& source, cv::Mat& dest) { cv::LUT(source, table, dest); };
+}
+#endif
+
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+Contender GraphicsMagick(std::function<void(Image*)> work) {
+  return {"GraphicsMagick", [=] {
+            [[maybe_unused]] static const bool initialized = [] {
+              InitializeMagick(nullptr);
+              SetMagickResourceLimit(ThreadsResource, 1);
+              return true;
+            }();
+            const auto samples = PackedSamples(Format::RGB);
+            ExceptionInfo exception;
+            GetExceptionInfo(&exception);
+            const std::shared_ptr<Image> image(
+                ConstituteImage(Width, Height, "RGB", CharPixel, samples->data(), &exception), DestroyImage);
+            DestroyExceptionInfo(&exception);
+            return [image, work] { work(image.get()); };
+          }};
+}
+#endif
+
+/// A filter beside a table of OpenCV with as many channels, and a copy.
+void AddTableRace(const std::string& name, Format format, [[maybe_unused]] int tables, Work work) {
+  std::vector<Contender> contenders{Ours(format, work)};
+#ifdef PICTUREZOR_OPENCV
+  contenders.push_back(OpenCV(BytesPerPixel(format), LookUp(tables)));
+#endif
+  contenders.push_back(Memcpy(BytesOf(BytesPerPixel(format))));
+  AddRace("filters", name, std::move(contenders));
+}
+
+const auto registered = [] {
+  for (const auto& [name, format] :
+       {std::pair{"Invert RGB", Format::RGB}, {"Invert RGBX", Format::RGBX}, {"Invert RGBA", Format::RGBA}}) {
+    std::vector<Contender> contenders{
+        Ours(format, [](const Picture& source, const Picture&) { source.Invert(); })};
+#ifdef PICTUREZOR_OPENCV
+    contenders.push_back(OpenCV(BytesPerPixel(format),
+                                [](const cv::Mat& source, cv::Mat&) { cv::bitwise_not(source, source); }));
+#endif
+    contenders.push_back(Memcpy(BytesOf(BytesPerPixel(format))));
+    AddRace("filters", name, std::move(contenders));
+  }
+
+  std::vector<std::int32_t> values;
+  for (int i = 0; i < 256; ++i) values.push_back(255 - i);
+  const IntegerArray array(values);
+  for (const auto& [suffix, format] :
+       {std::pair{"gray", Format::G}, {"RGB", Format::RGB}, {"RGBX", Format::RGBX}, {"RGBA", Format::RGBA}}) {
+    const auto named = [&](const char* filter) { return std::string(filter) + " " + suffix; };
+    AddTableRace(named("SolarizeFilter"), format, 1,
+                 [](const Picture& s, const Picture& d) { s.SolarizeFilter(d); });
+    AddTableRace(named("GammaFilter"), format, 1,
+                 [](const Picture& s, const Picture& d) { s.GammaFilter(d, 2.2); });
+    if (format == Format::G) continue;
+    const int channels = BytesPerPixel(format);
+    AddTableRace(named("GammaFilter, three gammas,"), format, channels,
+                 [](const Picture& s, const Picture& d) { s.GammaFilter(d, 2.2, 1.8, 0.7); });
+  }
+  AddTableRace("GainFilter RGB", Format::RGB, 1,
+               [](const Picture& s, const Picture& d) { s.GainFilter(d, 0.7, 0.4); });
+  AddTableRace("TransferFilter RGB", Format::RGB, 1,
+               [=](const Picture& s, const Picture& d) { s.TransferFilter(d, array); });
+
+  std::vector<Contender> unsharp{Ours(
+      Format::RGB, [](const Picture& source, const Picture& dest) { dest.UnsharpFilter(source, 0.3, 4); })};
+#ifdef PICTUREZOR_OPENCV
+  unsharp.push_back(OpenCV(3, [](const cv::Mat& source, cv::Mat& dest) {
+    cv::addWeighted(dest, 2.2, source, -1.2, 0, dest);  // without a threshold
+  }));
+#endif
+  unsharp.push_back(Memcpy(BytesOf(3)));
+  AddRace("filters", "UnsharpFilter RGB", std::move(unsharp));
+
+  std::vector<Contender> level{
+      Ours(Format::RGB, [](const Picture& source, const Picture&) { source.AutoLevel(); })};
+  std::vector<Contender> dither{Ours(Format::RGB, [](const Picture& source, const Picture& dest) {
+    source.DitherFilter(dest, DitherMatrix::Ordered4x4, 2);
+  })};
+#ifdef PICTUREZOR_OPENCV
+  NamePeer("OpenCV", CV_VERSION);
+#endif
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+  NamePeer("GraphicsMagick", MagickLibVersionText);
+  level.push_back(GraphicsMagick([](Image* image) { NormalizeImage(image); }));
+  dither.push_back(GraphicsMagick([](Image* image) {
+    ExceptionInfo exception;
+    GetExceptionInfo(&exception);
+    RandomChannelThresholdImage(image, "all", "4x4", &exception);
+    DestroyExceptionInfo(&exception);
+  }));
+#endif
+  level.push_back(Memcpy(BytesOf(3)));
+  dither.push_back(Memcpy(BytesOf(3)));
+  AddRace("filters", "AutoLevel RGB", std::move(level));
+  return AddRace("filters", "DitherFilter RGB", std::move(dither));
+}();
+
+}
+}

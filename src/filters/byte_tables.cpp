@@ -1,0 +1,27 @@
+#include "filters/byte_tables.h"
+
+namespace zor {
+
+ByteTables::ByteTables(const PlaneList& planes, const std::array<const SampleTable*, 5>& tables,
+                       std::int32_t width)
+    : Step(planes.Step) {
+  const auto first = planes.Offset.begin(), end = first + planes.Count;
+  const std::int32_t lowest = *std::min_element(first, end);
+  Bytes = std::ptrdiff_t{width - 1} * Step + *std::max_element(first, end) - lowest + 1;
+  std::array<int, 8> tableAt;
+  tableAt.fill(-1);
+  for (int c = 0; c < planes.Count; ++c) {
+    const int t = int(std::find(Table.begin(), Table.begin() + Count, tables[c]) - Table.begin());
+    if (t == Count) Table[Count++] = tables[c];
+    tableAt[planes.Offset[c] - lowest] = t;
+  }
+  for (int start = 0; start < Step; ++start)
+    for (int i = 0; i < 64; ++i)
+      if (const int t = tableAt[(start + i) % Step]; t >= 0) {
+        Mapped[start] |= std::uint64_t{1} << i;
+        Of[start][t] |= std::uint64_t{1} << i;
+      }
+  Uniform = Count == 1 && planes.Count == Step;
+}
+
+}
