@@ -120,15 +120,20 @@ const auto registered = [] {
   AddTableRace("TransferFilter RGB", Format::RGB, 1,
                [=](const Picture& s, const Picture& d) { s.TransferFilter(d, array); });
 
-  std::vector<Contender> unsharp{Ours(
-      Format::RGB, [](const Picture& source, const Picture& dest) { dest.UnsharpFilter(source, 0.3, 4); })};
+  for (const double amount : {0.5, 0.3}) {
+    std::vector<Contender> unsharp{Ours(Format::RGB, [=](const Picture& source, const Picture& dest) {
+      dest.UnsharpFilter(source, amount, 4);
+    })};
 #ifdef PICTUREZOR_OPENCV
-  unsharp.push_back(OpenCV(3, [](const cv::Mat& source, cv::Mat& dest) {
-    cv::addWeighted(dest, 2.2, source, -1.2, 0, dest);  // without a threshold
-  }));
+    // Without a threshold.
+    unsharp.push_back(OpenCV(3, [=](const cv::Mat& source, cv::Mat& dest) {
+      cv::addWeighted(dest, 1 + 4 * amount, source, -4 * amount, 0, dest);
+    }));
 #endif
-  unsharp.push_back(Memcpy(BytesOf(3)));
-  AddRace("filters", "UnsharpFilter RGB", std::move(unsharp));
+    unsharp.push_back(Memcpy(BytesOf(3)));
+    AddRace("filters", amount == 0.5 ? "UnsharpFilter RGB" : "UnsharpFilter RGB, doubles",
+            std::move(unsharp));
+  }
 
   std::vector<Contender> level{
       Ours(Format::RGB, [](const Picture& source, const Picture&) { source.AutoLevel(); })};
@@ -142,6 +147,8 @@ const auto registered = [] {
   NamePeer("GraphicsMagick", MagickLibVersionText);
   level.push_back(GraphicsMagick([](Image* image) { NormalizeImage(image); }));
   dither.push_back(GraphicsMagick([](Image* image) {
+    // Or else it does nothing the second time.
+    image->is_monochrome = image->is_grayscale = MagickFalse;
     ExceptionInfo exception;
     GetExceptionInfo(&exception);
     RandomChannelThresholdImage(image, "all", "4x4", &exception);

@@ -1,8 +1,10 @@
 #include <algorithm>
 
+#include "filters/byte_pattern.h"
 #include "filters/dither_matrices.h"
 #include "filters/filters.h"
-#include "filters/plane_tables.h"
+#include "image/filter.h"
+#include "image/targets.h"
 #include "image/walk.h"
 
 namespace zor {
@@ -10,41 +12,68 @@ namespace {
 
 /// What becomes of a sample: the level above it where the threshold lies below its rest, else the level at or
 /// below it.
-struct DitherTables {
-  SampleTable Below, Above, Rest;
+struct Dither {
+  /// Levels above the lowest one, 1 to 255.
+  std::int32_t Steps;
+  /// In whose units a rest is counted.
+  std::int32_t Units;
+  /// 255 i / Steps is i Share >> 16: Share is too large by 1 at most, so the product by i at most, and i
+  /// Steps is below 2^16.
+  std::int32_t Share;
 
-  DitherTables(int side, int levels) {
-    const auto level = [=](int i) { return Sample(255 * i / (levels - 1)); };
-    for (int v = 0; v < 256; ++v) {
-      const int quotient = (levels - 1) * v / 256;
-      Below[v] = level(quotient);
-      Above[v] = level(quotient + 1);
-      // At most 255, with the largest side of 16.
-      Rest[v] = Sample((side * side + 1) * v / 256);
-    }
+  Dither(std::int32_t side, std::int32_t levels)
+      : Steps(levels - 1), Units(side * side + 1), Share((255 << 16) / Steps + 1) {}
+
+  Sample operator()(std::int32_t v, std::int32_t threshold) const {
+    const std::int32_t above = threshold < (Units * v >> 8) ? 1 : 0;
+    return Sample(((Steps * v >> 8) + above) * Share >> 16);
   }
-  Sample operator()(Sample v, Sample threshold) const { return threshold < Rest[v] ? Above[v] : Below[v]; }
 };
+
+void DitherRun(const Sample* in, Sample* out, const Sample* thresholds, std::ptrdiff_t count, Dither dither) {
+  for (std::ptrdiff_t i = 0; i < count; ++i) out[i] = dither(in[i], thresholds[i]);
+}
+
+/// Rows whose planes fill the pixels of both pictures in the same order, as runs of bytes.
+bool DitherRuns(const FilterCall& call, const DitherMatrix& matrix, const Dither& dither) {
+  const std::int32_t in = FirstOffset(call.In), out = FirstOffset(call.Out), planes = call.In.Count;
+  const std::ptrdiff_t rowBytes = std::ptrdiff_t{call.Source.Width} * planes;
+  return Walk(From(call.Source), Into(call.Dest))
+      .Rows(call.Source.Height, [&](std::int32_t y, Sample* source, Sample* dest) {
+        const Sample* cells = matrix.Cells + y % matrix.Side * matrix.Side;
+        const BytePattern thresholds(std::ptrdiff_t{matrix.Side} * planes,
+                                     [&](std::ptrdiff_t i) { return cells[i / planes]; });
+        thresholds.Along(rowBytes, [&](std::ptrdiff_t at, std::ptrdiff_t count, const Sample* bytes) {
+          OnBestTarget<DitherRun>(static_cast<const Sample*>(source + in + at), dest + out + at, bytes, count,
+                                  dither);
+        });
+      });
+}
+
+bool DitherSamples(const FilterCall& call, const DitherMatrix& matrix, const Dither& dither) {
+  bool done = true;
+  ForPlaneCount(call.In.Count, [&](auto n) {
+    done = Walk(From(call.Source), Into(call.Dest))
+               .Rows(call.Source.Height, [&](std::int32_t y, Sample* source, Sample* dest) {
+                 const PlaneRow<n> in(source, call.In), out(dest, call.Out);
+                 const Sample* cells = matrix.Cells + y % matrix.Side * matrix.Side;
+                 for (std::ptrdiff_t x = 0; x < call.Source.Width; ++x)
+                   for (int c = 0; c < n; ++c) out(c, x) = dither(in(c, x), cells[x % matrix.Side]);
+               });
+  });
+  return done;
+}
 
 }
 
 PictureZOR* DitherFilter(PictureZOR* self, PictureZOR* dest, Integer matrix, Integer levels) {
   return RunFilter(self, dest, {.Groups = FilterRules::GrayAndRGB}, [&](const FilterCall& call) {
-    const DitherMatrix* thresholds = MatrixOf(matrix);
-    if (!thresholds) return true;
-    const int side = thresholds->Side;
-    const DitherTables dithered(side, std::clamp(levels, 2, 256));
-    bool done = true;
-    ForPlaneCount(call.In.Count, [&](auto n) {
-      done = Walk(From(call.Source), Into(call.Dest))
-                 .Rows(call.Source.Height, [&](std::int32_t y, Sample* source, Sample* into) {
-                   const PlaneRow<n> in(source, call.In), out(into, call.Out);
-                   const Sample* cells = thresholds->Cells + y % side * side;
-                   for (std::ptrdiff_t x = 0; x < call.Source.Width; ++x)
-                     for (int c = 0; c < n; ++c) out(c, x) = dithered(in(c, x), cells[x % side]);
-                 });
-    });
-    return done;
+    const DitherMatrix* cells = MatrixOf(matrix);
+    if (!cells) return true;
+    const Dither dither(cells->Side, std::clamp(levels, 2, 256));
+    const bool runs =
+        FillPixelsAlike(call.In, call.Out) && (!call.SharesPixels || &call.Source == &call.Dest);
+    return runs ? DitherRuns(call, *cells, dither) : DitherSamples(call, *cells, dither);
   });
 }
 

@@ -1,9 +1,18 @@
+#include "filters/byte_pattern.h"
 #include "filters/filters.h"
 #include "image/clip.h"
 #include "image/groups.h"
+#include "image/targets.h"
 #include "image/walk.h"
 
 namespace zor {
+namespace {
+
+void Flip(Sample* bytes, const Sample* bits, std::ptrdiff_t count) {
+  for (std::ptrdiff_t i = 0; i < count; ++i) bytes[i] = Sample(bytes[i] ^ bits[i]);
+}
+
+}
 
 void Invert(PictureZOR* self, Integer x, Integer y, Integer w, Integer h) {
   PictureData& picture = DataOf(self);
@@ -12,11 +21,17 @@ void Invert(PictureZOR* self, Integer x, Integer y, Integer w, Integer h) {
   MayYield(picture);
 
   const PlaneList planes = PlanesOf(GroupOf(picture), picture, part.X);
-  ForAlikePlanes(planes, part.Width, [&](auto planesOn, std::ptrdiff_t width) {
-    Walk(Yielding(Into(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
-      const auto sample = planesOn(row);
-      for (std::ptrdiff_t i = 0; i < width; ++i)
-        for (int c = 0; c < sample.Count; ++c) sample(c, i) = Sample(255 - sample(c, i));
+  if (planes.Count == 0) return;
+  // 255 - v is v with all bits flipped; the bytes between the planes have none flipped.
+  const auto begin = planes.Offset.begin(), end = begin + planes.Count;
+  const std::int32_t first = *std::min_element(begin, end), last = *std::max_element(begin, end);
+  const BytePattern bits(planes.Step, [&](std::ptrdiff_t i) {
+    return std::find(begin, end, first + i % planes.Step) != end ? 255 : 0;
+  });
+  const std::ptrdiff_t rowBytes = std::ptrdiff_t{part.Width - 1} * planes.Step + last - first + 1;
+  Walk(Yielding(Into(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
+    bits.Along(rowBytes, [&](std::ptrdiff_t at, std::ptrdiff_t count, const Sample* flipped) {
+      OnBestTarget<Flip>(row + first + at, flipped, count);
     });
   });
 }

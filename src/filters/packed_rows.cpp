@@ -3,10 +3,6 @@
 namespace zor {
 namespace {
 
-std::int32_t FirstOffset(const PlaneList& planes) {
-  return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
-}
-
 void Gather(Sample* row, const PlaneList& planes, std::ptrdiff_t width, Sample* packed) {
   ForPlaneCount(planes.Count, [&](auto n) {
     const PlaneRow<n> in(row, planes);
@@ -23,8 +19,7 @@ PackedRows::PackedRows(const FilterCall& call)
       Width(call.Source.Width),
       FirstIn(FirstOffset(In)),
       FirstOut(FirstOffset(Out)),
-      Whole(In.Step == In.Count && Out.Step == Out.Count) {
-  for (int c = 0; c < In.Count; ++c) Whole = Whole && In.Offset[c] - FirstIn == Out.Offset[c] - FirstOut;
+      Whole(FillPixelsAlike(In, Out)) {
   if (!Whole) return;
   for (int c = 0; c < In.Count; ++c) {
     In.Offset[c] = FirstIn + c;

@@ -20,10 +20,6 @@ std::array<const SampleTable*, 5> TablesOf(Group group, const PlaneTables& t) {
   return {};
 }
 
-std::int32_t FirstOffset(const PlaneList& planes) {
-  return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
-}
-
 /// The planes that have a table, as they lie in both pictures.
 struct MappedPlanes {
   PlaneList In, Out;
@@ -38,13 +34,6 @@ struct MappedPlanes {
         In.Offset[In.Count++] = in.Offset[c];
         Out.Offset[Out.Count++] = out.Offset[c];
       }
-  }
-  /// Whether a pixel is the same bytes in both pictures.
-  bool LieAlike() const {
-    bool alike = In.Count > 0 && In.Step == Out.Step;
-    for (int c = 0; c < In.Count; ++c)
-      alike = alike && In.Offset[c] - In.Offset[0] == Out.Offset[c] - Out.Offset[0];
-    return alike;
   }
 };
 
@@ -72,7 +61,8 @@ bool MapSamples(const MappedRows& rows, const MappedPlanes& planes) {
 }
 
 bool MapRows(const MappedRows& rows, const MappedPlanes& planes) {
-  if (CurrentTarget != Target::AVX512VBMI || !rows.ManyAtOnce || !planes.LieAlike() || rows.Width < 1)
+  if (CurrentTarget != Target::AVX512VBMI || !rows.ManyAtOnce || !LieAlike(planes.In, planes.Out) ||
+      rows.Width < 1)
     return MapSamples(rows, planes);
   const ByteTables tables(planes.In, planes.Table, rows.Width);
   const std::int32_t in = FirstOffset(planes.In), out = FirstOffset(planes.Out);

@@ -54,6 +54,18 @@ bool HasPlanes(Group group, const PictureData& picture, bool withAlpha) {
   });
 }
 
+std::int32_t FirstOffset(const PlaneList& planes) {
+  return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
+}
+
+bool LieAlike(const PlaneList& a, const PlaneList& b) {
+  bool alike = a.Count > 0 && a.Step == b.Step;
+  for (int c = 0; c < a.Count; ++c) alike = alike && a.Offset[c] - a.Offset[0] == b.Offset[c] - b.Offset[0];
+  return alike;
+}
+
+bool FillPixelsAlike(const PlaneList& a, const PlaneList& b) { return a.Count == a.Step && LieAlike(a, b); }
+
 PlaneList PlanesOf(Group group, const PictureData& picture, std::int32_t x) {
   const GroupPlanes& row = PlanesOfGroup[int(group)];
   PlaneList planes{row.Count, picture.PixelSize, {}};

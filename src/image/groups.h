@@ -25,6 +25,14 @@ struct PlaneList {
 /// The planes as they stand from column x on.
 PlaneList PlanesOf(Group group, const PictureData& picture, std::int32_t x = 0);
 
+/// The offset of the plane that lies first. Of at least one plane.
+std::int32_t FirstOffset(const PlaneList& planes);
+
+/// Whether the planes lie in a pixel in the same way in both lists; and whether they fill the pixel too, so
+/// that a row is one run of samples. False without planes.
+bool LieAlike(const PlaneList& a, const PlaneList& b);
+bool FillPixelsAlike(const PlaneList& a, const PlaneList& b);
+
 /// Whether a picture has all planes of a group; its alpha is asked for only `withAlpha`.
 bool HasPlanes(Group group, const PictureData& picture, bool withAlpha);
 
@@ -67,8 +75,7 @@ void ForPlaneCount(int count, Loop&& loop) {
 template <class Loop>
 void ForAlikePlanes(const PlaneList& planes, std::int32_t width, Loop&& loop) {
   if (planes.Count > 0 && planes.Count == planes.Step) {
-    const PlaneList run{
-        1, 1, {*std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count)}};
+    const PlaneList run{1, 1, {FirstOffset(planes)}};
     return loop([=](Sample* row) { return PlaneRow<1, 1>(row, run); }, std::ptrdiff_t{width} * planes.Count);
   }
   ForPlaneCount(planes.Count, [&](auto n) {

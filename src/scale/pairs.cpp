@@ -56,10 +56,6 @@ ScalePair Filled(const PairRow& row, const PictureData& source, const PictureDat
   return pair;
 }
 
-std::int32_t FirstOffset(const PlaneList& planes) {
-  return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
-}
-
 /// The planes by their place in the pixel.
 std::array<int, 5> InPixelOrder(const PlaneList& planes) {
   std::array<int, 5> sorted{};
