@@ -111,6 +111,13 @@ PictureZOR* EngraveFilter(PictureZOR* self, PictureZOR* dest, Integer level);
 /// the next pixel, or 0 where the row ends. `dest` may be the source. Without memory it stays as it is.
 PictureZOR* NeonFilter(PictureZOR* self, PictureZOR* dest);
 
+/// Two colours with a smooth step between them, where the picture blurred three times by a third of `radius`
+/// passes `threshold`; the step is `softness` wide, both on a scale where 1 stands for 255. Gray takes the green
+/// of the colours. A radius below 3 doesn't blur. The result is always a new picture, without the alpha; `dest`,
+/// which may not be the source, receives the first pass of the blur. Nil where the blur gives nil.
+PictureZOR* StampFilter(PictureZOR* self, PictureZOR* dest, Double radius, Double threshold, Double softness,
+                        Color Black, Color White);
+
 // clang-format off
 inline constexpr MethodRow FilterMethods[] = {
     Method<19, "OilFilter(dest as PictureZOR, levels as integer, range as integer) as PictureZOR", OilFilter>,
@@ -127,6 +134,7 @@ inline constexpr MethodRow FilterMethods[] = {
     Method<30, "GammaFilter(dest as PictureZOR, gamma as double, alphaGamma as double) as PictureZOR", GammaFilter>,
     Method<31, "DitherFilter(dest as PictureZOR, matrix as integer, levels as integer) as PictureZOR", DitherFilter>,
     Method<32, "GainFilter(dest as PictureZOR, gain as double, bias as double) as PictureZOR", GainFilter>,
+    Method<33, "StampFilter(dest as PictureZOR, radius as double, threshold as double, softness as double, Black as Color, White as Color) as PictureZOR", StampFilter>,
     Method<34, "TransferFilter(dest as PictureZOR, red() as integer, green() as integer, blue() as integer) as PictureZOR", TransferFilter>,
     Method<35, "TransferFilter(dest as PictureZOR, red() as integer, green() as integer, blue() as integer, alpha() as integer) as PictureZOR", TransferFilter>,
     Method<36, "TransferFilter(dest as PictureZOR, gray() as integer) as PictureZOR", TransferFilter>,

@@ -12,7 +12,7 @@ namespace zor {
 namespace {
 
 constexpr auto Methods = InTableOrder(ImageMethods, ScaleMethods, FilterMethods, ExchangeMethods);
-static_assert(Methods.size() == 82);
+static_assert(Methods.size() == 83);
 MethodRecord MethodTable[Methods.size()];
 
 constexpr auto SharedMethods = InTableOrder(SharedPictureMethods);

@@ -48,6 +48,7 @@ class Held {
   }
   ~Held() { Unlock(Of); }
   explicit operator bool() const { return Of != nullptr; }
+  PictureZOR* Object() const { return Of; }
   PictureData& Data() const { return DataOf(Of); }
   PictureZOR* HandOn() { return std::exchange(Of, nullptr); }
 
