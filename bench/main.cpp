@@ -71,9 +71,10 @@ std::string Processor() {
 void PrintRoom(const std::string& room, Collector& times) {
   std::vector<std::string> names;
   for (const Race& race : Races())
-    if (race.Room == room)
+    if (race.Room == room && times.Median(Key(room, race.Work, race.Names[0])) >= 0)
       for (const std::string& name : race.Names)
         if (std::ranges::find(names, name) == names.end()) names.push_back(name);
+  if (names.empty()) return;
   std::printf("\n## %s\n\n| |", room.c_str());
   for (const std::string& name : names) std::printf(" %s |", name.c_str());
   std::printf("\n|---|");

@@ -1,14 +1,10 @@
-#include "race.h"
+#include "scale_peers.h"
 
 // Scaling, beside what a user would pick instead for the same work: antialiased, two passes, 8 bits.
 
 namespace picturezor::bench {
 namespace {
 
-struct Sizes {
-  const char* Name;
-  int FromWidth, FromHeight, IntoWidth, IntoHeight;
-};
 constexpr Sizes AllSizes[] = {{"to a quarter", 4000, 3000, 1000, 750},
                               {"to three quarters", 4000, 3000, 3000, 2250},
                               {"up by 4", 1000, 750, 4000, 3000}};
@@ -32,11 +28,15 @@ Contender Ours(const char* name, Format format, Kernel kernel, const Sizes& size
 const auto registered = [] {
   for (const auto& [formatName, format] : Formats)
     for (const Sizes& sizes : AllSizes)
-      for (const auto& [kernelName, kernel] : Kernels)
+      for (const auto& [kernelName, kernel] : Kernels) {
+        std::vector<Contender> contenders{
+            Ours("PictureZOR", format, kernel, sizes, 1),
+            Ours("PictureZOR, 2 threads", format, kernel, sizes, 2),
+            Memcpy(std::size_t(sizes.FromWidth) * sizes.FromHeight * BytesPerPixel(format))};
+        for (Contender& peer : ScalePeers(format, kernel, sizes)) contenders.push_back(std::move(peer));
         AddRace("scale", std::string(formatName) + " " + sizes.Name + ", " + kernelName,
-                {Ours("PictureZOR", format, kernel, sizes, 1),
-                 Ours("PictureZOR, 2 threads", format, kernel, sizes, 2),
-                 Memcpy(std::size_t(sizes.FromWidth) * sizes.FromHeight * BytesPerPixel(format))});
+                std::move(contenders));
+      }
   return true;
 }();
 

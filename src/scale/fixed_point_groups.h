@@ -19,10 +19,6 @@ struct alignas(VectorBytes) FixedPointRows::ColumnGroup {
   std::int32_t WholeSteps;
   std::int32_t FirstColumn;
   std::int32_t Columns;
-  /// Whether a lane of the group may be in doubt at all, and those that always are: lines without a
-  /// fixed-point form.
-  bool MayBeDoubtful;
-  std::uint32_t AlwaysDoubtful;
   const std::int8_t* Weights;
 };
 

@@ -140,6 +140,8 @@ struct FixedPointRows::Shares {
   /// Lines without a fixed-point form, whose shares are 0; and all bits that are set in a share.
   std::int32_t Unfit = 0;
   std::uint32_t Used = 0;
+  /// Whether there are lines off a lattice.
+  bool Doubtful = false;
 
   explicit Shares(const ContributionTable& table) {
     std::size_t entries = 0;
@@ -164,6 +166,7 @@ struct FixedPointRows::Shares {
       FitMemory[std::size_t(x)] = fits;
       if (!fits) std::fill_n(shares, table[x].Count, 0);
       Unfit += fits ? 0 : 1;
+      Doubtful |= !fits || Line(x).Doubtful > 0;
       for (std::int32_t i = 0; i < table[x].Count; ++i) Used |= std::uint32_t(shares[i]);
       shares += table[x].Count;
     }
@@ -188,7 +191,8 @@ bool FixedPointRows::Build() {
   const Shares shares(Table);
   // Where the plain form would have to make many samples one by one, it makes all of them better.
   if (!shares || shares.Unfit > ResultWidth / 8) return false;
-  Digits = (shares.Used & 0xFF) != 0 ? 3 : (shares.Used & 0xFF00) != 0 ? 2 : 1;
+  const bool all = shares.Doubtful || (shares.Used & 0xFF) != 0;
+  Digits = all ? 3 : (shares.Used & 0xFF00) != 0 ? 2 : 1;
 
   const std::int32_t groups = (ResultWidth + Pixels - 1) / Pixels;
   GroupMemory = NewBuffer(std::size_t(groups + 1) * sizeof(ColumnGroup));
@@ -210,8 +214,10 @@ bool FixedPointRows::Build() {
       for (int lane = p * Pair.Channels; lane < (p + 1) * Pair.Channels; ++lane) {
         group.Bias[lane] = shares.Line(x).Bias;
         group.Doubtful[lane] = shares.Line(x).Doubtful;
-        if (!shares.Fits(x)) group.AlwaysDoubtful |= 1U << lane;
-        group.MayBeDoubtful |= !shares.Fits(x) || shares.Line(x).Doubtful > 0;
+        if (shares.Fits(x)) continue;
+        // Without shares all of the sum is the bias: one half, which is in doubt.
+        group.Bias[lane] = 1 << (FixedPointLine::Bits - 1);
+        group.Doubtful[lane] = 1U << FixedPointLine::Bits;
       }
     }
     weights += std::ptrdiff_t{group.Steps} * Digits * VectorBytes;

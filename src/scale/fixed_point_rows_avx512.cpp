@@ -54,27 +54,21 @@ struct ByteWriter {
   __mmask64 Shown = 0;
 };
 
-/// Stores floats, a lane each, in the order that a pixel has.
+/// Stores floats, a lane each: the channels are numbered as dest has them.
 struct FloatWriter {
   using Value = float;
 
-  ZOR_VNNI_INLINE FloatWriter(const PixelOrder& order, int channels, int pixels) : Count(order.Count) {
-    alignas(VectorBytes) std::int32_t index[Lanes] = {};
-    for (int p = 0; p < pixels; ++p)
-      for (int b = 0; b < Count; ++b) index[p * Count + b] = p * channels + order.Channel[b];
-    Index = _mm512_load_si512(index);
-  }
+  FloatWriter(const PixelOrder& order, int, int) : Count(order.Count) {}
   ZOR_VNNI_INLINE void Write(__m512i lanes, float* into, int, std::int64_t) const {
-    _mm512_storeu_ps(into, _mm512_permutexvar_ps(Index, _mm512_cvtepi32_ps(lanes)));
+    _mm512_storeu_ps(into, _mm512_cvtepi32_ps(lanes));
   }
 
   int Count;
-  __m512i Index;
 };
 
 }
 
-/// Runs groups over one row or four.
+/// Runs groups over one row or several.
 struct GroupRunner {
   /// A lane's sum, its digits put together.
   template <int Digits>
@@ -113,6 +107,8 @@ struct GroupRunner {
       for (int r = 0; r < Rows; ++r) {
         source[r] = from[r] + plan.Lead + group->Base;
         for (int d = 0; d < Digits; ++d) sums[r][d] = zero;
+        // Only lines of three digits have a bias.
+        if constexpr (Digits == 3) sums[r][2] = _mm512_load_si512(group->Bias);
       }
       const std::int8_t* weights = group->Weights;
       std::int32_t s = 0;
@@ -139,18 +135,18 @@ struct GroupRunner {
       for (int r = 0; r < Rows; ++r) {
         __m512i sum = Joined<Digits>(sums[r]);
         if (plan.Parts > 1) sum = PartsAdded(sum, plan.Parts, lanesOfPart);
-        sum = _mm512_add_epi32(sum, _mm512_load_si512(group->Bias));
         const __m512i value = _mm512_srai_epi32(sum, FixedPointLine::Bits);
         writer.Write(_mm512_min_epi32(_mm512_max_epi32(value, zero), white), into[r] + at,
                      group->Columns * writer.Count, room);
-        if (!group->MayBeDoubtful) continue;
-        // Near 0 both sides give the same byte.
-        const __mmask16 above = _mm512_cmpge_epi32_mask(sum, half);
-        const __mmask16 near = _mm512_mask_cmplt_epu32_mask(above, _mm512_and_si512(sum, fraction),
-                                                            _mm512_load_si512(group->Doubtful));
-        const std::uint32_t doubt = near | group->AlwaysDoubtful;
-        if (doubt) [[unlikely]]
-          Settle(plan, *group, doubt, from[r], into[r] + at, order);
+        if constexpr (Digits == 3) {
+          __mmask16 doubt =
+              _mm512_cmplt_epu32_mask(_mm512_and_si512(sum, fraction), _mm512_load_si512(group->Doubtful));
+          if (doubt) [[unlikely]] {
+            // Near 0 both sides give the same byte.
+            doubt = _mm512_mask_cmpge_epi32_mask(doubt, sum, half);
+            if (doubt) Settle(plan, *group, doubt, from[r], into[r] + at, order);
+          }
+        }
       }
     }
   }

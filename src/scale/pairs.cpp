@@ -38,6 +38,36 @@ Group GroupFor(Family family, bool alpha) {
   return Group(int(plain) + (alpha ? 1 : 0));
 }
 
+std::int32_t FirstOffset(const PlaneList& planes) {
+  return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
+}
+
+/// The planes by their place in the pixel.
+std::array<int, 5> InPixelOrder(const PlaneList& planes) {
+  std::array<int, 5> sorted{};
+  for (int p = 0; p < planes.Count; ++p) {
+    int place = 0;
+    for (int other = 0; other < planes.Count; ++other)
+      if (planes.Offset[other] < planes.Offset[p]) ++place;
+    sorted[place] = p;
+  }
+  return sorted;
+}
+
+/// Numbers the channels in the order of dest's pixel, so that the first pass needs no other.
+void NumberAsInDest(ScalePair& pair) {
+  const PixelOrder order = OrderOfDest(pair);
+  const ScalePair before = pair;
+  std::array<int, 5> number{};
+  for (int place = 0; place < order.Count; ++place) {
+    number[order.Channel[place]] = place;
+    pair.Source.Offset[place] = before.Source.Offset[order.Channel[place]];
+  }
+  for (int p = 0; p < pair.Dest.Count; ++p) pair.ChannelOfPlane[p] = number[before.ChannelOfPlane[p]];
+  for (int b = 0; b < pair.Temp.Count; ++b)
+    if (before.Temp.Channel[b] != PixelOrder::Zero) pair.Temp.Channel[b] = number[before.Temp.Channel[b]];
+}
+
 ScalePair Filled(const PairRow& row, const PictureData& source, const PictureData& dest) {
   const bool alpha = source.HasAlpha && dest.HasAlpha;
   const Form& form = alpha ? row.WithAlpha : row.Plain;
@@ -53,19 +83,8 @@ ScalePair Filled(const PairRow& row, const PictureData& source, const PictureDat
   for (int i = 0; i < pair.Temp.Count; ++i)
     pair.Temp.Channel[i] = form.Temp[i] == '-' ? PixelOrder::Zero : form.Temp[i] - '0';
   pair.TempFormat = ScalingFormat[pair.Temp.Count];
+  if (!pair.Luma) NumberAsInDest(pair);
   return pair;
-}
-
-/// The planes by their place in the pixel.
-std::array<int, 5> InPixelOrder(const PlaneList& planes) {
-  std::array<int, 5> sorted{};
-  for (int p = 0; p < planes.Count; ++p) {
-    int place = 0;
-    for (int other = 0; other < planes.Count; ++other)
-      if (planes.Offset[other] < planes.Offset[p]) ++place;
-    sorted[place] = p;
-  }
-  return sorted;
 }
 
 }

@@ -14,8 +14,8 @@ struct PixelOrder {
 
 /// What goes where between two pictures of a pair of families.
 ///
-/// The first pass makes channels of the source's planes: one of each, or with `Luma` one of the first three.
-/// The second pass gives each plane of dest one of the channels.
+/// The first pass makes channels of the source's planes: one of each, in the order that dest's pixel has
+/// them, or with `Luma` one of the first three. The second pass gives each plane of dest one of the channels.
 struct ScalePair {
   PlaneList Source;
   bool Luma = false;
