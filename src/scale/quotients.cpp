@@ -7,7 +7,7 @@ namespace zor {
 namespace {
 
 constexpr double LatticeUnit = 4096.0;  // 2^12 multiples make 1
-constexpr float Disturbing = 0x1p-40F;
+constexpr float Disturbing = 0x1p-26F;
 
 /// The weight as a multiple of the lattice's unit; a disturbing one is 0 of them. False for none.
 bool Multiple(float weight, std::int64_t& multiple) {
@@ -31,6 +31,26 @@ struct Shares {
 };
 
 std::int64_t RoundedUp(std::int64_t a, std::int64_t b) { return a >= 0 ? (a + b - 1) / b : -(-a / b); }
+
+constexpr double One = 1 << FixedPointLine::Bits;
+
+/// The shares of a line on a lattice, each rounded up to a multiple of `unit`. False where they pass 24 bits,
+/// or the quotients grow by so much that one could reach the next whole number.
+bool RoundShares(const Contribution& line, const Lattice& lattice, std::int32_t unit, std::int32_t* shares) {
+  std::int64_t sum = 0;
+  Multiple(line.Sum, sum);
+  double tooLarge = 0.0;
+  for (std::int32_t i = 0; i < line.Count; ++i) {
+    std::int64_t multiple = 0;
+    Multiple(line.Entries[i].Weight, multiple);
+    const double exact = double(multiple) / double(sum) * One;
+    if (!(std::fabs(exact) < 127 * 65536.0)) return false;
+    const std::int64_t rounded = RoundedUp(multiple << FixedPointLine::Bits, sum * unit) * unit;
+    shares[i] = std::int32_t(rounded);
+    tooLarge += double(rounded) - exact;
+  }
+  return (255.0 * tooLarge + lattice.Disturbance * One + 2.0) * double(lattice.Denominator) < One;
+}
 
 }
 
@@ -64,27 +84,16 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
   made = {0, 0};
   if (line.Count == 0) return true;
   if (!(line.Sum > 0.0F)) return false;
-  constexpr double One = 1 << FixedPointLine::Bits;
-  constexpr double Largest = 127 * 65536.0;
-  const Lattice lattice = LatticeOf(line);
-  // Each share is rounded up by less than 1, so a quotient grows by less than 255 n / One.
-  const bool onLattice =
-      lattice.Denominator > 0 &&
-      (255.0 * line.Count + lattice.Disturbance * One + 2.0) * double(lattice.Denominator) < One;
-  if (!onLattice && AlwaysInDoubt(line)) return false;
-  std::int64_t sum = 0;
-  if (onLattice) Multiple(line.Sum, sum);
+  // On a lattice as few digits as will do.
+  if (const Lattice lattice = LatticeOf(line); lattice.Denominator > 0)
+    for (const std::int32_t unit : {65536, 256, 1})
+      if (RoundShares(line, lattice, unit, shares)) return true;
+  if (AlwaysInDoubt(line)) return false;
   Shares sizes;
   for (std::int32_t i = 0; i < line.Count; ++i) {
     const double exact = double(line.Entries[i].Weight) / line.Sum * One;
-    if (!(std::fabs(exact) < Largest)) return false;
-    if (onLattice) {
-      std::int64_t multiple = 0;
-      Multiple(line.Entries[i].Weight, multiple);
-      shares[i] = std::int32_t(RoundedUp(multiple << FixedPointLine::Bits, sum));
-    } else {
-      shares[i] = std::int32_t(std::floor(exact + 0.5));
-    }
+    if (!(std::fabs(exact) < 127 * 65536.0)) return false;
+    shares[i] = std::int32_t(std::floor(exact + 0.5));
     sizes.Add(shares[i], exact);
   }
   // The 3 cover the rounding of these bounds and of the plain form.
@@ -93,7 +102,7 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
   // A sum lies between the two; what happens on the way to it may pass 32 bits, and comes back.
   const double farthest = std::fmax(sizes.Positive, sizes.Negative) * 255.0 + tooLarge + tooSmall;
   if (!(farthest < 2147483647.0) || !(tooLarge + tooSmall < One / 2)) return false;
-  if (!onLattice) made = {std::int32_t(tooSmall), std::uint32_t(tooLarge + tooSmall) + 1};
+  made = {std::int32_t(tooSmall), std::uint32_t(tooLarge + tooSmall) + 1};
   return true;
 }
 
