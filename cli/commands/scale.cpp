@@ -18,6 +18,8 @@ struct ScaleOptions {
   std::string Fit;
   double Percent = 0;
   std::string KernelName = "lanczos3";
+  int Threads = 0;
+  bool Fast = false;
 };
 
 const std::map<std::string, Kernel> Kernels{{"triangle", Kernel::Triangle}, {"box", Kernel::Box},
@@ -47,14 +49,11 @@ PictureSize ResultSize(const ScaleOptions& options, const ImageInfo& source, For
   return {std::max(1, int(std::lround(width))), std::max(1, int(std::lround(height))), format};
 }
 
-/// What `Scale` keeps between its passes.
-Format TempFormat(Format source, Format dest) {
-  const bool alpha = HasAlpha(source) && HasAlpha(dest);
-  switch (WithoutAlpha(dest)) {
-    case Format::G: return alpha ? Format::Scaling2 : Format::Scaling1;
-    case Format::CMYK: return alpha ? Format::Scaling5 : Format::Scaling4;
-    default: return Format::Scaling4;
-  }
+/// Scales by the way that the options name.
+bool ScaleInto(const Picture& dest, const Picture& source, const ScaleOptions& options) {
+  if (options.Fast) return dest.ScaleFast(source, dest.Width(), dest.Height());
+  return dest.ScaleMT(options.Threads, source, {}, Kernels.at(options.KernelName), dest.Width(),
+                      dest.Height());
 }
 
 int Scale(Session& session, const ScaleOptions& options) {
@@ -63,21 +62,20 @@ int Scale(Session& session, const ScaleOptions& options) {
   Target target(options.Out);
   OpenedImage source(session, options.In);
   const Format format = target.Storable(session, source.Upright.Pixels);
+  if (options.Fast && format == Format::CMYK) throw Failure(options.In, "--fast has no way for CMYK");
   const PictureSize size = ResultSize(options, source.Upright, format);
   target.Start(size.Width, size.Height);
-  const PictureSize temp{size.Width, source.Upright.Height, TempFormat(source.Upright.Pixels, format)};
-  auto pictures = MakePictures(session.Stores, {source.Size(), size, temp});
+  auto pictures = MakePictures(session.Stores, {source.Size(), size});
   source.ReadInto(session, pictures[0]);
   session.Bar.Begin("scaling");
   if (session.Bar.Shown()) {
     Host::OnYield([&session] { session.Bar.Tick(); });
     pictures[1].SetYieldTicks(6);
   }
-  const bool scaled =
-      pictures[1].Scale(pictures[0], pictures[2], Kernels.at(options.KernelName), size.Width, size.Height);
+  const bool scaled = ScaleInto(pictures[1], pictures[0], options);
   Host::OnYield({});
   if (!scaled) throw Failure(options.In, "it can't be scaled");
-  pictures[0] = pictures[2] = Picture();
+  pictures[0] = Picture();
   target.Write(session, pictures[1], format, source.Upright);
   target.Commit();
   return Done;
@@ -116,11 +114,19 @@ void AddScale(CLI::App& app, Session& session) {
   percent->type_name("P");
   fit->excludes(width)->excludes(height)->excludes(percent);
   percent->excludes(width)->excludes(height);
+  CLI::Option* kernel =
+      command
+          ->add_option("--kernel", options->KernelName,
+                       "triangle, box, lanczos3 (default), lanczos8, mitchell, poly3 or cubic")
+          ->type_name("NAME")
+          ->check(CLI::IsMember(Kernels));
   command
-      ->add_option("--kernel", options->KernelName,
-                   "triangle, box, lanczos3 (default), lanczos8, mitchell, poly3 or cubic")
-      ->type_name("NAME")
-      ->check(CLI::IsMember(Kernels));
+      ->add_option("--threads", options->Threads,
+                   "Threads to work on; 0, the default, is one a processor. In temporary files one works")
+      ->type_name("N")
+      ->check(CLI::Range(0, 32));
+  command->add_flag("--fast", options->Fast, "Take the nearest pixels: quick and rough, without a kernel")
+      ->excludes(kernel);
   AddQualityOption(*command, session);
   AddStoreOptions(*command, session);
   command->callback(

@@ -112,7 +112,8 @@ void WaitFor(WorkerSlot& slot) {
     if (FinishedSoon(slot)) return;
     REALYieldToRB();
   }
-  slot.Worker(slot.First, slot.Last, slot.Context);
+  // A child has the slice but no thread.
+  if (slot.Pending) slot.Worker(slot.First, slot.Last, slot.Context);
   slot.Pending = false;
 }
 

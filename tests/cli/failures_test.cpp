@@ -137,6 +137,8 @@ TEST_F(Failures, WrongCommandLines) {
       {"scale", "a.png", "-o", "b.png", "--width", "ten"},
       {"scale", "a.png", "-o", "b.png", "--width", "4", "--kernel", "sharp"},
       {"scale", "a.png", "-o", "b.png", "--width", "4", "--fit", "4x4"},
+      {"scale", "a.png", "-o", "b.png", "--width", "4", "--threads", "33"},
+      {"scale", "a.png", "-o", "b.png", "--width", "4", "--fast", "--kernel", "box"},
       {"scale", "a.png", "-o", "b.png", "--fit", "4x"},
       {"scale", "a.png", "-o", "b.png", "--fit", "0x4"},
       {"scale", "a.png", "-o", "b.png", "--percent", "0"},
