@@ -38,10 +38,6 @@ Group GroupFor(Family family, bool alpha) {
   return Group(int(plain) + (alpha ? 1 : 0));
 }
 
-std::int32_t FirstOffset(const PlaneList& planes) {
-  return *std::min_element(planes.Offset.begin(), planes.Offset.begin() + planes.Count);
-}
-
 /// The planes by their place in the pixel.
 std::array<int, 5> InPixelOrder(const PlaneList& planes) {
   std::array<int, 5> sorted{};
