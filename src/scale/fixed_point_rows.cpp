@@ -1,7 +1,7 @@
 #include "scale/fixed_point_rows.h"
 
 #include <algorithm>
-#include <bit>
+#include <cstring>
 #include <limits>
 
 #include "image/targets.h"
@@ -27,7 +27,7 @@ Sample* Aligned(const Buffer& memory) {
 /// 127.
 std::int8_t TakeDigit(std::int32_t& share) {
   const auto digit = std::int8_t(share & 255);
-  share = (share - digit) / 256;
+  share = (share - digit) >> 8;
   return digit;
 }
 
@@ -115,22 +115,30 @@ struct GroupMaker {
     FillIndex(group, start);
     return group.Steps;
   }
-  /// Writes the digits of one line's shares into the weights of its group.
+  /// Writes the digits of one line's shares into the weights of its group, four taps at a time.
   void FillWeights(std::int8_t* weights, int pixel, const Contribution& line,
                    const std::int32_t* shares) const {
+    const int digits = Rows.Digits;
+    std::int8_t four[3][Taps] = {};
+    std::int32_t place = 0;
+    const auto write = [&] {
+      std::int8_t* lanes = weights + std::ptrdiff_t{place / Rows.Parts} * digits * VectorBytes +
+                           Lane(place % Rows.Parts, pixel, 0) * Taps;
+      for (int d = 0; d < digits; ++d)
+        for (int c = 0; c < Channels; ++c) std::memcpy(lanes + d * VectorBytes + c * Taps, four[d], Taps);
+    };
     for (std::int32_t i = 0; i < line.Count; ++i) {
       const std::int32_t tap = line.Entries[i].Pixel - FirstPixel(line);
-      const std::int32_t step = tap / (Taps * Rows.Parts), within = tap % (Taps * Rows.Parts);
-      std::int32_t share = shares[i];
-      // The digits that no share of the table has are its lowest ones.
-      for (int d = Rows.Digits; d < 3; ++d) TakeDigit(share);
-      for (int d = Rows.Digits - 1; d >= 0; --d) {
-        const std::int8_t digit = TakeDigit(share);
-        for (int c = 0; c < Channels; ++c)
-          weights[(std::ptrdiff_t{step} * Rows.Digits + d) * VectorBytes +
-                  Lane(within / Taps, pixel, c) * Taps + within % Taps] = digit;
+      if (tap / Taps != place) {
+        write();
+        std::memset(four, 0, sizeof four);
+        place = tap / Taps;
       }
+      // The digits that no share of the table has are its lowest ones.
+      std::int32_t share = shares[i];
+      for (int d = 2; d >= 0; --d) four[d][tap % Taps] = TakeDigit(share);
     }
+    write();
   }
 };
 
