@@ -4,6 +4,7 @@
 #include "filters/filters.h"
 #include "frame/classes.h"
 #include "frame/property.h"
+#include "geometry/geometry.h"
 #include "image/formats.h"
 #include "image/image.h"
 #include "scale/scale.h"
@@ -11,8 +12,9 @@
 namespace zor {
 namespace {
 
-constexpr auto Methods = InTableOrder(ImageMethods, ScaleMethods, FilterMethods, ExchangeMethods);
-static_assert(Methods.size() == 83);
+constexpr auto Methods =
+    InTableOrder(ImageMethods, ScaleMethods, GeometryMethods, FilterMethods, ExchangeMethods);
+static_assert(Methods.size() == 92);
 MethodRecord MethodTable[Methods.size()];
 
 constexpr auto SharedMethods = InTableOrder(SharedPictureMethods);

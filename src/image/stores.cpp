@@ -161,6 +161,18 @@ PictureData::RowFunction Mirrored(PictureData::RowFunction getter) {
   return getter;
 }
 
+bool IsMirrored(const PictureData& picture) {
+  return picture.RowGetter == PlainRowMirrored || picture.RowGetter == MappedRowMirrored;
+}
+
+bool HoldTogether(PictureData& data, std::int32_t first, std::int32_t last) {
+  if (!data.RowGetter || !data.IsMapping) return data.RowGetter != nullptr;
+  const std::int64_t top = IsMirrored(data) ? MirroredStoreRow(data, last) : StoreRow(data, first);
+  const std::int64_t bottom = top + last - first;
+  if (!InWindow(data, top) || !InWindow(data, bottom)) PlaceWindow(data, top);
+  return InWindow(data, top) && InWindow(data, bottom);
+}
+
 std::int32_t RoundedRowSize(const PictureData& data, std::int32_t unit) {
   const std::int64_t rounded = (PackedRowBytes(data) + unit - 1) / unit * unit;
   return rounded <= Int32Max ? std::int32_t(rounded) : 0;

@@ -62,6 +62,13 @@ void SetMappingBlockSize(PictureZOR* self, Word, Integer value);
 /// The getter that shows the same store upside down; null stays null.
 PictureData::RowFunction Mirrored(PictureData::RowFunction getter);
 
+/// Whether the rows of a picture stand in its store from the bottom up.
+bool IsMirrored(const PictureData& picture);
+
+/// Moves the window of a mapped store, if it has to, so that rows first .. last are all in it. False where
+/// they can't be, and on a closed picture.
+bool HoldTogether(PictureData& data, std::int32_t first, std::int32_t last);
+
 /// The getter of every memory store.
 Sample* PlainRow(PictureData* data, std::int32_t row);
 

@@ -1,0 +1,111 @@
+#include "geometry/reversal.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "geometry/blocks.h"
+
+// A block of 16 bytes holds some whole pixels and at most a part of one more, so it is read so that the part
+// lies on the side that the rows go on at: the pixels stand at the low end of a block of the left side, at
+// the high end on the right. What isn't to change, filler bytes and the part, is put back as it was.
+
+namespace zor {
+namespace {
+
+template <int Step>
+constexpr int PixelsInBlock = int(BlockBytes) / Step;
+template <int Step>
+constexpr int Rest = int(BlockBytes) - PixelsInBlock<Step>* Step;
+
+/// Where byte j comes from when the pixels at one end of a block go to its other end, the last one first.
+template <int Step>
+constexpr int ToLow(int j) {
+  const int pixel = PixelsInBlock<Step> - 1 - j / Step;
+  return pixel < 0 ? 0 : Rest<Step> + pixel * Step + j % Step;
+}
+template <int Step>
+constexpr int ToHigh(int j) {
+  return j < Rest<Step> ? 0 : ToLow<Step>(j - Rest<Step>) - Rest<Step>;
+}
+
+constexpr Block Blend(Block changed, Block old, Block mask) { return (changed & mask) | (old & ~mask); }
+
+template <int Step>
+void SwapBlocks(Sample* left, Sample* rightEnd, std::ptrdiff_t blocks, const Sample* fromLow,
+                const Sample* fromHigh) {
+  const Block lowMask = LoadBlock(fromLow), highMask = LoadBlock(fromHigh);
+  for (; blocks > 0; --blocks) {
+    const Block low = LoadBlock(left), high = LoadBlock(rightEnd - BlockBytes);
+    StoreBlock(left, Blend(Shuffled<ToLow<Step>>(high, high), low, lowMask));
+    StoreBlock(rightEnd - BlockBytes, Blend(Shuffled<ToHigh<Step>>(low, low), high, highMask));
+    left += PixelsInBlock<Step> * Step;
+    rightEnd -= PixelsInBlock<Step> * Step;
+  }
+}
+
+template <int Step>
+void CopyBlocks(const Sample* fromEnd, Sample* into, std::ptrdiff_t blocks, const Sample* fromLow) {
+  const Block mask = LoadBlock(fromLow);
+  for (; blocks > 0; --blocks) {
+    const Block pixels = LoadBlock(fromEnd - BlockBytes);
+    StoreBlock(into, Blend(Shuffled<ToLow<Step>>(pixels, pixels), LoadBlock(into), mask));
+    into += PixelsInBlock<Step> * Step;
+    fromEnd -= PixelsInBlock<Step> * Step;
+  }
+}
+
+/// How many blocks can be taken while each finds 16 bytes of pixels that are still to go.
+template <int Step>
+std::ptrdiff_t BlocksIn(std::ptrdiff_t pixels) {
+  const std::ptrdiff_t bytes = pixels * Step, taken = PixelsInBlock<Step> * Step;
+  return bytes < BlockBytes ? 0 : (bytes - BlockBytes) / taken + 1;
+}
+
+}
+
+Reversal::Reversal(const PlaneList& in, const PlaneList& out, bool inOrder)
+    : In(in), Out(out), Edge(in.Offset[0] / in.Step * in.Step) {
+  InBlocks = !inOrder && ShufflesBytes() && in.Step == out.Step && in.Step <= 5;
+  std::fill_n(FromLow, BlockBytes, Sample{0});
+  std::fill_n(FromHigh, BlockBytes, Sample{0});
+  const std::ptrdiff_t rest = BlockBytes % in.Step;
+  for (int c = 0; c < in.Count && InBlocks; ++c) {
+    const std::ptrdiff_t at = in.Offset[c] - Edge;
+    InBlocks = at >= 0 && at < in.Step && in.Offset[c] == out.Offset[c];
+    for (std::ptrdiff_t j = at; j < BlockBytes - rest && InBlocks; j += in.Step)
+      FromLow[j] = FromHigh[rest + j] = 255;
+  }
+}
+
+void Reversal::Swap(Sample* a, Sample* b, std::ptrdiff_t count) const {
+  std::ptrdiff_t done = 0;
+  const auto swapBlocks = [&]<int Step>() {
+    const std::ptrdiff_t blocks = BlocksIn<Step>(count);
+    OnBestTarget<SwapBlocks<Step>>(a + Edge, b + Edge + count * Step, blocks, FromLow, FromHigh);
+    done = blocks * PixelsInBlock<Step>;
+  };
+  if (InBlocks) ForPlaneCount(In.Step, [&](auto step) { swapBlocks.template operator()<step>(); });
+  ForPlaneCount(In.Count, [&](auto n) {
+    const PlaneRow<n> left(a, In), right(b, In);
+    for (std::ptrdiff_t x = done; x < count; ++x)
+      for (int c = 0; c < n; ++c) std::swap(left(c, x), right(c, count - 1 - x));
+  });
+}
+
+void Reversal::Copy(Sample* from, Sample* into, std::ptrdiff_t count) const {
+  std::ptrdiff_t done = 0;
+  const auto copyBlocks = [&]<int Step>() {
+    const std::ptrdiff_t blocks = BlocksIn<Step>(count);
+    const Sample* end = from + Edge + count * Step;
+    OnBestTarget<CopyBlocks<Step>>(end, into + Edge, blocks, FromLow);
+    done = blocks * PixelsInBlock<Step>;
+  };
+  if (InBlocks) ForPlaneCount(In.Step, [&](auto step) { copyBlocks.template operator()<step>(); });
+  ForPlaneCount(In.Count, [&](auto n) {
+    const PlaneRow<n> in(from, In), out(into, Out);
+    for (std::ptrdiff_t x = done; x < count; ++x)
+      for (int c = 0; c < n; ++c) out(c, x) = in(c, count - 1 - x);
+  });
+}
+
+}
