@@ -1,0 +1,159 @@
+#include <algorithm>
+#include <memory>
+
+#include "race.h"
+
+#ifdef PICTUREZOR_OPENCV
+#include <opencv2/core.hpp>
+#include <opencv2/core/version.hpp>
+#endif
+#ifdef PICTUREZOR_VIPS
+#include <vips/vips.h>
+#endif
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+#include <magick/api.h>
+#endif
+
+// Pixels that change places, and the free rotation.
+
+namespace picturezor::bench {
+namespace {
+
+constexpr std::pair<const char*, Format> Formats[] = {
+    {"gray", Format::G}, {"RGB", Format::RGB}, {"RGBA", Format::RGBA}};
+
+/// Work of ours on a picture.
+Contender Ours(Format format, void (*work)(const Picture&)) {
+  return {"PictureZOR", [=] { return [=, picture = TestPicture(format)] { work(picture); }; }};
+}
+/// Work of ours from a picture into another one that stays.
+Contender OursInto(Format format, bool swaps, void (*work)(const Picture&, const Picture&)) {
+  return {"PictureZOR", [=] {
+            return [=, picture = TestPicture(format),
+                    dest = swaps ? Picture(Height, Width, format) : Picture(Width, Height, format)] {
+              work(picture, dest);
+            };
+          }};
+}
+
+#ifdef PICTUREZOR_OPENCV
+/// The bytes of a picture as OpenCV's own; the picture's rows have no padding at this width.
+cv::Mat MatOf(Format format) {
+  const Picture picture = TestPicture(format);
+  cv::Mat mat(Height, Width, CV_8UC(BytesPerPixel(format)));
+  for (int y = 0; y < Height; ++y) {
+    const Bytes row = picture.Row(y);
+    std::copy_n(row.begin(), mat.cols * mat.channels(), mat.ptr(y));
+  }
+  return mat;
+}
+Contender Flip(Format format, int code) {
+  return {"OpenCV", [=] {
+            cv::setNumThreads(1);
+            return [=, mat = MatOf(format)]() mutable { cv::flip(mat, mat, code); };
+          }};
+}
+Contender Turn(Format format, int code) {
+  return {"OpenCV", [=] {
+            cv::setNumThreads(1);
+            return [=, mat = MatOf(format), into = cv::Mat()]() mutable { cv::rotate(mat, into, code); };
+          }};
+}
+#endif
+
+#ifdef PICTUREZOR_VIPS
+/// Runs work on a picture in memory and writes its result to memory.
+Contender Vips(Format format, int (*work)(VipsImage*, VipsImage**)) {
+  return {"libvips", [=] {
+            vips_concurrency_set(1);
+            vips_cache_set_max(0);
+            auto pixels = std::make_shared<Bytes>(TestPicture(format).DataStringInFormat(format));
+            return [=] {
+              VipsImage* in = vips_image_new_from_memory(pixels->data(), pixels->size(), Width, Height,
+                                                         BytesPerPixel(format), VIPS_FORMAT_UCHAR);
+              VipsImage* out = nullptr;
+              std::size_t size = 0;
+              void* result = work(in, &out) == 0 ? vips_image_write_to_memory(out, &size) : nullptr;
+              g_free(result);
+              if (out) g_object_unref(out);
+              g_object_unref(in);
+            };
+          }};
+}
+#endif
+
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+/// A rotation on one thread.
+Contender Magick(Format format, const char* map, double degrees) {
+  return {"GraphicsMagick", [=] {
+            SetMagickResourceLimit(ThreadsResource, 1);
+            const Bytes pixels = TestPicture(format).DataStringInFormat(format);
+            ExceptionInfo exception;
+            GetExceptionInfo(&exception);
+            const std::shared_ptr<Image> image(
+                ConstituteImage(Width, Height, map, CharPixel, pixels.data(), &exception), DestroyImage);
+            return [=] {
+              ExceptionInfo failed;
+              GetExceptionInfo(&failed);
+              if (Image* turned = RotateImage(image.get(), degrees, &failed)) DestroyImage(turned);
+              DestroyExceptionInfo(&failed);
+            };
+          }};
+}
+#endif
+
+void AddFormat(const std::string& name, Format format) {
+  const Contender memcpyOfAll = Memcpy(BytesOf(BytesPerPixel(format)));
+  const auto race = [&](const char* work, Contender ours, std::vector<Contender> peers) {
+    peers.insert(peers.begin(), std::move(ours));
+    peers.push_back(memcpyOfAll);
+    AddRace("geometry", name + " " + work, std::move(peers));
+  };
+  std::vector<Contender> mirror, flip, half, left, right, free;
+#ifdef PICTUREZOR_OPENCV
+  mirror.push_back(Flip(format, 1));
+  flip.push_back(Flip(format, 0));
+  half.push_back(Flip(format, -1));
+  left.push_back(Turn(format, cv::ROTATE_90_COUNTERCLOCKWISE));
+  right.push_back(Turn(format, cv::ROTATE_90_CLOCKWISE));
+#endif
+#ifdef PICTUREZOR_VIPS
+  left.push_back(Vips(
+      format, [](VipsImage* in, VipsImage** out) { return vips_rot(in, out, VIPS_ANGLE_D270, nullptr); }));
+  right.push_back(Vips(
+      format, [](VipsImage* in, VipsImage** out) { return vips_rot(in, out, VIPS_ANGLE_D90, nullptr); }));
+  free.push_back(
+      Vips(format, [](VipsImage* in, VipsImage** out) { return vips_rotate(in, out, 12.0, nullptr); }));
+#endif
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+  const char* map = format == Format::G ? "I" : format == Format::RGB ? "RGB" : "RGBA";
+  free.push_back(Magick(format, map, 12));
+#endif
+  race("HMirror in place", Ours(format, [](const Picture& p) { p.HMirror(); }), mirror);
+  race("VMirror in place", Ours(format, [](const Picture& p) { p.VMirror(); }), flip);
+  race("Rotate180 in place", Ours(format, [](const Picture& p) { p.Rotate180(); }), half);
+  race("Rotate180", OursInto(format, false, [](const Picture& p, const Picture& d) { p.Rotate180(d); }), {});
+  race("Rotate90", OursInto(format, true, [](const Picture& p, const Picture& d) { p.Rotate90(d); }), left);
+  race("Rotate270", OursInto(format, true, [](const Picture& p, const Picture& d) { p.Rotate270(d); }),
+       right);
+  race("Rotate by 12 degrees", Ours(format, [](const Picture& p) { p.Rotate(12); }), free);
+}
+
+const auto registered = [] {
+#ifdef PICTUREZOR_OPENCV
+  NamePeer("OpenCV", CV_VERSION);
+#endif
+#ifdef PICTUREZOR_VIPS
+  VIPS_INIT("picturezor_bench");
+  NamePeer("libvips", vips_version_string());
+#endif
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+  InitializeMagick(nullptr);
+  NamePeer("GraphicsMagick", MagickLibVersionText);
+#endif
+  for (const auto& [name, format] : Formats) AddFormat(name, format);
+  return true;
+}();
+
+}
+}
