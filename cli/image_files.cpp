@@ -1,0 +1,66 @@
+#include "picturezor/image_files.h"
+
+#include "codecs/image_file.h"
+#include "failure.h"
+#include "pictures.h"
+#include "temporary_files.h"
+
+namespace picturezor {
+
+using namespace cli;
+
+namespace {
+
+/// The format of files that has a picture's colours and alpha.
+Format FileFormatOf(const std::filesystem::path& file, const Picture& picture) {
+  if (!picture.IsGray() && !picture.IsRGB() && !picture.IsCMYK())
+    throw Failure(file, "the picture has no colours");
+  const Format colours = picture.IsGray() ? Format::G : picture.IsRGB() ? Format::RGB : Format::CMYK;
+  return picture.HasAlpha() ? WithAlpha(colours) : colours;
+}
+
+}
+
+Picture LoadImage(const std::filesystem::path& file) {
+  const StoreOptions stores{Store::Auto, DefaultMemoryLimit(), DefaultTempDirectory()};
+  const auto reader = OpenImage(file, stores.MemoryLimit);
+  const ImageInfo upright = Upright(reader->Info());
+  const Picture picture = MakePictures(stores, {{upright.Width, upright.Height, upright.Pixels}})[0];
+  Progress silent;
+  ReadInto(picture, *reader, silent);
+  return picture;
+}
+
+HostPicture LoadHostPicture(const std::filesystem::path& file) {
+  const HostPicture picture = LoadImage(file).CopyPictureWithMask();
+  if (!picture) throw Failure(file, "the host has no picture for it; one is 32767 pixels on a side at most");
+  return picture;
+}
+
+void SaveImage(const std::filesystem::path& file, const Picture& picture) {
+  if (!picture.Valid()) throw Failure(file, "there is no picture to write");
+  const FileType type = TypeByExtension(file);
+  ImageInfo info;
+  info.Width = picture.Width();
+  info.Height = picture.Height();
+  info.Pixels = StorableFormat(file, type, FileFormatOf(file, picture));
+  RequireStorableSize(file, type, info.Width, info.Height);
+  OutputFile output(file);
+  const auto writer = CreateImage(output.Descriptor(), file, type, info, {});
+  for (std::int32_t y = 0; y < info.Height; ++y) {
+    const Bytes row = picture.RowInFormat(y, info.Pixels);
+    if (row.empty()) throw Failure(file, "a row of the picture can't be reached");
+    writer->WriteRow(row.data());
+  }
+  writer->Finish();
+  output.Commit();
+}
+
+void SaveImage(const std::filesystem::path& file, const HostPicture& picture) {
+  if (!picture) throw Failure(file, "there is no picture to write");
+  const Picture image(picture.Width(), picture.Height(), picture.Mask() ? Format::RGBA : Format::RGB);
+  image.DrawMaskedPictureRGB(picture);
+  SaveImage(file, image);
+}
+
+}
