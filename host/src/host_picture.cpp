@@ -53,12 +53,14 @@ void HostPicture::SetPixel(std::int32_t x, std::int32_t y, Color color) const {
 
 Bytes HostPicture::RGB() const {
   PicturePayload& held = Held(*this);
-  Bytes bytes;
-  bytes.reserve(std::size_t(Width()) * std::size_t(Height()) * 3);
+  Bytes bytes(std::size_t(Width()) * std::size_t(Height()) * 3);
+  std::uint8_t* at = bytes.data();
   for (std::int32_t y = 0; y < Height(); ++y)
     for (std::int32_t x = 0; x < Width(); ++x) {
       const Color color = held.Get(x, y);
-      bytes.insert(bytes.end(), {color.Red, color.Green, color.Blue});
+      *at++ = color.Red;
+      *at++ = color.Green;
+      *at++ = color.Blue;
     }
   return bytes;
 }

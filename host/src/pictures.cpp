@@ -138,8 +138,9 @@ PicturePayload::PicturePayload(std::int32_t width, std::int32_t height, PictureF
             ShapeOf(width, form).RowBytes) {
   for (std::int32_t y = 0; y < height; ++y)
     Rows.push_back(World.Map.Row(form == PictureForm::Rows ? height - 1 - y : y));
-  for (std::int32_t y = 0; y < height; ++y)
-    for (std::int32_t x = 0; x < width; ++x) Set(x, y, {255, 255, 255});
+  for (std::int32_t x = 0; x < width; ++x) Set(x, 0, {255, 255, 255});
+  const std::size_t rowBytes = std::size_t(width) * std::size_t(World.Map.PixelBytes);
+  for (std::int32_t y = 1; y < height; ++y) std::memcpy(PixelAt(0, y), PixelAt(0, 0), rowBytes);
   if (form != PictureForm::Rows) return;
   Record.resize(zor::RowRecord::Size);
   Put(Record, zor::RowRecord::Width, width);
@@ -158,14 +159,25 @@ void Draw(PicturePayload& target, PicturePayload& source, const Drawing& d) {
   const auto endOf = [](std::int32_t at, std::int32_t count, std::int32_t size) {
     return std::min<std::int64_t>(count, std::int64_t{size} - at);
   };
-  for (std::int64_t j = firstOf(d.Y); j < endOf(d.Y, d.Height, to.Height); ++j)
-    for (std::int64_t i = firstOf(d.X); i < endOf(d.X, d.Width, to.Width); ++i) {
-      const std::int64_t x = Nearest(i, d.Width, d.SourceX, sourceWidth, from.Width);
-      const std::int64_t y = Nearest(j, d.Height, d.SourceY, sourceHeight, from.Height);
-      if (x >= 0 && y >= 0)
+  const std::int64_t firstColumn = firstOf(d.X), endColumn = endOf(d.X, d.Width, to.Width);
+  for (std::int64_t j = firstOf(d.Y); j < endOf(d.Y, d.Height, to.Height); ++j) {
+    const std::int64_t y = Nearest(j, d.Height, d.SourceY, sourceHeight, from.Height);
+    if (y < 0) continue;
+    if (to.Depth == from.Depth && d.Width == sourceWidth) {
+      // Not scaled along the row: a run of pixels.
+      const std::int64_t first = std::max<std::int64_t>(firstColumn, -std::int64_t{d.SourceX});
+      const std::int64_t count = std::min(endColumn, std::int64_t{from.Width} - d.SourceX) - first;
+      if (count > 0)
+        std::memmove(target.PixelAt(std::int32_t(d.X + first), std::int32_t(d.Y + j)),
+                     source.PixelAt(std::int32_t(d.SourceX + first), std::int32_t(y)),
+                     std::size_t(count * to.PixelBytes));
+      continue;
+    }
+    for (std::int64_t i = firstColumn; i < endColumn; ++i)
+      if (const std::int64_t x = Nearest(i, d.Width, d.SourceX, sourceWidth, from.Width); x >= 0)
         target.Set(std::int32_t(d.X + i), std::int32_t(d.Y + j),
                    source.Get(std::int32_t(x), std::int32_t(y)));
-    }
+  }
 }
 
 void* NewPicture(std::int32_t width, std::int32_t height, PictureForm form) {

@@ -2,6 +2,7 @@
 
 #include "exchange/exchange.h"
 #include "exchange/host_drawing.h"
+#include "exchange/masked_rows.h"
 #include "exchange/picture_lock.h"
 #include "image/clip.h"
 #include "image/conversion.h"
@@ -58,58 +59,6 @@ void DrawPictureRGB(PictureData& image, HostPicture* pic, const Block& block) {
   MayYield(image);
 }
 
-/// One row of a picture and its mask, each as red, green and blue, into the image's red, green and blue, and
-/// alpha where `Step` writes it.
-using MaskedRow = void (*)(const Sample* from, const PlaneList& in, const Sample* mask,
-                           const PlaneList& inMask, Sample* into, const PlaneList& out, std::int32_t width);
-
-/// What becomes of a pixel: from the picture, the mask and what stands there.
-template <bool Invert>
-struct TakeMaskAsAlpha {
-  static constexpr int Planes = 4;
-  static Colour<4> Of(const Colour<4>&, const Colour<3>& c, const Colour<3>& mask) {
-    return {c.Of[0], c.Of[1], c.Of[2], Sample(Invert ? 255 - mask.Of[0] : mask.Of[0])};
-  }
-};
-
-/// Each colour by its own sample of the mask: white keeps the image, black takes the picture; or the other
-/// way round.
-template <bool Invert>
-struct BlendByMask {
-  static constexpr int Planes = 3;
-  static Colour<3> Of(const Colour<3>& there, const Colour<3>& c, const Colour<3>& mask) {
-    Colour<3> result;
-    for (int i = 0; i < 3; ++i) {
-      const int keep = Invert ? 255 - mask.Of[i] : mask.Of[i];
-      result.Of[i] = Sample((there.Of[i] * keep + c.Of[i] * (255 - keep)) / 255);
-    }
-    return result;
-  }
-};
-
-struct TakeColours {
-  static constexpr int Planes = 3;
-  static Colour<3> Of(const Colour<3>&, const Colour<3>& c, const Colour<3>&) { return c; }
-};
-
-template <int N>
-Colour<N> ReadPixel(const PlaneRow<N>& row, std::ptrdiff_t x) {
-  Colour<N> colour;
-  for (int c = 0; c < N; ++c) colour.Of[c] = row(c, x);
-  return colour;
-}
-
-template <class Step>
-void DrawRow(const Sample* from, const PlaneList& in, const Sample* mask, const PlaneList& inMask,
-             Sample* into, const PlaneList& out, std::int32_t width) {
-  const PlaneRow<3> colours(const_cast<Sample*>(from), in), masks(const_cast<Sample*>(mask), inMask);
-  const PlaneRow<Step::Planes> dest(into, out);
-  for (std::ptrdiff_t x = 0; x < width; ++x) {
-    const auto result = Step::Of(ReadPixel(dest, x), ReadPixel(colours, x), ReadPixel(masks, x));
-    for (int c = 0; c < Step::Planes; ++c) dest(c, x) = result.Of[c];
-  }
-}
-
 /// Red, green, blue and the place of alpha: the alpha plane, or the byte in front of the colours that a
 /// format without alpha leaves free there. Three planes where there is neither.
 PlaneList PlanesWithAlpha(const PictureData& image) {
@@ -125,7 +74,7 @@ PlaneList PlanesWithAlpha(const PictureData& image) {
 constexpr Sample White = 255;
 
 void DrawThroughMask(PictureData& image, HostPictureLock& lock, HostPictureLock* maskLock, const Block& block,
-                     PlaneList into, MaskedRow draw) {
+                     PlaneList into, MaskUse use) {
   const Block part = CopyRect(image, lock.Width, lock.Height, block);
   const Rectangle& dest = part.Dest;
   // The mask is taken to be as large as the picture; one that is narrower can't be read.
@@ -136,21 +85,22 @@ void DrawThroughMask(PictureData& image, HostPictureLock& lock, HostPictureLock*
   for (int c = 0; c < into.Count; ++c) into.Offset[c] += dest.X * into.Step;
   SkipRows(lock, part.SourceY);
   if (maskLock) SkipRows(*maskLock, part.SourceY);
+  const MaskedRows draw(use, from, fromMask, into, dest.Width);
   Walk(Yielding(Into(image, dest.Y))).Rows(dest.Height, [&](std::int32_t, Sample* row) {
-    draw(lock.CurrentRow, from, maskLock ? maskLock->CurrentRow : &White, fromMask, row, into, dest.Width);
+    draw(lock.CurrentRow, maskLock ? maskLock->CurrentRow : &White, row);
     AdvanceLockRow(lock);
     if (maskLock) AdvanceLockRow(*maskLock);
   });
 }
 
 void DrawThroughMask(PictureData& image, HostPicture* pic, HostPicture* mask, const Block& block,
-                     const PlaneList& into, MaskedRow draw) {
+                     const PlaneList& into, MaskUse use) {
   if (!Usable(image)) return;
   MayYield(image);
   {
     HostPictureLock lock, maskLock;
     if (LockPictureForReading(lock, pic) && (!mask || LockPictureForReading(maskLock, mask)))
-      DrawThroughMask(image, lock, mask ? &maskLock : nullptr, block, into, draw);
+      DrawThroughMask(image, lock, mask ? &maskLock : nullptr, block, into, use);
   }
   MayYield(image);
 }
@@ -161,11 +111,7 @@ HeldPicture MaskOf(HostPicture* pic) { return HeldPicture(pic ? REALGetPictureMa
 void DrawMaskedPictureRGB(PictureData& image, HostPicture* pic, const Block& block, Boolean invertMask) {
   if (!HasColours(image)) return;
   const HeldPicture mask = MaskOf(pic);
-  const PlaneList into = PlanesWithAlpha(image);
-  const MaskedRow draw = into.Count == 3 ? DrawRow<TakeColours>
-                         : invertMask    ? DrawRow<TakeMaskAsAlpha<true>>
-                                         : DrawRow<TakeMaskAsAlpha<false>>;
-  DrawThroughMask(image, pic, mask.get(), block, into, draw);
+  DrawThroughMask(image, pic, mask.get(), block, PlanesWithAlpha(image), {MaskUse::Alpha, invertMask != 0});
 }
 
 void DrawMaskedPictureApplyMaskRGB(PictureData& image, HostPicture* pic, const Block& block,
@@ -174,7 +120,7 @@ void DrawMaskedPictureApplyMaskRGB(PictureData& image, HostPicture* pic, const B
   const HeldPicture mask = MaskOf(pic);
   if (!mask) return DrawPictureRGB(image, pic, block);
   DrawThroughMask(image, pic, mask.get(), block, PlanesOf(Group::RGB, image),
-                  invertMask ? DrawRow<BlendByMask<true>> : DrawRow<BlendByMask<false>>);
+                  {MaskUse::Blend, invertMask != 0});
 }
 
 }

@@ -88,5 +88,19 @@ TEST(HostPixels, CanBeDrawnOntoThemselves) {
   });
 }
 
+TEST(HostPixels, CanBeBlendedOntoThemselves) {
+  for (const PictureForm form : {PictureForm::GWorld24, PictureForm::GWorld32})
+    InHost(form, [&] {
+      const HostPicture host = NoisePicture(40, 1, form, 3);
+      GiveMask(host, NoisePicture(40, 1, form, 4));
+      Samples expected = host.RGB();
+      const Samples mask = host.Mask().RGB();
+      for (std::size_t i = 3; i < expected.size(); ++i)
+        expected[i] = std::uint8_t((expected[i] * mask[i - 3] + expected[i - 3] * (255 - mask[i - 3])) / 255);
+      Picture(host).DrawMaskedPictureApplyMaskRGB(host, {1, 0, 39, 1}, 0, 0);
+      EXPECT_EQ(host.RGB(), expected);
+    });
+}
+
 }
 }
