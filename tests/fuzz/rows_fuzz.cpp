@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "fuzz/input.h"
+#include "picturezor/host_picture.h"
 #include "support/row_arguments.h"
 
 // An input is a program of small steps: pictures are made in all stores and formats, any row is called with
@@ -24,7 +25,7 @@ constexpr std::size_t MostPictures = 12, MostSteps = 200, BlockSize = 1 << 16;
 class Program {
  public:
   explicit Program(std::span<const std::uint8_t> bytes) : In(bytes) {
-    Block.Data()[0] = 1;
+    Shown[0].MakeMask();
     Host::OnYield([this] { Yielded(); });
   }
   ~Program() {
@@ -118,7 +119,7 @@ class Program {
     return PictureFactory([=, this](std::int32_t width, std::int32_t height, Format format) -> Picture {
       if (way == 2) throw std::invalid_argument("no picture");
       if (way == 3) return Pictures.empty() ? Picture() : Pictures[place % Pictures.size()];
-      if (std::int64_t{width} * height > MostPixels) return {};
+      if (width < 1 || height < 1 || std::int64_t{width} * height > MostPixels) return {};
       return way == 4 ? Picture(width + 3, height + 1, Format::RGBA) : Picture(width, height, format);
     });
   }
@@ -138,6 +139,7 @@ class Program {
     if (type == "double") return {.Real = In.Real()};
     if (type == "picturezor") return {.Address = Any().Address()};
     if (In.Between(0, 9) == 0) return {};
+    if (type == "picture") return {.Address = Shown[std::size_t(In.Between(0, 2))].Address()};
     if (type == "memoryblock") return {.Address = Block.Address()};
     if (type == "string") return {.Address = Text};
     if (type == "folderitem") return {.Address = Folder.Address()};
@@ -192,6 +194,8 @@ class Program {
   const TemporaryFile Files[4];
   std::vector<Picture> Pictures;
   const MemoryBlock Block{BlockSize};
+  const std::vector<HostPicture> Shown = {HostPicture(30, 20), HostPicture(9, 40, PictureForm::GWorld32),
+                                          HostPicture(1, 1)};
   const FolderItem Folder{Files[0].Path()};
   const std::vector<IntegerArray> Arrays = {IntegerArray(std::vector<std::int32_t>(256, 200)),
                                             IntegerArray({1, -2, 2147483647, 4, 5, 6, 7, 8, 9}),

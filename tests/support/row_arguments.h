@@ -1,5 +1,6 @@
 #pragma once
 #include "host_strings.h"
+#include "picturezor/host_picture.h"
 #include "picturezor/picture.h"
 #include "support/every_store.h"
 #include "support/row_call.h"
@@ -31,6 +32,7 @@ class RowArguments {
  private:
   StoredPicture First, Second;
   std::vector<Picture> Odd;
+  HostPicture Shown, Dot;
   MemoryBlock Block, EmptyBlock;
   IntegerArray Numbers, NoNumbers, FewNumbers, ExtremeNumbers;
   TemporaryFile Path;

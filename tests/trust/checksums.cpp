@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "host_strings.h"
+#include "picturezor/host_picture.h"
 #include "support/every_store.h"
 #include "support/every_target.h"
 #include "support/row_call.h"
@@ -44,6 +45,13 @@ class Checksum {
     }
   }
   void Add(const std::string& text) { Add(text.data(), text.size()); }
+  void Add(const HostPicture& picture) {
+    Add(picture ? 1 : 0);
+    if (!picture) return;
+    const Bytes pixels = picture.RGB();
+    Add(pixels.data(), pixels.size());
+    Add(picture.Mask());
+  }
   void Add(const Picture& picture) {
     Add(picture ? 1 : 0);
     if (!picture || !picture.Valid()) return;
@@ -63,6 +71,12 @@ class Checksum {
 Picture Filled(int width, int height, Format format, Noise& noise) {
   const Picture picture(width, height, format);
   for (int y = 0; y < height; ++y) picture.SetRow(y, noise.Many(std::size_t(picture.RowSize())));
+  return picture;
+}
+
+HostPicture Shown(int width, int height, Noise& noise) {
+  const HostPicture picture(width, height);
+  picture.SetRGB(noise.Many(std::size_t(width * height * 3)));
   return picture;
 }
 
@@ -134,6 +148,11 @@ void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, i
       for (std::int32_t& number : numbers) number = noise.Between(-99, 300);
       others.push_back(IntegerArray(numbers));
       value.Address = others.back().Address();
+    } else if (parameter.Type == "picture") {
+      const HostPicture shown = Shown(width, height, noise);
+      if (variant % 3) shown.MakeMask().SetRGB(noise.Many(std::size_t(width * height * 3)));
+      others.push_back(shown);
+      value.Address = shown.Address();
     } else if (parameter.Type == "memoryblock") {
       others.push_back(MemoryBlock(noise.Many(1 << 14)));
       value.Address = others.back().Address();
@@ -155,6 +174,14 @@ void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, i
   } else if (type == "string") {
     if (const auto* text = static_cast<model::StringRecord*>(outcome.Result.Address)) sum.Add(text->Bytes);
     GiveBack(type, outcome.Result);
+  } else if (type == "picture") {
+    sum.Add(HostPicture(Object::Adopt(outcome.Result.Address)));
+  } else if (type == "variant") {
+    const GWorld world(Object::Adopt(outcome.Result.Address));
+    for (int y = 0; world && y < world.Height(); ++y) {
+      const Bytes bytes = world.Row(y);
+      sum.Add(bytes.data(), bytes.size());
+    }
   } else if (type == "memoryblock") {
     const MemoryBlock block(Object::Adopt(outcome.Result.Address));
     sum.Add(block.Data().data(), block.Data().size());
