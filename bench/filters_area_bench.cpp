@@ -1,0 +1,120 @@
+#include "race.h"
+
+#ifdef PICTUREZOR_OPENCV
+#include <opencv2/imgproc.hpp>
+#endif
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+#include <magick/api.h>
+#endif
+
+// Filters that look at the surroundings of a pixel; RGB, one thread each.
+
+namespace picturezor::bench {
+namespace {
+
+Contender Ours(const std::function<void(const Picture& source, const Picture& dest)>& filter) {
+  return {"PictureZOR", [=] {
+            return [filter, source = TestPicture(Format::RGB), dest = Picture(Width, Height, Format::RGB)] {
+              filter(source, dest);
+            };
+          }};
+}
+
+void Race(const std::string& work, std::vector<Contender> contenders) {
+  contenders.push_back(Memcpy(BytesOf(3)));
+  AddRace("filters", work, std::move(contenders));
+}
+
+#ifdef PICTUREZOR_OPENCV
+Contender OpenCV(const std::function<void(const cv::Mat& source, cv::Mat& dest)>& filter) {
+  NamePeer("OpenCV", CV_VERSION);
+  return {"OpenCV", [=] {
+            cv::setNumThreads(1);
+            const Picture picture = TestPicture(Format::RGB);
+            cv::Mat source(Height, Width, CV_8UC3);
+            for (int y = 0; y < Height; ++y) std::copy_n(picture.Row(y).begin(), Width * 3, source.ptr(y));
+            return
+                [filter, source, dest = cv::Mat(Height, Width, CV_8UC3)]() mutable { filter(source, dest); };
+          }};
+}
+#endif
+
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+/// A call that makes a new image, as `gm` does it.
+Contender GraphicsMagick(const std::function<Image*(const Image* source, ExceptionInfo* exception)>& filter) {
+  NamePeer("GraphicsMagick", MagickLibVersionText);
+  return {"GraphicsMagick", [=] {
+            InitializeMagick(nullptr);
+            SetMagickResourceLimit(ThreadsResource, 1);
+            const Bytes pixels = TestPicture(Format::RGB).DataStringInFormat(Format::RGB);
+            ExceptionInfo exception;
+            GetExceptionInfo(&exception);
+            const std::shared_ptr<Image> source(
+                ConstituteImage(Width, Height, "RGB", CharPixel, pixels.data(), &exception), DestroyImage);
+            return [filter, source] {
+              ExceptionInfo failure;
+              GetExceptionInfo(&failure);
+              DestroyImage(filter(source.get(), &failure));
+              DestroyExceptionInfo(&failure);
+            };
+          }};
+}
+#endif
+
+void RaceBlur(int radius) {
+  Race("box blur, radius " + std::to_string(radius),
+       {Ours([=](const Picture& source, const Picture& dest) { source.BoxBlurFilter(dest, radius); }),
+#ifdef PICTUREZOR_OPENCV
+        OpenCV([=](const cv::Mat& source, cv::Mat& dest) {
+          cv::blur(source, dest, cv::Size(2 * radius + 1, 2 * radius + 1), cv::Point(-1, -1),
+                   cv::BORDER_REPLICATE);
+        })
+#endif
+       });
+}
+
+void RaceMatrix(const std::string& name, int dimension, const std::vector<std::int32_t>& weights,
+                double scale) {
+  Race(name, {Ours([=](const Picture& source, const Picture& dest) {
+                source.ApplyMatrix(dest, dimension, IntegerArray(weights), 0, scale);
+              }),
+#ifdef PICTUREZOR_OPENCV
+              OpenCV([=](const cv::Mat& source, cv::Mat& dest) {
+                cv::Mat kernel(dimension, dimension, CV_32F);
+                for (std::size_t i = 0; i < weights.size(); ++i)
+                  kernel.ptr<float>()[i] = float(weights[i] * scale);
+                cv::filter2D(source, dest, -1, kernel, cv::Point(-1, -1), 0, cv::BORDER_REPLICATE);
+              })
+#endif
+             });
+}
+
+void RaceOil(int levels, int range) {
+  Race("oil, range " + std::to_string(range) + ", " + std::to_string(levels) + " levels",
+       {Ours([=](const Picture& source, const Picture& dest) { source.OilFilter(dest, levels, range); }),
+#ifdef PICTUREZOR_GRAPHICSMAGICK
+        GraphicsMagick([=](const Image* source, ExceptionInfo* exception) {
+          return OilPaintImage(source, range, exception);
+        })
+#endif
+       });
+}
+
+const auto registered = [] {
+  for (const int radius : {3, 10, 50}) RaceBlur(radius);
+  RaceMatrix("matrix 3 x 3, sharpen", 3, {-1, -2, -1, -2, 13, -2, -1, -2, -1}, 1.0);
+  RaceMatrix("matrix 3 x 3, mean", 3, std::vector<std::int32_t>(9, 1), 1.0 / 9);
+  RaceMatrix("matrix 5 x 5, Gauss", 5,
+             {1, 4, 7, 4, 1, 4, 16, 26, 16, 4, 7, 26, 41, 26, 7, 4, 16, 26, 16, 4, 1, 4, 7, 4, 1}, 1.0 / 273);
+  for (const int levels : {20, 256}) RaceOil(levels, 3);
+  Race("fractional blur",
+       {Ours([](const Picture& source, const Picture& dest) { source.BoxBlurFractionalFilter(dest, 0.5); })});
+  Race("engrave", {Ours([](const Picture& source, const Picture& dest) { source.EngraveFilter(dest, 1); })});
+  Race("neon", {Ours([](const Picture& source, const Picture& dest) { source.NeonFilter(dest); })});
+  Race("diffuse, level 3",
+       {Ours([](const Picture& source, const Picture& dest) { source.DiffuseFilter(dest, 3); })});
+  return true;
+}();
+
+}
+}
