@@ -127,32 +127,63 @@ void MeansAlong(const Sample* row, Sample* out, std::ptrdiff_t width, std::ptrdi
     }
 }
 
+/// The same for rows that r doesn't reach beyond, in vectors: the sum of a stretch is the difference between
+/// two of the sums of all samples up to a place, even where those have run over. Such a sum is the one 32
+/// pixels before and four sums of eight, so no step waits for the one before, and vectors are loaded as they
+/// were stored. Where the row begins, r pixels
+/// to the left, 32 pixels before it are zero, and so are those before `eights` and `sums`.
+template <class Sum, int N>
+void MeansByDifference(const Sample* begin, Sample* out, Sum* eights, Sum* sums, std::ptrdiff_t width,
+                       std::ptrdiff_t r, BoxMean<Sum> mean) {
+  for (std::ptrdiff_t i = 0; i < (width + 2 * r) * N; ++i)
+    eights[i] = Sum(begin[i] + begin[i - N] + begin[i - 2 * N] + begin[i - 3 * N] + begin[i - 4 * N] +
+                    begin[i - 5 * N] + begin[i - 6 * N] + begin[i - 7 * N]);
+  for (std::ptrdiff_t i = 0; i < (width + 2 * r) * N; ++i)
+    sums[i] = Sum(sums[i - 32 * N] + eights[i] + eights[i - 8 * N] + eights[i - 16 * N] + eights[i - 24 * N]);
+  const Sum* const last = sums + 2 * r * N;
+  for (std::ptrdiff_t i = 0; i < width * N; ++i) out[i] = mean(Sum(last[i] - sums[i - N] + mean.Bias));
+}
+
 /// A row with room for its repeated ends.
+template <class Sum>
 class ExtendedRow {
  public:
   ExtendedRow(std::int32_t width, int planes, std::int64_t r)
       : Width(width),
         Reach(std::ptrdiff_t(std::min<std::int64_t>(width, r))),
+        Radius(r),
         Pixel(planes),
-        Memory(NewBuffer(std::size_t(Width + 2 * Reach + 1) * std::size_t(planes))) {}
-  explicit operator bool() const { return Memory != nullptr; }
+        Memory(NewBuffer(Samples())),
+        Eights(NewBuffer(Samples() * sizeof(Sum))),
+        Sums(NewBuffer(Samples() * sizeof(Sum))) {}
+  explicit operator bool() const { return Memory && Eights && Sums; }
 
-  Sample* Row() const { return Memory.get() + Reach * Pixel; }
+  Sample* Row() const { return Memory.get() + (Before + Reach) * Pixel; }
 
-  template <class Sum>
-  void Means(Sample* out, std::int64_t r, const BoxMean<Sum>& mean) const {
+  void Means(Sample* out, const BoxMean<Sum>& mean) const {
     Sample *first = Row(), *end = first + Width * Pixel;
     for (std::ptrdiff_t i = 1; i <= Reach; ++i) std::copy_n(first, Pixel, first - i * Pixel);
     for (std::ptrdiff_t i = 0; i <= Reach; ++i) std::copy_n(end - Pixel, Pixel, end + i * Pixel);
     ForPlaneCount(Pixel, [&](auto n) {
-      OnBestTarget<MeansAlong<Sum, n>>(static_cast<const Sample*>(first), out, Width, Reach, r, mean);
+      if constexpr (sizeof(Sum) <= 4)
+        if (Reach == Radius)
+          return OnBestTarget<MeansByDifference<Sum, n>>(
+              static_cast<const Sample*>(Memory.get() + Before * n), out, At(Eights), At(Sums), Width, Reach,
+              mean);
+      OnBestTarget<MeansAlong<Sum, n>>(static_cast<const Sample*>(first), out, Width, Reach, Radius, mean);
     });
   }
 
  private:
+  static constexpr std::ptrdiff_t Before = 32;
+
+  std::size_t Samples() const { return std::size_t(Before + Width + 2 * Reach + 1) * std::size_t(Pixel); }
+  Sum* At(const Buffer& buffer) const { return reinterpret_cast<Sum*>(buffer.get()) + Before * Pixel; }
+
   std::ptrdiff_t Width, Reach;
+  std::int64_t Radius;
   int Pixel;
-  Buffer Memory;
+  Buffer Memory, Eights, Sums;
 };
 
 template <class Sum>
@@ -162,7 +193,7 @@ void Blur(const FilterCall& call, std::int64_t r, bool vertical, bool horizontal
   const std::int32_t height = call.Source.Height;
   SourceRows source(call, packing);
   ColumnSums<Sum> columns(packing.Samples(), height, r, mean);
-  const ExtendedRow line(call.Source.Width, packing.Count(), horizontal ? r : 0);
+  const ExtendedRow<Sum> line(call.Source.Width, packing.Count(), horizontal ? r : 0);
   const Buffer result = NewBuffer(std::size_t(packing.Samples()));
   bool reached = source && columns && line && result;
   for (std::int32_t y = 0; reached && y < height; ++y) {
@@ -171,7 +202,7 @@ void Blur(const FilterCall& call, std::int64_t r, bool vertical, bool horizontal
     });
     reached = reached && WithRow(call.Dest, y, [&](Sample* row) {
                 if (horizontal)
-                  packing.Write(row, result.get(), [&](Sample* out) { line.Means(out, r, mean); });
+                  packing.Write(row, result.get(), [&](Sample* out) { line.Means(out, mean); });
                 else
                   packing.Store(line.Row(), row);
               });
