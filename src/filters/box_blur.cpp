@@ -130,8 +130,8 @@ void MeansAlong(const Sample* row, Sample* out, std::ptrdiff_t width, std::ptrdi
 /// The same for rows that r doesn't reach beyond, in vectors: the sum of a stretch is the difference between
 /// two of the sums of all samples up to a place, even where those have run over. Such a sum is the one 32
 /// pixels before and four sums of eight, so no step waits for the one before, and vectors are loaded as they
-/// were stored. Where the row begins, r pixels
-/// to the left, 32 pixels before it are zero, and so are those before `eights` and `sums`.
+/// were stored. 32 pixels before `begin`, where the row extended by r pixels begins, are zero, and so are
+/// those before `eights` and `sums`.
 template <class Sum, int N>
 void MeansByDifference(const Sample* begin, Sample* out, Sum* eights, Sum* sums, std::ptrdiff_t width,
                        std::ptrdiff_t r, BoxMean<Sum> mean) {

@@ -1,4 +1,6 @@
+#include <cmath>
 #include <cstdlib>
+#include <limits>
 #include <type_traits>
 
 #include "filters/filters.h"
@@ -37,9 +39,10 @@ Matrix MatrixOf(std::int32_t dimension, IntegerArray* array, std::int32_t delta,
   return matrix;
 }
 
+Sample Scaled(double product) { return Clamp(Truncate(product)); }
 Sample Scaled(std::int64_t sum, double scaleFactor) {
   return scaleFactor == 1.0 ? Sample(std::clamp<std::int64_t>(sum, 0, 255))
-                            : Clamp(Truncate(double(sum) * scaleFactor));
+                            : Scaled(double(sum) * scaleFactor);
 }
 
 /// As many weights as are summed up at a time, each with the samples that it goes to.
@@ -50,13 +53,14 @@ struct Taps {
   Sum Weight[TapsAtATime];
 };
 
-template <class Sum>
+/// A Product holds the products of all these together.
+template <class Sum, class Product>
 void AddTaps(Sum* sums, Taps<Sum> taps, std::ptrdiff_t count) {
-  using Wrapping = std::conditional_t<sizeof(Sum) == 8, std::uint64_t, std::uint32_t>;
+  using Wrapping = std::conditional_t<sizeof(Product) == 8, std::uint64_t, std::uint32_t>;
   for (std::ptrdiff_t i = 0; i < count; ++i) {
-    Wrapping sum = Wrapping(sums[i]);
+    Wrapping sum = 0;
     for (int t = 0; t < TapsAtATime; ++t) sum += Wrapping(taps.Weight[t]) * taps.From[t][i];
-    sums[i] = Sum(sum);
+    sums[i] = Sum(sums[i] + Product(sum));
   }
 }
 
@@ -64,17 +68,40 @@ template <class Sum>
 void ClampSums(const Sum* sums, Sample* out, std::ptrdiff_t count) {
   for (std::ptrdiff_t i = 0; i < count; ++i) out[i] = Sample(std::clamp<Sum>(sums[i], 0, 255));
 }
-template <class Sum>
-void ScaleSums(const Sum* sums, Sample* out, std::ptrdiff_t count, double scaleFactor) {
+template <class Sum, class Real>
+void ScaleSums(const Sum* sums, Sample* out, std::ptrdiff_t count, Real scaleFactor) {
   for (std::ptrdiff_t i = 0; i < count; ++i) {
-    const double scaled = double(sums[i]) * scaleFactor;
+    const Real scaled = Real(sums[i]) * scaleFactor;
     // As Truncate and Clamp do it; what isn't a number is 0.
     out[i] = scaled > 0 ? Sample(std::int32_t(scaled < 255 ? scaled : 255)) : Sample{0};
   }
 }
 
+/// A factor in single precision that gives the same samples for all sums up to the bound; 0 when none is
+/// found. Either way samples never fall as sums grow, so they agree if each of them begins at the same sum.
+float SingleFactor(double scaleFactor, std::int64_t bound) {
+  if (!(scaleFactor > 1e-6 && scaleFactor < 1e6) || bound >= 1 << 24) return 0;
+  const auto agrees = [&](float factor) {
+    for (int sample = 1; sample < 256; ++sample) {
+      std::int64_t below = 0, from = bound + 1;
+      while (from - below > 1) {
+        const std::int64_t middle = (below + from) / 2;
+        (Scaled(double(middle) * scaleFactor) >= sample ? from : below) = middle;
+      }
+      if (Scaled(double(float(below) * factor)) >= sample) return false;
+      if (from > bound) return true;
+      if (Scaled(double(float(from) * factor)) < sample) return false;
+    }
+    return true;
+  };
+  const float nearest = float(scaleFactor);
+  for (const float factor : {nearest, std::nextafter(nearest, 2 * nearest)})
+    if (agrees(factor)) return factor;
+  return 0;
+}
+
 /// Sums of a type that holds them, a stretch of the row at a time. False without memory, and nothing is done.
-template <class Sum>
+template <class Sum, class Product>
 bool ConvolveRows(const FilterCall& call, const Matrix& matrix) {
   constexpr std::ptrdiff_t Stretch = 2048;
   const PackedRows packing(call);
@@ -82,26 +109,31 @@ bool ConvolveRows(const FilterCall& call, const Matrix& matrix) {
   PackedBand band(call.Source, packing, half, std::max(dimension - 1 - half, 0), half);
   const Buffer result = NewBuffer(std::size_t(packing.Samples()));
   if (!band || !result) return false;
+  const float single = SingleFactor(matrix.ScaleFactor, matrix.Bound());
   alignas(64) Sum sums[Stretch];
   const auto convolve = [&](std::int32_t y, std::ptrdiff_t first, std::ptrdiff_t count) {
     std::fill_n(sums, count, Sum(matrix.Delta));
     Taps<Sum> taps;
     int some = 0;
+    std::int64_t together = 0;
     const auto add = [&] {
       for (; some % TapsAtATime; ++some) {
         taps.From[some] = taps.From[0];
         taps.Weight[some] = 0;
       }
-      if (some) OnBestTarget<AddTaps<Sum>>(static_cast<Sum*>(sums), taps, count);
+      if (some) OnBestTarget<AddTaps<Sum, Product>>(static_cast<Sum*>(sums), taps, count);
       some = 0;
+      together = 0;
     };
     for (std::int32_t j = 0; j < dimension; ++j)
       for (std::int32_t i = 0; i < dimension; ++i) {
         const std::int32_t weight = matrix.Weight[j * dimension + i];
         if (weight == 0) continue;
+        const std::int64_t most = 255 * std::abs(std::int64_t{weight});
+        if (some == TapsAtATime || together + most > std::numeric_limits<Product>::max()) add();
+        together += most;
         taps.From[some] = band[y - half + j] + first + std::ptrdiff_t{i - half} * pixel;
         taps.Weight[some++] = Sum(weight);
-        if (some == TapsAtATime) add();
       }
     add();
   };
@@ -114,9 +146,12 @@ bool ConvolveRows(const FilterCall& call, const Matrix& matrix) {
                     convolve(y, first, count);
                     if (matrix.ScaleFactor == 1.0)
                       OnBestTarget<ClampSums<Sum>>(static_cast<const Sum*>(sums), out + first, count);
+                    else if (single > 0)
+                      OnBestTarget<ScaleSums<Sum, float>>(static_cast<const Sum*>(sums), out + first, count,
+                                                          single);
                     else
-                      OnBestTarget<ScaleSums<Sum>>(static_cast<const Sum*>(sums), out + first, count,
-                                                   matrix.ScaleFactor);
+                      OnBestTarget<ScaleSums<Sum, double>>(static_cast<const Sum*>(sums), out + first, count,
+                                                           matrix.ScaleFactor);
                   }
                 });
               });
@@ -150,11 +185,19 @@ void ConvolvePixels(const FilterCall& call, const Matrix& matrix) {
 }
 
 bool Convolve(const FilterCall& call, const Matrix& matrix) {
+  using std::int16_t, std::int32_t, std::int64_t;
+  constexpr std::int64_t narrow = std::numeric_limits<int16_t>::max(),
+                         middle = std::numeric_limits<int32_t>::max();
   const std::int64_t bound = matrix.Bound();
+  const bool narrowProducts =
+      std::all_of(std::begin(matrix.Weight), std::end(matrix.Weight),
+                  [&](std::int32_t weight) { return 255 * std::abs(std::int64_t{weight}) <= narrow; });
   if (call.SharesPixels) return false;
-  if (bound <= std::numeric_limits<std::int16_t>::max()) return ConvolveRows<std::int16_t>(call, matrix);
-  if (bound <= std::numeric_limits<std::int32_t>::max()) return ConvolveRows<std::int32_t>(call, matrix);
-  return ConvolveRows<std::int64_t>(call, matrix);
+  if (bound <= narrow) return ConvolveRows<int16_t, int16_t>(call, matrix);
+  if (bound <= middle)
+    return narrowProducts ? ConvolveRows<int32_t, int16_t>(call, matrix)
+                          : ConvolveRows<int32_t, int32_t>(call, matrix);
+  return ConvolveRows<int64_t, int64_t>(call, matrix);
 }
 
 }

@@ -103,6 +103,20 @@ TEST(ApplyMatrix, WorksOutByHand) {
         << testing::PrintToString(weights) << scale;
 }
 
+// Every sum up to 1279 by itself. Catches a factor that is rounded before it is used.
+TEST(ApplyMatrix, TruncatesWhatTheFactorGives) {
+  const Picture picture(256, 1, Format::G);
+  Samples ramp(256);
+  for (int x = 0; x < 256; ++x) ramp[std::size_t(x)] = std::uint8_t(x);
+  SetPacked(picture, ramp);
+  for (const double scale : {1.0 / 3, 1.0 / 9, 0.1, 0.7, 1.0 / 273, 0.999999999, 3.3, 1e-9})
+    for (int delta = 0; delta < 1280; delta += 256) {
+      const Samples out = Packed(picture.ApplyMatrix({}, 1, IntegerArray({1}), delta, scale));
+      for (int x = 0; x < 256; ++x)
+        ASSERT_EQ(out[std::size_t(x)], std::min(int((x + delta) * scale), 255)) << scale << " " << x + delta;
+    }
+}
+
 TEST(ApplyMatrix, HasShortForms) {
   const Picture picture(1, 1, Format::G);
   SetPacked(picture, {100});
