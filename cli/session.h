@@ -84,6 +84,7 @@ void AddCrop(CLI::App& app, Session& session);
 void AddCombine(CLI::App& app, Session& session);
 void AddChannels(CLI::App& app, Session& session);
 void AddCompare(CLI::App& app, Session& session);
+void AddFilter(CLI::App& app, Session& session);
 void AddInfo(CLI::App& app, Session& session);
 void AddThumbnail(CLI::App& app, Session& session);
 void AddShow(CLI::App& app, Session& session);
