@@ -20,6 +20,7 @@ namespace {
 struct Race {
   std::string Room, Work;
   std::vector<std::string> Names;
+  double Pixels;
 };
 
 std::vector<Race>& Races() {
@@ -75,16 +76,16 @@ void PrintRoom(const std::string& room, Collector& times) {
       for (const std::string& name : race.Names)
         if (std::ranges::find(names, name) == names.end()) names.push_back(name);
   if (names.empty()) return;
-  std::printf("\n## %s\n\n| |", room.c_str());
+  std::printf("\n## %s\n\n| | ns a pixel |", room.c_str());
   for (const std::string& name : names) std::printf(" %s |", name.c_str());
-  std::printf("\n|---|");
+  std::printf("\n|---|--:|");
   for (std::size_t i = 0; i < names.size(); ++i) std::printf("--:|");
   std::printf("\n");
   for (const Race& race : Races()) {
     if (race.Room != room) continue;
     const double ours = times.Median(Key(room, race.Work, race.Names[0]));
     if (ours < 0) continue;
-    std::printf("| %s |", race.Work.c_str());
+    std::printf("| %s | %.3g |", race.Work.c_str(), ours * 1e6 / race.Pixels);
     for (const std::string& name : names) {
       const double time = times.Median(Key(room, race.Work, name));
       if (time < 0)
@@ -103,7 +104,9 @@ void PrintTables(Collector& times) {
   const char* between = " Peers: ";
   for (const auto& [name, version] : Peers())
     std::printf("%s%s %s", std::exchange(between, ", "), name.c_str(), version.c_str());
-  std::printf("\n\nMilliseconds, medians; in parentheses PictureZOR's time divided by the other's.\n");
+  std::printf(
+      "\n\nMilliseconds, medians; in parentheses PictureZOR's time divided by the other's. A pixel is one of "
+      "the result.\n");
   std::vector<std::string> rooms;
   for (const Race& race : Races())
     if (std::ranges::find(rooms, race.Room) == rooms.end()) rooms.push_back(race.Room);
@@ -113,8 +116,9 @@ void PrintTables(Collector& times) {
 
 }
 
-bool AddRace(const std::string& room, const std::string& work, std::vector<Contender> contenders) {
-  Race race{room, work, {}};
+bool AddRace(const std::string& room, const std::string& work, std::vector<Contender> contenders,
+             double pixels) {
+  Race race{room, work, {}, pixels};
   for (Contender& contender : contenders) {
     race.Names.push_back(contender.Name);
     const auto run = [prepare = std::move(contender.Prepare)](benchmark::State& state) {

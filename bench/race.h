@@ -7,6 +7,9 @@
 
 namespace picturezor::bench {
 
+/// 4000 x 3000, the size of most work here.
+inline constexpr int Width = 4000, Height = 3000;
+
 /// One of those who do the same work. `Prepare` makes what it works on; what that gives is timed, many times.
 struct Contender {
   std::string Name;
@@ -15,13 +18,12 @@ struct Contender {
 
 /// Lets contenders do one piece of work side by side. The first is ours; a copy of the same bytes by `memcpy`
 /// is a contender like the others. To be called before `main`: `const auto registered = AddRace(...)`.
-bool AddRace(const std::string& room, const std::string& work, std::vector<Contender> contenders);
+/// `pixels` is how many the work makes.
+bool AddRace(const std::string& room, const std::string& work, std::vector<Contender> contenders,
+             double pixels = double(Width) * Height);
 
 /// Tells which version of a peer is in the race.
 bool NamePeer(const std::string& name, const std::string& version);
-
-/// 4000 x 3000, the size of most work here.
-inline constexpr int Width = 4000, Height = 3000;
 
 /// A picture of soft shapes and some noise, every plane its own; the same each time.
 Picture TestPicture(Format format, int width = Width, int height = Height);

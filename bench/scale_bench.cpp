@@ -1,3 +1,5 @@
+#include <filesystem>
+
 #include "scale_peers.h"
 
 // Scaling, beside what a user would pick instead for the same work: antialiased, two passes, 8 bits.
@@ -8,10 +10,10 @@ namespace {
 constexpr Sizes AllSizes[] = {{"to a quarter", 4000, 3000, 1000, 750},
                               {"to three quarters", 4000, 3000, 3000, 2250},
                               {"up by 4", 1000, 750, 4000, 3000}};
-constexpr std::pair<const char*, Kernel> Kernels[] = {{"triangle", Kernel::Triangle},
-                                                      {"box", Kernel::Box},
-                                                      {"Lanczos 3", Kernel::Lanczos3},
-                                                      {"Lanczos 8", Kernel::Lanczos8}};
+constexpr std::pair<const char*, Kernel> Kernels[] = {
+    {"triangle", Kernel::Triangle},  {"box", Kernel::Box},           {"Lanczos 3", Kernel::Lanczos3},
+    {"Lanczos 8", Kernel::Lanczos8}, {"Mitchell", Kernel::Mitchell}, {"poly3", Kernel::Poly3},
+    {"cubic", Kernel::Cubic}};
 constexpr std::pair<const char*, Format> Formats[] = {
     {"RGB", Format::RGB}, {"RGBA", Format::RGBA}, {"gray", Format::G}};
 
@@ -25,6 +27,19 @@ Contender Ours(const char* name, Format format, Kernel kernel, const Sizes& size
           }};
 }
 
+/// The same with both pictures in mapped files.
+Contender Mapped(Kernel kernel, const Sizes& sizes) {
+  return {"PictureZOR, mapped", [=] {
+            const auto folder = std::filesystem::temp_directory_path();
+            const Picture source = Picture::Mapped(folder / "picturezor-bench-source", sizes.FromWidth,
+                                                   sizes.FromHeight, Format::RGB);
+            const Picture dest = Picture::Mapped(folder / "picturezor-bench-dest", sizes.IntoWidth,
+                                                 sizes.IntoHeight, Format::RGB);
+            source.CopyPixels(TestPicture(Format::RGB, sizes.FromWidth, sizes.FromHeight));
+            return [=] { dest.Scale(source, {}, kernel, sizes.IntoWidth, sizes.IntoHeight); };
+          }};
+}
+
 const auto registered = [] {
   for (const auto& [formatName, format] : Formats)
     for (const Sizes& sizes : AllSizes)
@@ -33,9 +48,10 @@ const auto registered = [] {
             Ours("PictureZOR", format, kernel, sizes, 1),
             Ours("PictureZOR, 2 threads", format, kernel, sizes, 2),
             Memcpy(std::size_t(sizes.FromWidth) * sizes.FromHeight * BytesPerPixel(format))};
+        if (format == Format::RGB && kernel == Kernel::Lanczos3) contenders.push_back(Mapped(kernel, sizes));
         for (Contender& peer : ScalePeers(format, kernel, sizes)) contenders.push_back(std::move(peer));
         AddRace("scale", std::string(formatName) + " " + sizes.Name + ", " + kernelName,
-                std::move(contenders));
+                std::move(contenders), double(sizes.IntoWidth) * sizes.IntoHeight);
       }
   return true;
 }();

@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <cstdlib>
+#include <map>
 #include <memory>
 #include <optional>
 #include <stdexcept>
@@ -41,65 +42,76 @@ using Prepared = std::function<void()>;
 
 #ifdef PICTUREZOR_ZIMG
 std::optional<Contender> Zimg(Format format, Kernel kernel, const Sizes& sizes) {
-  if (kernel == Kernel::Box) return {};
-  return Contender{
-      "zimg", [=] {
-        zimg_image_format from, into;
-        zimg_image_format_default(&from, ZIMG_API_VERSION);
-        from.width = unsigned(sizes.FromWidth);
-        from.height = unsigned(sizes.FromHeight);
-        from.pixel_type = ZIMG_PIXEL_BYTE;
-        from.pixel_range = ZIMG_RANGE_FULL;
-        into = from;
-        into.width = unsigned(sizes.IntoWidth);
-        into.height = unsigned(sizes.IntoHeight);
-        zimg_graph_builder_params parameters;
-        zimg_graph_builder_params_default(&parameters, ZIMG_API_VERSION);
-        parameters.resample_filter = kernel == Kernel::Triangle ? ZIMG_RESIZE_BILINEAR : ZIMG_RESIZE_LANCZOS;
-        parameters.filter_param_a = kernel == Kernel::Lanczos8 ? 8 : 3;
-        // Wide vectors too.
-        parameters.cpu_type = ZIMG_CPU_AUTO_64B;
-        const auto build = [=] {
-          const std::shared_ptr<zimg_filter_graph> graph(zimg_filter_graph_build(&from, &into, &parameters),
-                                                         zimg_filter_graph_free);
-          Require(bool(graph), "zimg");
-          return graph;
-        };
-        std::size_t scratch = 0;
-        zimg_filter_graph_get_tmp_size(build().get(), &scratch);
-        // Rows and planes aligned as it asks for.
-        const auto aligned = [](std::size_t bytes) {
-          return std::shared_ptr<std::uint8_t>(
-              static_cast<std::uint8_t*>(std::aligned_alloc(64, (bytes + 63) / 64 * 64)), std::free);
-        };
-        const std::ptrdiff_t fromStride = (sizes.FromWidth + 63) / 64 * 64,
-                             intoStride = (sizes.IntoWidth + 63) / 64 * 64;
-        const int channels = ChannelsOf(format);
-        const auto source = aligned(std::size_t(fromStride) * sizes.FromHeight * channels);
-        const auto dest = aligned(std::size_t(intoStride) * sizes.IntoHeight * channels);
-        const auto temporary = aligned(scratch);
-        const auto packed = PackedSource(format, sizes);
-        for (int c = 0; c < channels; ++c)
-          for (int y = 0; y < sizes.FromHeight; ++y)
-            for (int x = 0; x < sizes.FromWidth; ++x)
-              source.get()[(std::ptrdiff_t{c} * sizes.FromHeight + y) * fromStride + x] =
-                  (*packed)[(std::size_t(y) * sizes.FromWidth + x) * channels + c];
-        return Prepared([=] {
-          // As a user would: the weights are part of the work.
-          const auto graph = build();
-          for (int c = 0; c < channels; ++c) {
-            zimg_image_buffer_const in{ZIMG_API_VERSION, {}};
-            zimg_image_buffer out{ZIMG_API_VERSION, {}};
-            in.plane[0] = {source.get() + std::ptrdiff_t{c} * sizes.FromHeight * fromStride, fromStride,
-                           ZIMG_BUFFER_MAX};
-            out.plane[0] = {dest.get() + std::ptrdiff_t{c} * sizes.IntoHeight * intoStride, intoStride,
-                            ZIMG_BUFFER_MAX};
-            Require(zimg_filter_graph_process(graph.get(), &in, &out, temporary.get(), nullptr, nullptr,
-                                              nullptr, nullptr) == ZIMG_ERROR_SUCCESS,
-                    "zimg");
-          }
-        });
-      }};
+  struct Filter {
+    zimg_resample_filter_e Name;
+    double A, B;
+  };
+  static const std::map<Kernel, Filter> filters{{Kernel::Triangle, {ZIMG_RESIZE_BILINEAR, NAN, NAN}},
+                                                {Kernel::Lanczos3, {ZIMG_RESIZE_LANCZOS, 3, NAN}},
+                                                {Kernel::Lanczos8, {ZIMG_RESIZE_LANCZOS, 8, NAN}},
+                                                {Kernel::Mitchell, {ZIMG_RESIZE_BICUBIC, 1.0 / 3, 1.0 / 3}},
+                                                {Kernel::Poly3, {ZIMG_RESIZE_BICUBIC, 0, 0.75}}};
+  if (!filters.contains(kernel)) return {};
+  return Contender{"zimg", [=] {
+                     zimg_image_format from, into;
+                     zimg_image_format_default(&from, ZIMG_API_VERSION);
+                     from.width = unsigned(sizes.FromWidth);
+                     from.height = unsigned(sizes.FromHeight);
+                     from.pixel_type = ZIMG_PIXEL_BYTE;
+                     from.pixel_range = ZIMG_RANGE_FULL;
+                     into = from;
+                     into.width = unsigned(sizes.IntoWidth);
+                     into.height = unsigned(sizes.IntoHeight);
+                     zimg_graph_builder_params parameters;
+                     zimg_graph_builder_params_default(&parameters, ZIMG_API_VERSION);
+                     const Filter& filter = filters.at(kernel);
+                     parameters.resample_filter = filter.Name;
+                     parameters.filter_param_a = filter.A;
+                     parameters.filter_param_b = filter.B;
+                     // Wide vectors too.
+                     parameters.cpu_type = ZIMG_CPU_AUTO_64B;
+                     const auto build = [=] {
+                       const std::shared_ptr<zimg_filter_graph> graph(
+                           zimg_filter_graph_build(&from, &into, &parameters), zimg_filter_graph_free);
+                       Require(bool(graph), "zimg");
+                       return graph;
+                     };
+                     std::size_t scratch = 0;
+                     zimg_filter_graph_get_tmp_size(build().get(), &scratch);
+                     // Rows and planes aligned as it asks for.
+                     const auto aligned = [](std::size_t bytes) {
+                       return std::shared_ptr<std::uint8_t>(
+                           static_cast<std::uint8_t*>(std::aligned_alloc(64, (bytes + 63) / 64 * 64)),
+                           std::free);
+                     };
+                     const std::ptrdiff_t fromStride = (sizes.FromWidth + 63) / 64 * 64,
+                                          intoStride = (sizes.IntoWidth + 63) / 64 * 64;
+                     const int channels = ChannelsOf(format);
+                     const auto source = aligned(std::size_t(fromStride) * sizes.FromHeight * channels);
+                     const auto dest = aligned(std::size_t(intoStride) * sizes.IntoHeight * channels);
+                     const auto temporary = aligned(scratch);
+                     const auto packed = PackedSource(format, sizes);
+                     for (int c = 0; c < channels; ++c)
+                       for (int y = 0; y < sizes.FromHeight; ++y)
+                         for (int x = 0; x < sizes.FromWidth; ++x)
+                           source.get()[(std::ptrdiff_t{c} * sizes.FromHeight + y) * fromStride + x] =
+                               (*packed)[(std::size_t(y) * sizes.FromWidth + x) * channels + c];
+                     return Prepared([=] {
+                       // As a user would: the weights are part of the work.
+                       const auto graph = build();
+                       for (int c = 0; c < channels; ++c) {
+                         zimg_image_buffer_const in{ZIMG_API_VERSION, {}};
+                         zimg_image_buffer out{ZIMG_API_VERSION, {}};
+                         in.plane[0] = {source.get() + std::ptrdiff_t{c} * sizes.FromHeight * fromStride,
+                                        fromStride, ZIMG_BUFFER_MAX};
+                         out.plane[0] = {dest.get() + std::ptrdiff_t{c} * sizes.IntoHeight * intoStride,
+                                         intoStride, ZIMG_BUFFER_MAX};
+                         Require(zimg_filter_graph_process(graph.get(), &in, &out, temporary.get(), nullptr,
+                                                           nullptr, nullptr, nullptr) == ZIMG_ERROR_SUCCESS,
+                                 "zimg");
+                       }
+                     });
+                   }};
 }
 const bool zimgNamed = [] {
   unsigned major, minor, micro;
@@ -112,8 +124,7 @@ const bool zimgNamed = [] {
 std::optional<Contender> Vips(Format format, Kernel kernel, const Sizes& sizes) {
   const bool enlarges = sizes.IntoWidth > sizes.FromWidth;
   // Its kernels serve to reduce; it enlarges by interpolation, of which linear is the same work.
-  if (kernel == Kernel::Lanczos8 || kernel == Kernel::Box || (enlarges && kernel != Kernel::Triangle))
-    return {};
+  if (kernel != Kernel::Triangle && (kernel != Kernel::Lanczos3 || enlarges)) return {};
   return Contender{"libvips", [=] {
                      [[maybe_unused]] static const bool initialized = [] {
                        Require(VIPS_INIT("picturezor_bench") == 0, "libvips");
@@ -166,7 +177,7 @@ const bool openCVNamed = NamePeer("OpenCV", CV_VERSION);
 
 #ifdef PICTUREZOR_PILLOW
 std::optional<Contender> Pillow(Format format, Kernel kernel, const Sizes& sizes) {
-  if (kernel == Kernel::Lanczos8) return {};
+  if (kernel != Kernel::Triangle && kernel != Kernel::Box && kernel != Kernel::Lanczos3) return {};
   return Contender{"Pillow", [=] {
                      if (!Py_IsInitialized()) Py_InitializeEx(0);
                      const char* mode = format == Format::RGB ? "RGB" : format == Format::RGBA ? "RGBA" : "L";
@@ -208,7 +219,8 @@ const bool pillowNamed = [] {
 #ifdef PICTUREZOR_GRAPHICSMAGICK
 std::optional<Contender> GraphicsMagick(Format format, Kernel kernel, const Sizes& sizes) {
   // Tens of times slower than the others; one format tells as much as three.
-  if (kernel == Kernel::Lanczos8 || format != Format::RGB) return {};
+  if (format != Format::RGB) return {};
+  if (kernel != Kernel::Triangle && kernel != Kernel::Box && kernel != Kernel::Lanczos3) return {};
   return Contender{"GraphicsMagick", [=] {
                      [[maybe_unused]] static const bool initialized = [] {
                        InitializeMagick(nullptr);
