@@ -14,9 +14,9 @@ bool Multiple(float weight, std::int64_t& multiple) {
   multiple = 0;
   if (weight > 0.0F && weight < Disturbing) return true;
   const double units = double(weight) * LatticeUnit;
-  if (!(std::fabs(units) < 0x1p30) || units != std::floor(units)) return false;
+  if (!(std::fabs(units) < 0x1p30)) return false;
   multiple = std::int64_t(units);
-  return true;
+  return double(multiple) == units;
 }
 
 /// A line's shares, those above 0 and those below, and how far they lie above or below what they stand for;
@@ -93,7 +93,7 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
   for (std::int32_t i = 0; i < line.Count; ++i) {
     const double exact = double(line.Entries[i].Weight) / line.Sum * One;
     if (!(std::fabs(exact) < 127 * 65536.0)) return false;
-    shares[i] = std::int32_t(std::floor(exact + 0.5));
+    shares[i] = std::int32_t(exact < 0.0 ? exact - 0.5 : exact + 0.5);
     sizes.Add(shares[i], exact);
   }
   // The 3 cover the rounding of these bounds and of the plain form.
