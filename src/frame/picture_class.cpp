@@ -1,5 +1,6 @@
 #include <algorithm>
 
+#include "composition/composition.h"
 #include "exchange/exchange.h"
 #include "filters/filters.h"
 #include "frame/classes.h"
@@ -12,9 +13,9 @@
 namespace zor {
 namespace {
 
-constexpr auto Methods =
-    InTableOrder(ImageMethods, ScaleMethods, GeometryMethods, FilterMethods, ExchangeMethods);
-static_assert(Methods.size() == 92);
+constexpr auto Methods = InTableOrder(ImageMethods, ScaleMethods, GeometryMethods, FilterMethods,
+                                      ExchangeMethods, CompositionMethods);
+static_assert(Methods.size() == 120);
 MethodRecord MethodTable[Methods.size()];
 
 constexpr auto SharedMethods = InTableOrder(SharedPictureMethods);

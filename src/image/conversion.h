@@ -27,14 +27,9 @@ constexpr Colour<1> Luma(Colour<3> c) { return {Sample((c.Of[0] * 77 + c.Of[1] *
 /// What happens to alpha where both sides have it.
 enum class AlphaRule : std::uint8_t { None, Copy, Invert };
 
+/// Converts a row, pixel by pixel from left to right.
 using RowConverter = void (*)(const Sample* from, const PlaneList& in, Sample* into, const PlaneList& out,
                               std::int32_t width);
-
-/// The way from one family to another, by the rule for alpha.
-struct FamilyPair {
-  Family From, Into;
-  RowConverter By[3];
-};
 
 template <int I, int O, Colour<O> (*Step)(Colour<I>), AlphaRule Rule>
 void ConvertRow(const Sample* from, const PlaneList& in, Sample* into, const PlaneList& out,
@@ -52,24 +47,120 @@ void ConvertRow(const Sample* from, const PlaneList& in, Sample* into, const Pla
   }
 }
 
+/// What a step does, as far as a faster form can make use of it.
+struct StepKind {
+  enum { Any, Moves, Luma } Is = Any;
+  /// Of a step that only moves samples: for each place of the result the place that its sample comes from, or
+  /// Zero.
+  static constexpr signed char Zero = -1;
+  signed char From[4] = {Zero, Zero, Zero, Zero};
+};
+
+/// Tells a step that only moves samples from others by what becomes of each full sample alone: it is full or
+/// 0 at every place, and each place is filled by one at most.
+template <int I, int O, Colour<O> (*Step)(Colour<I>)>
+constexpr StepKind KindOf() {
+  if constexpr (I == 3 && O == 1)
+    if (Step == Luma) return {StepKind::Luma};
+  StepKind moves{StepKind::Moves};
+  for (int i = 0; i < I; ++i) {
+    Colour<I> pure{};
+    pure.Of[i] = 255;
+    const Colour<O> result = Step(pure);
+    for (int o = 0; o < O; ++o) {
+      if (result.Of[o] == 0) continue;
+      if (result.Of[o] != 255 || moves.From[o] != StepKind::Zero) return {};
+      moves.From[o] = static_cast<signed char>(i);
+    }
+  }
+  return moves;
+}
+
+/// The way from one family to another, by the rule for alpha.
+struct FamilyPair {
+  Family From, Into;
+  RowConverter By[3];
+  StepKind Step;
+};
+
 /// A row of a table of pairs. A step that doesn't fit the two families doesn't compile.
 template <Family From, Family Into, Colour<ColoursOf(Into)> (*Step)(Colour<ColoursOf(From)>)>
 constexpr FamilyPair Pair{From,
                           Into,
                           {ConvertRow<ColoursOf(From), ColoursOf(Into), Step, AlphaRule::None>,
                            ConvertRow<ColoursOf(From), ColoursOf(Into), Step, AlphaRule::Copy>,
-                           ConvertRow<ColoursOf(From), ColoursOf(Into), Step, AlphaRule::Invert>}};
+                           ConvertRow<ColoursOf(From), ColoursOf(Into), Step, AlphaRule::Invert>},
+                          KindOf<ColoursOf(From), ColoursOf(Into), Step>()};
 
-/// The loop for the pair in hand; null when the table has no way from source to dest. Without alpha on both
-/// sides the dest's alpha is left alone; with it, it is copied or inverted.
-inline RowConverter Find(std::span<const FamilyPair> pairs, const PictureData& source,
-                         const PictureData& dest, bool invertAlpha = false) {
-  const AlphaRule rule = !source.HasAlpha || !dest.HasAlpha ? AlphaRule::None
-                         : invertAlpha                      ? AlphaRule::Invert
-                                                            : AlphaRule::Copy;
-  for (const FamilyPair& pair : pairs)
-    if (pair.From == FamilyOf(source) && pair.Into == FamilyOf(dest)) return pair.By[int(rule)];
-  return nullptr;
-}
+/// A run of pixels whose samples are moved as a shuffle of 16 bytes: byte b of the result is byte From[b], 0
+/// where From[b] is 128, each bit turned that is set in Flip[b].
+struct ByteShuffle {
+  /// Pixels of one shuffle; 0 where there is none for these planes.
+  std::int32_t Pixels = 0;
+  /// Whether the result's pixels are written whole, and whether they fill the 16 bytes.
+  bool Whole = false, Full = false;
+  alignas(16) Sample From[16]{};
+  alignas(16) Sample Flip[16]{};
+  /// 255 for the bytes that get a sample.
+  alignas(16) Sample Write[16]{};
+};
+
+/// Rows of one layout into rows of another: the plain loop of a pair, and faster forms of it where the
+/// processor and the planes allow.
+class RowConversion {
+ public:
+  /// No way.
+  RowConversion() = default;
+  /// The planes are the families' colours in their order; then alpha, unless the rule is None.
+  RowConversion(const FamilyPair& pair, AlphaRule rule, const PlaneList& in, const PlaneList& out);
+
+  explicit operator bool() const { return Plain != nullptr; }
+  /// Whether whole pixels are copied as they are.
+  bool Copies() const { return IsCopy; }
+  /// Converts `width` pixels. Rows may overlap: the result is that of going pixel by pixel from left to
+  /// right.
+  void operator()(const Sample* from, Sample* into, std::int32_t width) const {
+    Run(from, into, width, Rest::Stays);
+  }
+  /// The same into memory that holds nothing: bytes that aren't written otherwise become 0.
+  void IntoNew(const Sample* from, Sample* into, std::int32_t width) const {
+    Run(from, into, width, Rest::IsZero);
+  }
+
+ private:
+  /// What becomes of the bytes of a pixel that the step doesn't write.
+  enum class Rest { Stays, IsZero };
+
+  void Run(const Sample* from, Sample* into, std::int32_t width, Rest rest) const;
+  bool Apart(const Sample* from, const Sample* into, std::int32_t width) const;
+  std::int32_t FastPart(const Sample* from, Sample* into, std::int32_t width, Rest rest) const;
+
+  RowConverter Plain = nullptr;
+  PlaneList In, Out;
+  bool IsCopy = false, IsLuma = false;
+  ByteShuffle Shuffle;
+};
+
+/// The way between families in a table; empty when it has none.
+RowConversion Find(std::span<const FamilyPair> pairs, Family from, const PlaneList& in, Family into,
+                   const PlaneList& out, AlphaRule rule);
+/// The same between two pictures. Without alpha on both sides the dest's alpha is left alone; with it, it is
+/// copied or inverted.
+RowConversion Find(std::span<const FamilyPair> pairs, const PictureData& source, const PictureData& dest,
+                   bool invertAlpha = false);
+
+// The faster forms. Each does as many pixels from the left as it can without touching a byte beyond the row,
+// and tells how many; the rows don't overlap.
+
+/// Writes whole pixels; the bytes that get no sample become 0.
+std::int32_t ShuffleRow(const ByteShuffle& shuffle, const Sample* from, std::int32_t fromStep, Sample* into,
+                        std::int32_t intoStep, std::int32_t width);
+/// The other bytes keep their values. For a shuffle that is full: what is kept would otherwise be read behind
+/// the store before it, which stalls.
+std::int32_t ShuffleInto(const ByteShuffle& shuffle, const Sample* from, std::int32_t fromStep, Sample* into,
+                         std::int32_t intoStep, std::int32_t width);
+/// From the left edges of pixels of 3 or 4 bytes, with the planes' places in them, into packed gray.
+std::int32_t LumaRow(const Sample* from, std::int32_t step, const std::int32_t (&places)[3], Sample* into,
+                     std::int32_t width);
 
 }

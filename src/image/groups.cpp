@@ -73,4 +73,11 @@ PlaneList PlanesOf(Group group, const PictureData& picture, std::int32_t x) {
   return planes;
 }
 
+bool SamePixels(const PlaneList& a, const PlaneList& b) {
+  if (!FillPixels(a) || a.Count != b.Count || a.Step != b.Step) return false;
+  const std::int32_t shift = LeftOf(a) - LeftOf(b);
+  return std::equal(a.Offset.begin(), a.Offset.begin() + a.Count, b.Offset.begin(),
+                    [&](std::int32_t atA, std::int32_t atB) { return atA == atB + shift; });
+}
+
 }

@@ -36,6 +36,15 @@ bool FillPixelsAlike(const PlaneList& a, const PlaneList& b);
 /// Whether a picture has all planes of a group; its alpha is asked for only `withAlpha`.
 bool HasPlanes(Group group, const PictureData& picture, bool withAlpha);
 
+/// The offset of the pixel that the planes stand in: the left edge of what a clip view shows.
+inline std::int32_t LeftOf(const PlaneList& planes) {
+  return planes.Count > 0 ? planes.Offset[0] / planes.Step * planes.Step : 0;
+}
+/// Whether the planes take up every byte of a pixel.
+inline bool FillPixels(const PlaneList& planes) { return planes.Count > 0 && planes.Count == planes.Step; }
+/// Whether the planes take up every byte of a pixel, in one order on both sides.
+bool SamePixels(const PlaneList& a, const PlaneList& b);
+
 /// A row seen as N planes: row(c, x) is the sample of plane c at column x. ConstantStep, where it isn't 0,
 /// is the step that the compiler then knows.
 template <int N, int ConstantStep = 0>
@@ -74,7 +83,7 @@ void ForPlaneCount(int count, Loop&& loop) {
 /// loop(planesOn, width), where planesOn(row) is the PlaneRow of a row.
 template <class Loop>
 void ForAlikePlanes(const PlaneList& planes, std::int32_t width, Loop&& loop) {
-  if (planes.Count > 0 && planes.Count == planes.Step) {
+  if (FillPixels(planes)) {
     const PlaneList run{1, 1, {FirstOffset(planes)}};
     return loop([=](Sample* row) { return PlaneRow<1, 1>(row, run); }, std::ptrdiff_t{width} * planes.Count);
   }

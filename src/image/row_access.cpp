@@ -36,7 +36,7 @@ bool IsGiven(const Value* value) {
 }
 
 /// The loop from one layout to the other. Null where there is no way; raises between RGB and CMYK.
-RowConverter ConverterFor(const PictureData& from, const PictureData& into, bool invertAlpha) {
+RowConversion ConversionFor(const PictureData& from, const PictureData& into, bool invertAlpha) {
   if (from.IsRGB && into.IsCMYK)
     RaiseHostException("OutOfBoundsException", "Conversion from RGB to CMYK is not supported.");
   if (from.IsCMYK && into.IsRGB)
@@ -48,12 +48,10 @@ RowConverter ConverterFor(const PictureData& from, const PictureData& into, bool
 /// on the other side.
 struct PackedRows {
   PictureData Layout{};
-  PlaneList Planes;
   std::int64_t RowBytes = 0, Bytes = 0;
 
   PackedRows(const PictureData& picture, std::int32_t rows, Integer format) {
     if (!InitImageLayout(&Layout, picture.Width, rows, std::uint32_t(format))) return;
-    Planes = PlanesOf(GroupOf(Layout), Layout);
     RowBytes = PackedRowBytes(Layout);
     if (RowBytes <= std::numeric_limits<std::int32_t>::max()) Bytes = RowBytes * rows;
   }
@@ -61,22 +59,20 @@ struct PackedRows {
   explicit operator bool() const { return Bytes > 0 && Bytes <= std::numeric_limits<std::int32_t>::max(); }
 };
 
-bool ReadRows(PictureData& picture, std::int32_t first, const PackedRows& packed, RowConverter convert,
-              Sample* into) {
-  const PlaneList planes = PlanesOf(GroupOf(picture), picture);
+bool ReadRows(PictureData& picture, std::int32_t first, const PackedRows& packed,
+              const RowConversion& convert, Sample* into) {
   return Walk(From(picture, first)).Rows(packed.Layout.Height, [&](std::int32_t y, Sample* row) {
-    convert(row, planes, into + y * packed.RowBytes, packed.Planes, picture.Width);
+    convert.IntoNew(row, into + y * packed.RowBytes, picture.Width);
   });
 }
 
 void WriteRows(PictureData& picture, std::int32_t first, const PackedRows& packed, bool invertAlpha,
                const Sample* from) {
-  const PlaneList planes = PlanesOf(GroupOf(picture), picture);
-  RowConverter convert = nullptr;
+  RowConversion convert;
   Walk(Into(picture, first)).Rows(packed.Layout.Height, [&](std::int32_t y, Sample* row) {
     // After the first row has been reached: a picture without rows raises nothing.
-    if (y == 0) convert = ConverterFor(packed.Layout, picture, invertAlpha);
-    if (convert) convert(from + y * packed.RowBytes, packed.Planes, row, planes, picture.Width);
+    if (y == 0) convert = ConversionFor(packed.Layout, picture, invertAlpha);
+    if (convert) convert(from + y * packed.RowBytes, row, picture.Width);
   });
 }
 
@@ -84,18 +80,17 @@ MemoryBlock* BlockOfRow(PictureData& data, Integer index, Integer format, bool i
   if (!CanBeRead(data) || !HasRow(data, index)) return nullptr;
   if (!WithRow(data, index, [](Sample*) {})) return nullptr;
   const PackedRows packed(data, 1, format);
-  const RowConverter convert = packed ? ConverterFor(data, packed.Layout, invertAlpha) : nullptr;
+  const RowConversion convert = packed ? ConversionFor(data, packed.Layout, invertAlpha) : RowConversion();
   if (!convert) return nullptr;
   MemoryBlock* block = newMemoryBlock(std::int32_t(packed.Bytes));
   void* bytes = block ? memoryBlockGetPtr(block) : nullptr;
-  if (bytes) std::memset(bytes, 0, std::size_t(packed.Bytes));
   if (bytes && ReadRows(data, index, packed, convert, static_cast<Sample*>(bytes))) return block;
   Unlock(block);
   return nullptr;
 }
 
 HostString* StringOfRows(PictureData& data, std::int32_t first, const PackedRows& packed) {
-  const RowConverter convert = packed ? ConverterFor(data, packed.Layout, false) : nullptr;
+  const RowConversion convert = packed ? ConversionFor(data, packed.Layout, false) : RowConversion();
   if (!convert) return nullptr;
   const Buffer bytes = NewBuffer(std::size_t(packed.Bytes));
   if (!bytes || !ReadRows(data, first, packed, convert, bytes.get())) return nullptr;

@@ -14,6 +14,7 @@
 
 #include "frame/host_services.h"
 #include "image/formats.h"
+#include "image/groups.h"
 
 namespace zor {
 
@@ -279,6 +280,25 @@ bool SharePixels(const PictureData& a, const PictureData& b) {
     return begin(data) + Word(std::max(data.TotalSize, std::int64_t{data.RowSize}));
   };
   return begin(a) < end(b) && begin(b) < end(a);
+}
+
+std::int64_t StoreRowOf(const PictureData& picture, std::int32_t y) {
+  const bool mirrored = picture.RowGetter == PlainRowMirrored || picture.RowGetter == MappedRowMirrored;
+  return mirrored ? MirroredStoreRow(picture, y) : StoreRow(picture, y);
+}
+
+bool RowsAreApart(const PictureData& picture) { return StoredRowBytes(picture) <= picture.RowSize; }
+
+std::int32_t ReadAhead(const PictureData& read, Place from, const PictureData& written, Place into) {
+  constexpr std::int32_t any = std::numeric_limits<std::int32_t>::max();
+  if (!SharePixels(read, written)) return any;
+  if (read.Samples != written.Samples || !RowsAreApart(read) || !RowsAreApart(written)) return 1;
+  if (StoreRowOf(read, from.Y) != StoreRowOf(written, into.Y)) return any;
+  const auto column = [](const PictureData& picture, std::int32_t x) {
+    return LeftOf(PlanesOf(GroupOf(picture), picture)) / picture.PixelSize + x;
+  };
+  const std::int32_t ahead = column(written, into.X) - column(read, from.X);
+  return ahead > 0 ? ahead : any;
 }
 
 }

@@ -75,4 +75,20 @@ Sample* PlainRow(PictureData* data, std::int32_t row);
 /// Whether a write to one picture can show in the other: one store, one host object, or overlapping memory.
 bool SharePixels(const PictureData& a, const PictureData& b);
 
+/// The row of the store that a picture shows as row y; a mirrored one counts from its last row.
+std::int64_t StoreRowOf(const PictureData& picture, std::int32_t y);
+
+/// Whether the rows of a picture end before the next one begins. In a caller's block they needn't.
+bool RowsAreApart(const PictureData& picture);
+
+/// A place in a picture: a column and a row.
+struct Place {
+  std::int32_t X, Y;
+};
+
+/// How many pixels from a place on may be read before the first pixel from the other place on is written, so
+/// that what is read is the same as when each pixel is read just before its turn to be written. Within a row;
+/// 1 where nothing better can be told.
+std::int32_t ReadAhead(const PictureData& read, Place from, const PictureData& written, Place into);
+
 }
