@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 
 #include "support/every_store.h"
+#include "support/every_target.h"
 
 namespace picturezor {
 namespace {
@@ -61,16 +62,15 @@ bool Raises(Format from, Format into) {
 }
 
 // Catches a wrong plane, weight or alpha in any pair, and bytes that nobody should write.
-TEST(RowAccess, ConvertsEveryPairOfFormats) {
-  Noise noise(11);
-  constexpr int Width = 19, Height = 2;
+void ConvertEveryPair(int width, Noise& noise) {
+  constexpr int Height = 2;
   for (const Format own : EveryFormat())
     for (const Format other : EveryFormat()) {
       SCOPED_TRACE(std::to_string(int(own)) + " and " + std::to_string(int(other)));
-      const Picture picture(Width, Height, own);
+      const Picture picture(width, Height, own);
       FillWithNoise(picture, unsigned(noise.Byte()));
       const Samples before = Packed(picture);
-      const Samples zeros(std::size_t(Width * Height * BytesPerPixel(other)), 0);
+      const Samples zeros(std::size_t(width * Height * BytesPerPixel(other)), 0);
       const Samples given = noise.Many(zeros.size());
       const std::size_t half = zeros.size() / 2;
 
@@ -103,6 +103,17 @@ TEST(RowAccess, ConvertsEveryPairOfFormats) {
                   Samples(inverted.begin(), inverted.begin() + std::ptrdiff_t(half)));
       }
     }
+}
+
+TEST(RowAccess, ConvertsEveryPairOfFormats) {
+  Noise noise(11);
+  ForEveryTarget([&] {
+    // A few pixels, and more than one run of the faster forms with some left over.
+    for (const int width : {1, 19, 53}) {
+      SCOPED_TRACE(testing::Message() << "width " << width << ", seed 11");
+      ConvertEveryPair(width, noise);
+    }
+  });
 }
 
 // Catches a getter that keeps an address over a window move, or a view that reads its parent's edge.
