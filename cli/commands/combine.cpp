@@ -13,13 +13,16 @@ struct CombineCommand {
   bool Premultiplied = false;
 };
 
-/// What an overlay's alpha leaves of the base.
+/// What an overlay's alpha leaves of the base, in all planes of the mask.
 void FillWithInvertedAlpha(const Picture& mask, const Picture& overlay) {
   const Picture alpha = overlay.AlphaChannel();
-  for (std::int32_t y = 0; y < mask.Height(); ++y) {
-    Bytes row = alpha.RowInFormat(y, Format::G);
-    for (auto& sample : row) sample = std::uint8_t(255 - sample);
-    mask.SetRowInFormat(y, Format::G, row);
+  for (std::int32_t plane = 0; plane < mask.ChannelCount(); ++plane) {
+    const Picture channel = mask.Channel(plane);
+    for (std::int32_t y = 0; y < mask.Height(); ++y) {
+      Bytes row = alpha.RowInFormat(y, Format::G);
+      for (auto& sample : row) sample = std::uint8_t(255 - sample);
+      channel.SetRowInFormat(y, Format::G, row);
+    }
   }
 }
 
@@ -46,7 +49,9 @@ int Combine(Session& session, const CombineCommand& command) {
     if (sizes[2].Width != sizes[1].Width || sizes[2].Height != sizes[1].Height)
       throw Failure(command.Mask, "the mask must be as large as the overlay");
   } else if (ownMask) {
-    sizes.push_back({sizes[1].Width, sizes[1].Height, Format::G});
+    // Added samples need room in alpha too: there the base's is scaled like its colours.
+    const bool joins = command.Premultiplied && HasAlpha(base.Size().Of);
+    sizes.push_back({sizes[1].Width, sizes[1].Height, joins ? Format::GA : Format::G});
   }
   const bool blends = sizes.size() > 2 || how.ForeColour || how.MaskColour;
   for (const PictureSize& size : sizes)
@@ -78,7 +83,9 @@ void AddCombine(CLI::App& app, Session& session) {
   CLI::App* command = app.add_subcommand("combine", "Lay an image over another one");
   command->footer(
       "A mask says how much of the base stays: white keeps it, black takes the overlay. Without a mask or a\n"
-      "colour the overlay's alpha decides, if it has one; an alpha of the base stays as it is then.\n\n"
+      "colour the overlay's alpha decides, if it has one; an alpha of the base stays as it is then, but "
+      "with\n"
+      "--premultiplied it becomes that of both together.\n\n"
       "Examples:\n"
       "  picturezor combine photo.jpg badge.png --at 20,20 -o marked.jpg\n"
       "  picturezor combine photo.jpg other.jpg --mask soft-edge.png -o both.jpg\n"

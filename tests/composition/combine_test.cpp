@@ -124,19 +124,18 @@ TEST(Combine, DividesExactly) {
     image.SetRow(y, across);
     mask.SetRow(y, Samples(256, std::uint8_t(y)));
   }
-  ForEveryTarget([&] {
-    for (const bool preMultiplied : {false, true})
-      for (int d = 0; d < 256; ++d) {
+  for (const bool preMultiplied : {false, true})
+    for (int d = 0; d < 256; ++d) {
+      Samples wanted;
+      for (int m = 0; m < 256; ++m)
+        for (int s = 0; s < 256; ++s) wanted.push_back(std::uint8_t(Blend(preMultiplied, s, m, d)));
+      ForEveryTarget([&] {
         dest.FillRect(d);
         ASSERT_TRUE(dest.Combine(image, {0, 0, 256, 256}, 0, 0,
                                  {.PreMultipliedSource = preMultiplied, .Mask = mask}));
-        const Samples result = dest.DataStringInFormat(Format::G);
-        for (int m = 0; m < 256; ++m)
-          for (int s = 0; s < 256; ++s)
-            ASSERT_EQ(result[std::size_t(m * 256 + s)], std::uint8_t(Blend(preMultiplied, s, m, d)))
-                << s << " " << m << " " << d;
-      }
-  });
+        ASSERT_EQ(dest.DataStringInFormat(Format::G), wanted) << "over " << d;
+      });
+    }
 }
 
 // Rows longer than a stretch, and all ways of bringing an image and a mask into the dest's layout.
