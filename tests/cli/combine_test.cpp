@@ -39,8 +39,9 @@ TEST_F(Combine, BlendsByAlphaMaskOrColour) {
   const Raster rgb{2, 1, 3, {10, 20, 30, 100, 100, 100}}, rgba{2, 1, 4, {10, 20, 30, 40, 100, 100, 100, 255}};
   const Raster over{2, 1, 3, {200, 100, 0, 200, 100, 0}},
       clear{2, 1, 4, {200, 100, 0, 255, 200, 100, 0, 127}};
+  const Raster flat{2, 1, 1, {0, 255}}, scaled{2, 1, 4, {90, 80, 70, 255, 50, 25, 0, 127}};
   struct {
-    Raster Base, Over;
+    const Raster &Base, &Over;
     Arguments Options;
     Bytes Result;
   } cases[] = {
@@ -50,13 +51,10 @@ TEST_F(Combine, BlendsByAlphaMaskOrColour) {
       {rgb, over, {"--mask", "mask.png"}, {200, 100, 0, 149, 100, 50}},
       {rgb, over, {"--mask", "colours.png"}, {200, 20, 15, 100, 100, 100}},
       {rgb, over, {"--mask-colour", "ff0080"}, {10, 100, 15, 100, 100, 50}},
-      {rgb, {2, 1, 1, {0, 255}}, {"--fore", "#0a0B0c"}, {10, 11, 12, 100, 100, 100}},
+      {rgb, flat, {"--fore", "#0a0B0c"}, {10, 11, 12, 100, 100, 100}},
       // s + m d / 255; both alphas together are as opaque as the more opaque one at least.
-      {rgb, {2, 1, 4, {90, 80, 70, 255, 50, 25, 0, 127}}, {"--premultiplied"}, {90, 80, 70, 100, 75, 50}},
-      {rgba,
-       {2, 1, 4, {90, 80, 70, 255, 50, 25, 0, 127}},
-       {"--premultiplied"},
-       {90, 80, 70, 255, 100, 75, 50, 255}},
+      {rgb, scaled, {"--premultiplied"}, {90, 80, 70, 100, 75, 50}},
+      {rgba, scaled, {"--premultiplied"}, {90, 80, 70, 255, 100, 75, 50, 255}},
   };
   for (const auto& [base, overlay, options, result] : cases) {
     SCOPED_TRACE(testing::PrintToString(options));
