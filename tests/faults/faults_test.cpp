@@ -95,8 +95,11 @@ int Try(const MethodEntry& row, StoredPicture::Kind kind, Format format, int fir
                        WithFaults(first, count, [&] { AssignRow(row, self.Address(), arguments, value); }));
     }
     if (constructs && self.Valid()) self.Row(0);
-    // A closed picture has no rows to look at; a whole stored row that is set holds the surroundings too.
-    EXPECT_TRUE(row.LowerName == "close" || row.LowerName == "row" || with.SurroundingsIntact());
+    // A closed picture has no rows to look at; a whole stored row that is set, or cleared, holds the
+    // surroundings too.
+    const bool wholeRows =
+        row.LowerName == "row" || (row.LowerName == "clearrect" && row.Of.Parameters.empty());
+    EXPECT_TRUE(row.LowerName == "close" || wholeRows || with.SurroundingsIntact());
   }
   const Held after;
   EXPECT_EQ(after.InHost, before.InHost) << "objects are left in the host";
