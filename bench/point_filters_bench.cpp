@@ -131,7 +131,7 @@ const auto registered = [] {
     }));
 #endif
     unsharp.push_back(Memcpy(BytesOf(3)));
-    AddRace("filters", amount == 0.5 ? "UnsharpFilter RGB" : "UnsharpFilter RGB, doubles",
+    AddRace("filters", amount == 0.5 ? "UnsharpFilter RGB" : "UnsharpFilter RGB, doubtful factor",
             std::move(unsharp));
   }
 

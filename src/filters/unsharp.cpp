@@ -3,6 +3,7 @@
 #include <cstdlib>
 
 #include "filters/filters.h"
+#include "filters/unsharp_runs.h"
 #include "image/groups.h"
 #include "image/stores.h"
 #include "image/targets.h"
@@ -23,42 +24,17 @@ void PushRun(Sample* samples, const Sample* beside, std::ptrdiff_t count, double
   }
 }
 
-/// The factor as a whole number, for vectors of integers: a sample becomes b + (Multiplier d + Bias >>
-/// Shift).
-struct WholeFactor {
-  static constexpr std::int32_t Bias = 256;
-  std::int32_t Multiplier = 0, Shift = 0;
-
-  /// Takes the finest scale whose products fit. False where the formula's doubles give something else for any
-  /// two samples.
-  bool Stands(double factor) {
-    Shift = 20;
-    const double most = std::abs(factor) * 255;
-    while (Shift > 10 && most * (1 << Shift) >= 1 << 30) --Shift;
-    if (!(most * (1 << Shift) < 1 << 30)) return false;
-    Multiplier = std::int32_t(std::floor(factor * (1 << Shift) + 0.5));
-    for (int d = -255; d <= 255; ++d) {
-      // The sum of factor d and b, where it isn't clamped, is rounded to 2^-45 at the finest. So b makes no
-      // difference to what lies below the point, unless the product is a hair below a whole number.
-      const double product = factor * d, whole = std::floor(product);
-      const int step = (Multiplier * d + Bias) >> Shift;
-      const bool far = std::abs(product) > 512 && (product > 0 ? step > 255 : step < -255);
-      if (!far && (step != whole || (product != whole && whole + 1 - product < 0x1p-44))) return false;
-    }
-    return true;
-  }
-};
-
-void PushRunWhole(Sample* samples, const Sample* beside, std::ptrdiff_t count, WholeFactor factor,
-                  std::int32_t threshold) {
+/// The same in whole numbers, for a factor without doubtful differences.
+void PushRunWhole(Sample* samples, const Sample* beside, std::ptrdiff_t count, std::int32_t multiplier,
+                  std::int32_t shift, std::int32_t threshold) {
   for (std::ptrdiff_t i = 0; i < count; ++i) {
     const int a = samples[i], b = beside[i], d = a - b;
-    const int pushed = b + ((factor.Multiplier * d + WholeFactor::Bias) >> factor.Shift);
+    const int pushed = b + ((multiplier * d + WholeFactor::Bias) >> shift);
     samples[i] = Sample(std::abs(d) < threshold ? a : std::clamp(pushed, 0, 255));
   }
 }
 
-/// The same as a table by both samples, for planes that don't lie side by side and for pictures that share
+/// The formula as a table by both samples, for planes that don't lie side by side and for pictures that share
 /// samples: those have to be read one after the other, each after the ones before it have been written.
 struct PushTable {
   Sample Cell[256][256];
@@ -73,6 +49,33 @@ struct PushTable {
   }
 };
 
+void PushRow(Sample* samples, const Sample* beside, std::ptrdiff_t count, const WholeFactor& factor,
+             std::int32_t threshold) {
+  if (!factor.Fits) return OnBestTarget<PushRun>(samples, beside, count, factor.Factor, threshold);
+  if (CurrentTarget >= Target::AVX512) return PushRunAVX512(samples, beside, count, factor, threshold);
+  factor.AnyDoubtful
+      ? OnBestTarget<PushRun>(samples, beside, count, factor.Factor, threshold)
+      : OnBestTarget<PushRunWhole>(samples, beside, count, factor.Multiplier, factor.Shift, threshold);
+}
+
+}
+
+WholeFactor::WholeFactor(double factor) : Factor(factor) {
+  const double most = std::abs(factor) * 255;
+  while (Shift > 10 && most * (1 << Shift) >= 1 << 30) --Shift;
+  Fits = most * (1 << Shift) < 1 << 30;
+  if (!Fits) return;
+  Multiplier = std::int32_t(std::floor(factor * (1 << Shift) + 0.5));
+  for (int d = -255; d <= 255; ++d) {
+    // The sum of factor d and b, where it isn't clamped, is rounded to 2^-45 at the finest. So b makes no
+    // difference to what lies below the point, unless the product is a hair below a whole number.
+    const double product = factor * d, whole = std::floor(product);
+    const int step = (Multiplier * d + Bias) >> Shift;
+    const bool far = std::abs(product) > 512 && (product > 0 ? step > 255 : step < -255);
+    if (far || (step == whole && (product == whole || whole + 1 - product >= 0x1p-44))) continue;
+    Doubtful[std::size_t(d + 256) / 32] |= std::uint32_t{1} << (d + 256) % 32;
+    AnyDoubtful = true;
+  }
 }
 
 Boolean UnsharpFilter(PictureZOR* self, PictureZOR* origpixels, Double Amount, Integer Threshold) {
@@ -94,12 +97,9 @@ Boolean UnsharpFilter(PictureZOR* self, PictureZOR* origpixels, Double Amount, I
   if (FillPixelsAlike(planes, from) && !SharePixels(picture, blurred)) {
     const std::int32_t first = FirstOffset(planes), firstBeside = FirstOffset(from);
     const std::ptrdiff_t count = std::ptrdiff_t{picture.Width} * planes.Count;
-    WholeFactor whole;
-    const bool inIntegers = whole.Stands(factor);
-    return walk.Rows(picture.Height, [&](std::int32_t, Sample* blurredRow, Sample* row) {
-      const Sample* beside = blurredRow + firstBeside;
-      inIntegers ? OnBestTarget<PushRunWhole>(row + first, beside, count, whole, Threshold)
-                 : OnBestTarget<PushRun>(row + first, beside, count, factor, Threshold);
+    const WholeFactor whole(factor);
+    return walk.Rows(picture.Height, [&](std::int32_t, Sample* beside, Sample* row) {
+      PushRow(row + first, beside + firstBeside, count, whole, Threshold);
     });
   }
   const PushTable pushed(factor, Threshold);

@@ -66,7 +66,7 @@ TEST(DitherFilter, HasItsMatrices) {
 
 TEST(DitherFilter, PicksTheLevelByThePlace) {
   for (const auto& [matrix, side, firstRow, sum, weighted] : Cases)
-    for (const int levels : {2, 5, 255}) {
+    for (const int levels : {2, 5, 256}) {
       SCOPED_TRACE(testing::Message() << int(matrix) << ' ' << levels);
       const std::vector<int> lowest = LowestWhite(matrix, side);
       const PointFilter filter{[&, matrix = matrix](const Picture& s, const Picture& d) {
