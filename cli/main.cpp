@@ -46,8 +46,8 @@ int Run(int count, char** arguments) {
       "error); 3 the command line is wrong.\n\n"
       "The module PictureZOR.so is looked for beside the program, then in the library directory beside\n"
       "it; the environment variable PICTUREZOR_MODULE names another one.");
-  for (const auto add : {AddScale, AddConvert, AddCrop, AddCombine, AddChannels, AddFilter, AddCompare,
-                         AddInfo, AddThumbnail, AddShow})
+  for (const auto add : {AddScale, AddConvert, AddCrop, AddCombine, AddChannels, AddFilter, AddMirror,
+                         AddRotate, AddCompare, AddInfo, AddThumbnail, AddShow})
     add(app, session);
   try {
     app.parse(count, arguments);

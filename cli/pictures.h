@@ -34,6 +34,18 @@ struct PictureSize {
 /// behind. Throws Failure where there is no room.
 std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector<PictureSize>& sizes);
 
+/// The pictures that filters make live where the image does: in temporary files when it is too large. While
+/// this lives, the module asks here.
+struct PicturesLike {
+  explicit PicturesLike(const StoreOptions& stores) {
+    PictureFactory::SetFactory(
+        PictureFactory([stores](std::int32_t width, std::int32_t height, Format format) {
+          return MakePictures(stores, {{width, height, format}})[0];
+        }));
+  }
+  ~PicturesLike() { PictureFactory::SetFactory({}); }
+};
+
 /// What an image file is once its orientation has been applied.
 ImageInfo Upright(const ImageInfo& info);
 /// Reads all rows into a picture of the upright size and the file's format.

@@ -85,6 +85,8 @@ void AddCombine(CLI::App& app, Session& session);
 void AddChannels(CLI::App& app, Session& session);
 void AddCompare(CLI::App& app, Session& session);
 void AddFilter(CLI::App& app, Session& session);
+void AddMirror(CLI::App& app, Session& session);
+void AddRotate(CLI::App& app, Session& session);
 void AddInfo(CLI::App& app, Session& session);
 void AddThumbnail(CLI::App& app, Session& session);
 void AddShow(CLI::App& app, Session& session);

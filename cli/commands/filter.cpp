@@ -309,18 +309,6 @@ void TakeColours(const Picture& colours, const Picture& result, Format format) {
     colours.SetRowInFormat(y, format, result.RowInFormat(y, format));
 }
 
-/// The pictures that filters make live where the image does: in temporary files when it is too large. While
-/// this lives, the module asks here.
-struct PicturesLike {
-  explicit PicturesLike(const StoreOptions& stores) {
-    PictureFactory::SetFactory(
-        PictureFactory([stores](std::int32_t width, std::int32_t height, Format format) {
-          return MakePictures(stores, {{width, height, format}})[0];
-        }));
-  }
-  ~PicturesLike() { PictureFactory::SetFactory({}); }
-};
-
 int Filter(Session& session, const FilterCommand& filter, const FilterOptions& options) {
   Target target(options.Out);
   OpenedImage source(session, options.In);

@@ -23,6 +23,7 @@ class KnownValues {
     Known& known = Values[bits >> (64 - SizeBits)];
     if (known.Distance != a) {
       known.Distance = a;
+      known.Value = 0.0;
       known.InReach = KernelValue(Kernel, a, known.Value);
     }
     value = known.Value;

@@ -51,8 +51,10 @@ FloatColumns::FloatColumns(const ScaleContext& context, const ContributionTable&
   if (samples < NarrowStripe) samples = std::min(NarrowStripe, fits(MostRoom));
   if (samples < NarrowestStripe) return;
   const std::int32_t unit = pass ? pass->ColumnUnit() : 1;
-  samples = std::min(samples, std::size_t(context.ResultWidth) * std::size_t(Samples.Order.Count));
-  Stripe = std::max(std::int32_t(samples) / Samples.Order.Count / unit, 1) * unit;
+  // A row that fits is one stripe, its last group of columns included.
+  const std::int64_t units = (std::int64_t{context.ResultWidth} + unit - 1) / unit;
+  const auto unitsThatFit = std::max<std::int64_t>(std::int64_t(samples) / Samples.Order.Count / unit, 1);
+  Stripe = std::int32_t(std::min(units, unitsThatFit)) * unit;
   Rows.Room = WholeBlocks(std::ptrdiff_t{Stripe} * Samples.Order.Count) + Block;
 
   // One allocation, its rows aligned like vectors.

@@ -16,7 +16,7 @@ namespace zor {
 //
 // The fast forms give the same bytes; quotients.h says why. Nor does the result tell whether the rows between
 // the passes all stood in a picture or were made when they were wanted, which takes no more memory than the
-// rows that one line of the result looks at.
+// rows that a few lines of the result look at.
 
 /// The pictures of a scale, and how large the result is. Temp is null where no picture stands between the
 /// passes. A row of temp or dest that can't be reached is passed over, and one of temp counts as black.

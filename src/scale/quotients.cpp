@@ -39,7 +39,7 @@ constexpr double One = 1 << FixedPointLine::Bits;
 bool RoundShares(const Contribution& line, const Lattice& lattice, std::int32_t unit, std::int32_t* shares) {
   std::int64_t sum = 0;
   Multiple(line.Sum, sum);
-  double tooLarge = 0.0;
+  double tooLarge = 0.0, positive = 0.0, negative = 0.0;
   for (std::int32_t i = 0; i < line.Count; ++i) {
     std::int64_t multiple = 0;
     Multiple(line.Entries[i].Weight, multiple);
@@ -48,7 +48,9 @@ bool RoundShares(const Contribution& line, const Lattice& lattice, std::int32_t 
     const std::int64_t rounded = RoundedUp(multiple << FixedPointLine::Bits, sum * unit) * unit;
     shares[i] = std::int32_t(rounded);
     tooLarge += double(rounded) - exact;
+    (rounded > 0 ? positive : negative) += std::fabs(double(rounded));
   }
+  if (!(std::fmax(positive, negative) * 255.0 < 2147483647.0)) return false;
   return (255.0 * tooLarge + lattice.Disturbance * One + 2.0) * double(lattice.Denominator) < One;
 }
 
@@ -68,6 +70,10 @@ Lattice LatticeOf(const Contribution& line) {
   return {units / divisor, disturbance};
 }
 
+bool CopiesOneLine(const Contribution& line) {
+  return line.Count == 1 && line.Entries[0].Weight == line.Sum && line.Sum != 0.0F;
+}
+
 bool AlwaysInDoubt(const Contribution& line) {
   if (line.Count == 0) return false;
   if (!(line.Sum > 0.0F)) return true;
@@ -83,6 +89,10 @@ bool AlwaysInDoubt(const Contribution& line) {
 bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLine& made) {
   made = {0, 0};
   if (line.Count == 0) return true;
+  if (CopiesOneLine(line)) {
+    shares[0] = 1 << FixedPointLine::Bits;
+    return true;
+  }
   if (!(line.Sum > 0.0F)) return false;
   // On a lattice as few digits as will do.
   if (const Lattice lattice = LatticeOf(line); lattice.Denominator > 0)
@@ -109,6 +119,10 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
 bool MakeFloat(const Contribution& line, float* shares, std::int32_t firstRow, int stride, FloatLine& made) {
   made = {0.0F, 0.0F};
   if (line.Count == 0) return true;
+  if (CopiesOneLine(line)) {
+    shares[std::ptrdiff_t{line.Entries[0].Pixel - firstRow} * stride] = 1.0F;
+    return true;
+  }
   if (!(line.Sum > 0.0F)) return false;
   Shares sizes;
   for (std::int32_t i = 0; i < line.Count; ++i) {

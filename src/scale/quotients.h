@@ -33,8 +33,12 @@ struct Lattice {
 };
 Lattice LatticeOf(const Contribution& line);
 
-/// Whether almost all of a line comes from one source line, so that its quotients are nearly whole numbers
-/// and always in doubt off a lattice; or it has a Sum that nothing can be said about.
+/// Whether a line has one entry, which its Sum is the weight of: its quotients are the samples themselves,
+/// exactly.
+bool CopiesOneLine(const Contribution& line);
+
+/// Whether almost all of a line comes from one of several source lines, so that its quotients are nearly
+/// whole numbers and always in doubt off a lattice; or it has a Sum that nothing can be said about.
 bool AlwaysInDoubt(const Contribution& line);
 
 /// A line in whole numbers: q' = sum of Share s / 2^Bits. The sums fit 32 bits.

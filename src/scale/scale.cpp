@@ -67,6 +67,15 @@ ScalePreparation::Outcome ScalePreparation::FindTemp(const ScaleRequest& request
   return Outcome::Ready;
 }
 
+void ScalePreparation::KeepPictures() {
+  const auto keep = [](PictureData*& picture, std::optional<KeptPicture>& kept) {
+    if (picture) picture = &kept.emplace(*picture).Data();
+  };
+  keep(Pictures.Source, KeptSource);
+  keep(Pictures.Dest, KeptDest);
+  keep(Pictures.Temp, KeptTemp);
+}
+
 bool ScalePreparation::MakeTemp() {
   Made = Held{NewPictureInMemory(Pictures.ResultWidth, Pictures.Source->Height, Pictures.Pair.TempFormat)};
   Pictures.Temp = Made ? &Made.Data() : nullptr;

@@ -14,7 +14,8 @@ namespace zor {
 ///
 /// False, and nothing written, when the size is below 1 or passes this picture, for another mode, for
 /// pictures that aren't usable or have no way to each other, and when `temp` doesn't fit or can't be made in
-/// memory. False too when a row of `source` can't be reached.
+/// memory. False too when a row of `source` can't be reached; rows of
+/// this picture may have been made then.
 Boolean Scale(PictureZOR* self, PictureZOR* source, PictureZOR* temp, Integer mode, Integer width,
               Integer height);
 /// The same on a number of threads, with the same result: below 0 on the calling thread, 0 on as many as

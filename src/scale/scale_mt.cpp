@@ -34,6 +34,7 @@ Boolean ScaleMT(PictureZOR* self, Integer threads, PictureZOR* source, PictureZO
   if (prepared.Result() == ScalePreparation::Outcome::Refused) return false;
   if (prepared.Result() == ScalePreparation::Outcome::WrongFactoryFormat)
     return Scale(self, source, nullptr, mode, width, height);
+  prepared.KeepPictures();
   return prepared.Run(nullptr,
                       [threads](std::int32_t rows, auto&& make) { return OnThreads(threads, rows, make); });
 }

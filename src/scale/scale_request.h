@@ -1,5 +1,8 @@
 #pragma once
+#include <optional>
+
 #include "image/lifecycle.h"
+#include "image/stores.h"
 #include "scale/kernels.h"
 #include "scale/passes.h"
 
@@ -12,6 +15,21 @@ struct ScaleRequest {
   std::int32_t Width, Height;
 };
 
+/// The record of a picture in memory, and its samples kept alive: what threads may look at while the host's
+/// other threads close the picture itself.
+class KeptPicture {
+ public:
+  explicit KeptPicture(const PictureData& picture) : Record(picture) {
+    if (Record.Samples) ++Record.Samples->Pictures;
+  }
+  ~KeptPicture() { LeaveStore(Record); }
+  KeptPicture(const KeptPicture&) = delete;
+  PictureData& Data() { return Record; }
+
+ private:
+  PictureData Record;
+};
+
 /// A scale whose pictures are all there and fit. A temporary picture that was made here is given back at the
 /// end.
 class ScalePreparation {
@@ -21,6 +39,8 @@ class ScalePreparation {
   explicit ScalePreparation(const ScaleRequest& request);
   /// WrongFactoryFormat: a factory gave a temporary picture of another format than it was asked for.
   Outcome Result() const { return Of; }
+  /// Makes the scale independent of what becomes of its pictures meanwhile. None of them is mapped.
+  void KeepPictures();
   /// Runs both passes. Rows of a pass are made by onRows(count, make), which calls make(first, last) for
   /// ranges that together are 0 to count - 1, and gives whether all of them gave true.
   template <class OnRows>
@@ -38,6 +58,7 @@ class ScalePreparation {
   ScaleContext Pictures{};
   ScaleKernel Kernel;
   Held Made{nullptr};
+  std::optional<KeptPicture> KeptSource, KeptDest, KeptTemp;
   Outcome Of;
 };
 

@@ -198,7 +198,7 @@ TEST(Scale, IsTheSameOnEveryTarget) {
       {{64, 48}, {16, 12}}, {{61, 45}, {17, 13}}, {{40, 30}, {30, 23}}, {{17, 9}, {68, 36}},
       {{33, 21}, {47, 30}}, {{5, 4}, {131, 7}},   {{300, 40}, {7, 3}},  {{50, 50}, {50, 50}},
       {{1, 1}, {9, 9}},     {{1000, 3}, {1, 1}},  {{22, 37}, {66, 37}}, {{97, 33}, {32, 11}},
-      {{130, 5}, {65, 5}},
+      {{130, 5}, {65, 5}},  {{9, 1}, {40, 50}},   {{2, 9}, {1500, 9}},
   };
   unsigned seed = 500;
   for (const auto& [from, into] : sizes)
@@ -229,6 +229,8 @@ TEST(Scale, IsTheSameOnEveryTarget) {
           } else {
             EXPECT_EQ(Packed(dest), Packed(wanted));
           }
+          ASSERT_TRUE(dest.ScaleMT(int(seed % 5), source, {}, kernel, into.Width, into.Height));
+          EXPECT_EQ(Packed(dest), Packed(wanted)) << "on threads";
         });
       }
 }
@@ -393,6 +395,16 @@ TEST(Scale, OutlivesAPictureClosedDuringAYield) {
     Host::OnYield([&] { (closeSource ? source : dest).Close(); });
     dest.Scale(source, {}, Kernel::Lanczos3, 20, 15);
     Host::OnYield({});
+  }
+  // On threads the samples stay until the work is done.
+  for (const bool closeSource : {false, true}) {
+    const Picture source = NoisePicture(900, 700, Format::RGB, 9), dest(600, 500, Format::RGB);
+    const Picture shown = dest.ClipImage(), wanted(600, 500, Format::RGB);
+    ASSERT_TRUE(wanted.Scale(source, {}, Kernel::Lanczos3, 600, 500));
+    Host::OnYield([&] { (closeSource ? source : dest).Close(); });
+    EXPECT_TRUE(dest.ScaleMT(2, source, {}, Kernel::Lanczos3, 600, 500));
+    Host::OnYield({});
+    EXPECT_EQ(Packed(shown), Packed(wanted));
   }
 }
 
