@@ -24,4 +24,17 @@ ByteTables::ByteTables(const PlaneList& planes, const std::array<const SampleTab
   Uniform = Count == 1 && planes.Count == Step;
 }
 
+void MapBytes(const ByteTables& tables, const Sample* in, Sample* out) {
+  const SampleTable& table = *tables.Table[0];
+  // Eight look-ups before the first of them is written, so that none waits for a write.
+  constexpr std::ptrdiff_t Many = 8;
+  std::ptrdiff_t i = 0;
+  for (; i + Many <= tables.Bytes; i += Many) {
+    Sample mapped[Many];
+    for (std::ptrdiff_t k = 0; k < Many; ++k) mapped[k] = table[in[i + k]];
+    for (std::ptrdiff_t k = 0; k < Many; ++k) out[i + k] = mapped[k];
+  }
+  for (; i < tables.Bytes; ++i) out[i] = table[in[i]];
+}
+
 }

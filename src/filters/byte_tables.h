@@ -27,6 +27,10 @@ struct ByteTables {
   std::array<std::array<std::uint64_t, 4>, 8> Of{};
 };
 
+/// Sends the bytes of a row through the one table of all of them; `tables` is Uniform. The rows are one and
+/// the same or don't overlap.
+void MapBytes(const ByteTables& tables, const Sample* in, Sample* out);
+
 /// Sends the bytes of a row through their tables, looked up in registers. For Target::AVX512VBMI only; the
 /// rows are one and the same or don't overlap.
 void MapBytesVBMI(const ByteTables& tables, const Sample* in, Sample* out);

@@ -61,13 +61,14 @@ bool MapSamples(const MappedRows& rows, const MappedPlanes& planes) {
 }
 
 bool MapRows(const MappedRows& rows, const MappedPlanes& planes) {
-  if (CurrentTarget != Target::AVX512VBMI || !rows.ManyAtOnce || !LieAlike(planes.In, planes.Out) ||
-      rows.Width < 1)
-    return MapSamples(rows, planes);
+  if (!rows.ManyAtOnce || !LieAlike(planes.In, planes.Out) || rows.Width < 1) return MapSamples(rows, planes);
   const ByteTables tables(planes.In, planes.Table, rows.Width);
+  const bool inRegisters = CurrentTarget == Target::AVX512VBMI;
+  if (!inRegisters && !tables.Uniform) return MapSamples(rows, planes);
+  const auto map = inRegisters ? MapBytesVBMI : MapBytes;
   const std::int32_t in = FirstOffset(planes.In), out = FirstOffset(planes.Out);
   return Walk(rows.From, rows.Into).Rows(rows.Height, [&](std::int32_t, Sample* source, Sample* dest) {
-    MapBytesVBMI(tables, source + in, dest + out);
+    map(tables, source + in, dest + out);
   });
 }
 
