@@ -34,12 +34,22 @@ template <int Step>
 void SwapBlocks(Sample* left, Sample* rightEnd, std::ptrdiff_t blocks, const Sample* fromLow,
                 const Sample* fromHigh) {
   const Block lowMask = LoadBlock(fromLow), highMask = LoadBlock(fromHigh);
-  for (; blocks > 0; --blocks) {
-    const Block low = LoadBlock(left), high = LoadBlock(rightEnd - BlockBytes);
-    StoreBlock(left, Blend(Shuffled<ToLow<Step>>(high, high), low, lowMask));
-    StoreBlock(rightEnd - BlockBytes, Blend(Shuffled<ToHigh<Step>>(low, low), high, highMask));
+  if (blocks <= 0) return;
+  Block low = LoadBlock(left), high = LoadBlock(rightEnd - BlockBytes);
+  for (;; --blocks) {
+    const Block nowLow = low, nowHigh = high;
+    Sample *intoLeft = left, *intoRight = rightEnd - BlockBytes;
     left += PixelsInBlock<Step> * Step;
     rightEnd -= PixelsInBlock<Step> * Step;
+    // Read before this one is written: they may share a byte, which is put back as it was, and a load that
+    // overlaps a store in flight waits for it.
+    if (blocks > 1) {
+      low = LoadBlock(left);
+      high = LoadBlock(rightEnd - BlockBytes);
+    }
+    StoreBlock(intoLeft, Blend(Shuffled<ToLow<Step>>(nowHigh, nowHigh), nowLow, lowMask));
+    StoreBlock(intoRight, Blend(Shuffled<ToHigh<Step>>(nowLow, nowLow), nowHigh, highMask));
+    if (blocks == 1) return;
   }
 }
 
