@@ -25,14 +25,14 @@ Picture LoadImage(const std::filesystem::path& file) {
   const StoreOptions stores{Store::Auto, DefaultMemoryLimit(), DefaultTempDirectory()};
   const auto reader = OpenImage(file, stores.MemoryLimit);
   const ImageInfo upright = Upright(reader->Info());
-  const Picture picture = MakePictures(stores, {{upright.Width, upright.Height, upright.Pixels}})[0];
+  Picture picture = MakePictures(stores, {{upright.Width, upright.Height, upright.Pixels}})[0];
   Progress silent;
   ReadInto(picture, *reader, silent);
   return picture;
 }
 
 HostPicture LoadHostPicture(const std::filesystem::path& file) {
-  const HostPicture picture = LoadImage(file).CopyPictureWithMask();
+  HostPicture picture = LoadImage(file).CopyPictureWithMask();
   if (!picture) throw Failure(file, "the host has no picture for it; one is 32767 pixels on a side at most");
   return picture;
 }

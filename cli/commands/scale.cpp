@@ -105,7 +105,7 @@ void AddScale(CLI::App& app, Session& session) {
           ->type_name("WxH");
   CLI::Option* percent =
       command->add_option("--percent", options->Percent, "Of both sides")->check([](const std::string& text) {
-        const double percent = std::atof(text.c_str());
+        const double percent = std::strtod(text.c_str(), nullptr);
         // Not a number is neither.
         return percent >= 1e-6 && percent <= 1e9 ? "" : text + " isn't a percentage";
       });

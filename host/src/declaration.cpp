@@ -85,7 +85,7 @@ constexpr std::array<std::string_view, 12> KnownTypes = {"boolean",
 
 TypeName ReadType(Reader& reader) {
   if (reader.LowerWord() != "as") reader.Fail("\"as\" expected");
-  const std::string type = reader.LowerWord();
+  std::string type = reader.LowerWord();
   if (std::ranges::find(KnownTypes, type) == KnownTypes.end()) reader.Fail("type '" + type + "' isn't known");
   return type;
 }

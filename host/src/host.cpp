@@ -19,6 +19,7 @@ std::filesystem::path& LoadedModule() {
 
 std::vector<Host::MethodInfo> InfosOf(const std::vector<MethodEntry>& rows) {
   std::vector<Host::MethodInfo> infos;
+  infos.reserve(rows.size());
   for (const MethodEntry& row : rows)
     infos.push_back({row.Record->Declaration, row.Record->Flags, row.Record->Setter != 0});
   return infos;

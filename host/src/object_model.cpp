@@ -143,7 +143,7 @@ void ThrowPending() {
     const auto* holds = HeldBy<ExceptionPayload>(raised);
     const HostException exception(HeaderOf(raised).Of->Name, holds ? holds->Message : "");
     Unlock(raised);
-    throw exception;
+    throw HostException(exception);
   }
 }
 

@@ -26,7 +26,7 @@ Bytes BytesOf(const MemoryBlock& block) {
 /// Takes the string over.
 Bytes BytesOf(StringRecord* string) {
   if (!string) return {};
-  const Bytes bytes(string->Bytes.begin(), string->Bytes.end());
+  Bytes bytes(string->Bytes.begin(), string->Bytes.end());
   UnlockString(string);
   return bytes;
 }
@@ -92,7 +92,7 @@ Picture::Picture(const HostPicture& picture, bool useAlpha) : Object(NewPictureO
 
 Picture Picture::Mapped(const std::filesystem::path& file, std::int32_t width, std::int32_t height,
                         Format format, std::int32_t blockSize) {
-  const Picture picture{NewPictureObject()};
+  Picture picture{NewPictureObject()};
   Invoke<void>(picture, "Constructor", width, height, Code(format), blockSize, FolderItem(file));
   return picture;
 }

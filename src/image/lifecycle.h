@@ -41,8 +41,8 @@ PictureZOR* CreatePictureThroughFactory(const PictureData* data, std::int32_t wi
 class Held {
  public:
   explicit Held(PictureZOR* object) : Of(object) {}
-  Held(Held&& other) : Of(other.HandOn()) {}
-  Held& operator=(Held&& other) {
+  Held(Held&& other) noexcept : Of(other.HandOn()) {}
+  Held& operator=(Held&& other) noexcept {
     std::swap(Of, other.Of);
     return *this;
   }
