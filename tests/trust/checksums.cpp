@@ -18,10 +18,10 @@
 // instruction set. Without an argument the lines are printed; with one, the file of that name is compared.
 
 /// The one thing that differs from system to system: the numbers of the C library.
-extern "C" int rand() {
-  static std::uint32_t state;
-  state = state * 1103515245 + 12345;
-  return int(state >> 1);
+static std::uint32_t RandomState;
+extern "C" [[gnu::visibility("default")]] int rand() {
+  RandomState = RandomState * 1103515245 + 12345;
+  return int(RandomState >> 1);
 }
 
 namespace picturezor {
@@ -119,6 +119,7 @@ double Real(const std::string& name, Noise& noise) {
 /// One call with arguments of a seed, and all that it leaves behind.
 void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, int variant) {
   Noise noise(unsigned(chosen * Variants + variant));
+  RandomState = unsigned(variant);
   // On either side of the vectors' widths.
   constexpr int widths[Variants] = {77, 5, 33, 130, 16, 64}, heights[Variants] = {7, 9, 8, 3, 12, 5};
   const int width = widths[variant], height = heights[variant];
@@ -252,23 +253,19 @@ int Compare(const char* file) {
   std::map<std::string, std::string> wanted;
   std::ifstream in(file);
   for (std::string line; std::getline(in, line);) wanted[KeyOf(line)] = line;
-  int failures = wanted.empty(), compared = 0, missing = 0;
+  int failures = wanted.empty(), compared = 0;
   const zor::Target best = TargetOfModule();
   for (int target = 0; target <= int(best); ++target) {
     TargetOfModule() = zor::Target(target);
     for (const std::string& line : Lines()) {
       ++compared;
       const auto found = wanted.find(KeyOf(line));
-      if (found == wanted.end()) {
-        ++missing;
-        continue;
-      }
-      if (found->second == line) continue;
+      if (found != wanted.end() && found->second == line) continue;
       if (++failures <= 40) std::cout << "target " << target << ": " << line << "\n";
     }
   }
   std::cout << compared << " lines compared for " << int(best) + 1 << " instruction sets, " << failures
-            << " differ, " << missing << " aren't in the file yet\n";
+            << " differ\n";
   if (failures) std::cout << "Where results were meant to change: scripts/checksums writes the file anew.\n";
   return failures > 0;
 }
