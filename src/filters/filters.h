@@ -65,8 +65,9 @@ PictureZOR* DitherFilter(PictureZOR* self, PictureZOR* dest, Integer matrix, Int
 // and the result is the destination with a reference for the caller, or nil. Each plane is treated by itself,
 // alpha like a colour. A group that a filter doesn't serve leaves the destination as it is.
 
-/// Sums up the samples around each sample, weighted by a square of numbers, row by row, whose middle or the
-/// place right of and below it is the sample itself; beyond the edges the nearest row or column counts again.
+/// Sums up the samples around each sample, weighted by a square of numbers, row by row, whose middle is the
+/// sample itself; an even square has one more row and column before the sample than behind it. Beyond the
+/// edges the nearest row or column counts again.
 /// The result is (sum + delta) scaleFactor, truncated and clamped. A weight of 255 or more leaves its place
 /// out. Numbers that `matrix` doesn't have are 0, nil has none; a dimension below 1 has no places. Nil for a
 /// dimension above 50. Where `dest` shares memory with the source, as when it is the source, pixels are read
@@ -85,7 +86,8 @@ PictureZOR* ApplyMatrix(PictureZOR* self, PictureZOR* dest, Integer matrixDimens
 PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, Double radius, Boolean vertical,
                           Boolean horizontal);
 /// The same so many times, each on what the one before gave. Only the first writes into `dest`; the others
-/// make new pictures. With less than 1 iteration the result is the source itself.
+/// make new pictures, and end once one changes nothing, since the rest wouldn't either. With less than 1
+/// iteration the result is the source itself.
 PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, Double radius, Integer iterations,
                           Boolean vertical, Boolean horizontal);
 /// A blur by less than a pixel: k (c + f (p + n)), truncated, down and then along, where f is the fraction of
@@ -112,9 +114,10 @@ PictureZOR* EngraveFilter(PictureZOR* self, PictureZOR* dest, Integer level);
 PictureZOR* NeonFilter(PictureZOR* self, PictureZOR* dest);
 
 /// Two colours with a smooth step between them, where the picture blurred three times by a third of `radius`
-/// passes `threshold`; the step is `softness` wide, both on a scale where 1 stands for 255. Gray takes the green
-/// of the colours. A radius below 3 doesn't blur. The result is always a new picture, without the alpha; `dest`,
-/// which may not be the source, receives the first pass of the blur. Nil where the blur gives nil.
+/// passes `threshold`; the step is `softness` wide, both on a scale where 1 stands for 255. Gray takes the
+/// green of the colours. A radius below 3 doesn't blur. The result is always a new picture, without the
+/// alpha; `dest`, which may not be the source, receives the first pass of the blur. Nil where the blur gives
+/// nil.
 PictureZOR* StampFilter(PictureZOR* self, PictureZOR* dest, Double radius, Double threshold, Double softness,
                         Color Black, Color White);
 
