@@ -13,10 +13,10 @@ void Gather(Sample* row, const PlaneList& planes, std::ptrdiff_t width, Sample* 
 
 }
 
-PackedRows::PackedRows(const FilterCall& call)
-    : In(call.In),
-      Out(call.Out),
-      Width(call.Source.Width),
+PackedRows::PackedRows(const PlaneList& in, const PlaneList& out, std::int32_t width)
+    : In(in),
+      Out(out),
+      Width(width),
       FirstIn(FirstOffset(In)),
       FirstOut(FirstOffset(Out)),
       Whole(FillPixelsAlike(In, Out)) {

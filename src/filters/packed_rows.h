@@ -11,7 +11,8 @@ namespace zor {
 /// same order, as in most calls, that is how the rows lie anyway, and nothing is copied.
 class PackedRows {
  public:
-  explicit PackedRows(const FilterCall& call);
+  PackedRows(const PlaneList& in, const PlaneList& out, std::int32_t width);
+  explicit PackedRows(const FilterCall& call) : PackedRows(call.In, call.Out, call.Source.Width) {}
 
   int Count() const { return In.Count; }
   /// The planes of the source in the order of packed rows.

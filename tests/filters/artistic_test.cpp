@@ -32,20 +32,39 @@ AreaFilter Oil(int levels, int range) {
           true, AreaFilter::ReadsWhatItWrote, false};
 }
 
-// The classes of values around each sample, in few levels so that there are ties, with neighbourhoods that
-// the picture holds and such that it doesn't.
+// The classes of values around each sample, in so few levels and such small neighbourhoods that there are
+// ties, and neighbourhoods that the picture doesn't hold; on both sides of each change of form. The wide ones
+// are done in several strips.
 TEST(OilFilter, TakesTheMeanOfTheMostFrequentClass) {
-  for (const int levels : {1, 5, 20, 100, 255, 256, 1000, 0, -4})
-    for (const int range : {0, 1, 3, 7, 8, 20, 2000, -1}) {
-      SCOPED_TRACE(testing::Message() << levels << " levels, range " << range);
-      const Picture picture(33, 21, Format::RGBA);
-      FillWithNoise(picture, unsigned(60 + range));
-      const Planar source = PlanesIn(picture, 33, 21);
-      Planar wanted = source;
-      Oil(levels, std::min(range, 40)).Model(source, wanted);
-      ForEveryTarget(
-          [&] { EXPECT_EQ(PlanesIn(picture.OilFilter({}, levels, range), 33, 21).Of, wanted.Of); });
-    }
+  const auto compare = [](int width, int height, Format format, int levels, int range) {
+    SCOPED_TRACE(testing::Message() << width << " wide, " << levels << " levels, range " << range);
+    const Picture picture(width, height, format);
+    FillWithNoise(picture, unsigned(60 + range));
+    Planar wanted = PlanesIn(picture, width, height);
+    Oil(levels, std::min(range, 40)).Model(Planar(wanted), wanted);
+    ForEveryTarget(
+        [&] { EXPECT_EQ(PlanesIn(picture.OilFilter({}, levels, range), width, height).Of, wanted.Of); });
+  };
+  for (const int levels : {1, 5, 48, 49, 64, 65, 128, 129, 192, 193, 255, 256, 1000, 0, -4})
+    for (const int range : {0, 1, 3, 4, 7, 8, 20, 2000, -1}) compare(33, 21, Format::RGBA, levels, range);
+  for (const int levels : {20, 100, 256}) {
+    compare(2049, 5, Format::G, levels, 3);
+    compare(700, 5, Format::BGRX, levels, 2);
+  }
+}
+
+// Sums and counts at their largest.
+TEST(OilFilter, LeavesAnEvenPictureAlone) {
+  const Picture picture(20, 20, Format::RGB);
+  for (const int value : {12, 255})
+    for (const int levels : {1, 20, 200, 256})
+      for (const int range : {3, 7, 8, 19}) {
+        SetPacked(picture, Samples(1200, std::uint8_t(value)));
+        ForEveryTarget([&] {
+          EXPECT_EQ(Packed(picture.OilFilter({}, levels, range)), Samples(1200, std::uint8_t(value)))
+              << levels << " " << range;
+        });
+      }
 }
 
 // More samples in a neighbourhood than 16 bits count.
