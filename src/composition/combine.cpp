@@ -73,7 +73,8 @@ struct CombineCall {
 /// long as reading ahead of the writing doesn't show. False when a row can't be reached.
 template <class Run>
 bool ForStretches(const CombineCall& call, InLayout& source, InLayout& mask, Run&& run) {
-  const auto& [rectangle, sourceX, sourceY] = call.Of;
+  const Rectangle& rectangle = call.Of.Dest;
+  const std::int32_t sourceX = call.Of.SourceX, sourceY = call.Of.SourceY;
   const bool shares = SharePixels(call.Image, call.Dest) || SharePixels(call.Mask, call.Dest);
   const std::int32_t step = call.Dest.PixelSize, left = LeftOf(PlanesOf(GroupOf(call.Dest), call.Dest));
   return Walk(From(call.Image, sourceY), From(call.Mask, sourceY), Yielding(Into(call.Dest, rectangle.Y)))

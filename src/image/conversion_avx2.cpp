@@ -114,6 +114,10 @@ std::int32_t ShuffleRow(const ByteShuffle&, const Sample*, std::int32_t, Sample*
                         std::int32_t) {
   return 0;
 }
+std::int32_t ShuffleInto(const ByteShuffle&, const Sample*, std::int32_t, Sample*, std::int32_t,
+                         std::int32_t) {
+  return 0;
+}
 std::int32_t LumaRow(const Sample*, std::int32_t, const std::int32_t (&)[3], Sample*, std::int32_t) {
   return 0;
 }
