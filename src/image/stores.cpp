@@ -275,9 +275,12 @@ bool SharePixels(const PictureData& a, const PictureData& b) {
   if (!first || !second) return false;
   if (first == second || (first->Keeper && first->Keeper == second->Keeper)) return true;
   if (a.IsMapping || b.IsMapping) return false;
-  const auto begin = [](const PictureData& data) { return reinterpret_cast<Word>(data.PixelBase); };
+  const auto begin = [](const PictureData& data) {
+    return reinterpret_cast<Word>(data.PixelBase) + Word(std::int64_t{data.RowOffset} * data.RowSize);
+  };
+  // In a caller's block the last row may be longer than the way from row to row.
   const auto end = [&](const PictureData& data) {
-    return begin(data) + Word(std::max(data.TotalSize, std::int64_t{data.RowSize}));
+    return begin(data) + Word(std::int64_t{data.RowSize} * (data.Height - 1) + StoredRowBytes(data));
   };
   return begin(a) < end(b) && begin(b) < end(a);
 }

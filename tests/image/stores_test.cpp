@@ -4,8 +4,10 @@
 #include <algorithm>
 
 #include "image/picture_data.h"
+#include "image/stores.h"
 #include "invoke.h"
 #include "support/every_store.h"
+#include "support/row_arguments.h"
 
 namespace picturezor {
 namespace {
@@ -166,6 +168,21 @@ TEST(MappedStore, SharesItsFileWithNobody) {
 TEST(MappedStore, LeavesDevicesAlone) {
   EXPECT_FALSE(Picture::Mapped("/dev/null", 9, 9, Format::G, 1).Valid());
   EXPECT_TRUE(std::filesystem::exists("/dev/null"));
+}
+
+// Catches the bytes that a block's last row has beyond the way from row to row: what is written there is read
+// through the other picture.
+TEST(MemoryStore, IsSharedToItsLastPixel) {
+  for (const int rowSize : {0, 4, 20, 23}) {
+    const Picture picture(MemoryBlock(100), 20, 3, Format::G, rowSize);
+    // The block that a picture gives says no size, so the class would refuse it.
+    const Picture bytes = UnbuiltPicture();
+    model::Invoke<void>(bytes, "Constructor", picture.Memory(), 1, 100, int(Format::G), 1);
+    for (int at = 0; at < 100; ++at)
+      EXPECT_EQ(SharePixels(DataOf(picture), DataOf(bytes.ClipImage({0, at, 1, 1}))),
+                at < 2 * rowSize + std::max(20, rowSize))
+          << "rows " << rowSize << " bytes apart, byte " << at;
+  }
 }
 
 TEST(MemoryStore, TakesABlockSizeToo) {
