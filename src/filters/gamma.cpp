@@ -1,13 +1,10 @@
+#include "filters/curves.h"
 #include "filters/filters.h"
-#include "filters/plane_tables.h"
 #include "image/arithmetic.h"
 #include "image/powers.h"
 
 namespace zor {
 namespace {
-
-constexpr FilterRules WithoutAlpha{.Groups = FilterRules::GrayAndRGB, .WritesAlpha = false};
-constexpr FilterRules WithAlpha{.Groups = FilterRules::GrayAndRGB};
 
 /// 255 (i / 255)^(1 / gamma), to the nearest.
 SampleTable GammaTable(double gamma) {
@@ -23,45 +20,35 @@ double Mix(double red, double green, double blue) {
   return double(sum / 256);
 }
 
-/// The tables of three gammas, as far as the group has planes for them.
-bool MapThree(const FilterCall& call, double red, double green, double blue, const SampleTable* alpha) {
-  if (call.Of < Group::RGB) {
-    const SampleTable gray = GammaTable(Mix(red, green, blue));
-    return MapPlanes(call, {.Gray = &gray, .Alpha = alpha});
-  }
-  const SampleTable r = GammaTable(red), g = GammaTable(green), b = GammaTable(blue);
-  return MapPlanes(call, {.Red = &r, .Green = &g, .Blue = &b, .Alpha = alpha});
+/// One gamma for the colours; without one for alpha, alpha is left alone.
+PictureZOR* MapGamma(PictureZOR* self, PictureZOR* dest, double gamma, std::optional<double> alpha) {
+  return MapCurves<double>(self, dest, GammaTable, {gamma, gamma, gamma, alpha});
+}
+/// One for each colour.
+PictureZOR* MapGammas(PictureZOR* self, PictureZOR* dest, double red, double green, double blue,
+                      std::optional<double> alpha) {
+  if (DataOf(self).IsGray) return MapGamma(self, dest, Mix(red, green, blue), alpha);
+  return MapCurves<double>(self, dest, GammaTable, {red, green, blue, alpha});
 }
 
 }
 
 PictureZOR* GammaFilter(PictureZOR* self, PictureZOR* dest, Double gamma) {
-  return RunFilter(self, dest, WithoutAlpha, [&](const FilterCall& call) {
-    const SampleTable table = GammaTable(gamma);
-    return MapPlanes(call, {.Gray = &table, .Red = &table, .Green = &table, .Blue = &table});
-  });
+  return MapGamma(self, dest, gamma, {});
 }
 
 PictureZOR* GammaFilter(PictureZOR* self, PictureZOR* dest, Double gamma, Double alphaGamma) {
-  return RunFilter(self, dest, WithAlpha, [&](const FilterCall& call) {
-    const SampleTable table = GammaTable(gamma), alpha = GammaTable(alphaGamma);
-    return MapPlanes(call, {.Gray = &table, .Red = &table, .Green = &table, .Blue = &table, .Alpha = &alpha});
-  });
+  return MapGamma(self, dest, gamma, alphaGamma);
 }
 
 PictureZOR* GammaFilter(PictureZOR* self, PictureZOR* dest, Double redGamma, Double greenGamma,
                         Double blueGamma) {
-  return RunFilter(self, dest, WithoutAlpha, [&](const FilterCall& call) {
-    return MapThree(call, redGamma, greenGamma, blueGamma, nullptr);
-  });
+  return MapGammas(self, dest, redGamma, greenGamma, blueGamma, {});
 }
 
 PictureZOR* GammaFilter(PictureZOR* self, PictureZOR* dest, Double redGamma, Double greenGamma,
                         Double blueGamma, Double alphaGamma) {
-  return RunFilter(self, dest, WithAlpha, [&](const FilterCall& call) {
-    const SampleTable alpha = GammaTable(alphaGamma);
-    return MapThree(call, redGamma, greenGamma, blueGamma, &alpha);
-  });
+  return MapGammas(self, dest, redGamma, greenGamma, blueGamma, alphaGamma);
 }
 
 }

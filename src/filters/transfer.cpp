@@ -1,14 +1,11 @@
 #include <algorithm>
 
+#include "filters/curves.h"
 #include "filters/filters.h"
-#include "filters/plane_tables.h"
 #include "frame/host_services.h"
 
 namespace zor {
 namespace {
-
-constexpr FilterRules WithoutAlpha{.Groups = FilterRules::GrayAndRGB, .WritesAlpha = false};
-constexpr FilterRules WithAlpha{.Groups = FilterRules::GrayAndRGB};
 
 /// The low 8 bits of the elements 0 to 255; 0 where there is none.
 SampleTable TransferTable(IntegerArray* array) {
@@ -22,34 +19,21 @@ SampleTable TransferTable(IntegerArray* array) {
 }
 
 PictureZOR* TransferFilter(PictureZOR* self, PictureZOR* dest, IntegerArray* gray) {
-  return RunFilter(self, dest, WithoutAlpha, [&](const FilterCall& call) {
-    const SampleTable table = TransferTable(gray);
-    return MapPlanes(call, {.Gray = &table, .Red = &table, .Green = &table, .Blue = &table});
-  });
+  return MapCurves(self, dest, TransferTable, {gray, gray, gray, {}});
 }
 
 PictureZOR* TransferFilter(PictureZOR* self, PictureZOR* dest, IntegerArray* gray, IntegerArray* alpha) {
-  return RunFilter(self, dest, WithAlpha, [&](const FilterCall& call) {
-    const SampleTable table = TransferTable(gray), a = TransferTable(alpha);
-    return MapPlanes(call, {.Gray = &table, .Red = &table, .Green = &table, .Blue = &table, .Alpha = &a});
-  });
+  return MapCurves(self, dest, TransferTable, {gray, gray, gray, alpha});
 }
 
 PictureZOR* TransferFilter(PictureZOR* self, PictureZOR* dest, IntegerArray* red, IntegerArray* green,
                            IntegerArray* blue) {
-  return RunFilter(self, dest, WithoutAlpha, [&](const FilterCall& call) {
-    const SampleTable r = TransferTable(red), g = TransferTable(green), b = TransferTable(blue);
-    return MapPlanes(call, {.Gray = &g, .Red = &r, .Green = &g, .Blue = &b});
-  });
+  return MapCurves(self, dest, TransferTable, {red, green, blue, {}});
 }
 
 PictureZOR* TransferFilter(PictureZOR* self, PictureZOR* dest, IntegerArray* red, IntegerArray* green,
                            IntegerArray* blue, IntegerArray* alpha) {
-  return RunFilter(self, dest, WithAlpha, [&](const FilterCall& call) {
-    const SampleTable r = TransferTable(red), g = TransferTable(green), b = TransferTable(blue),
-                      a = TransferTable(alpha);
-    return MapPlanes(call, {.Gray = &g, .Red = &r, .Green = &g, .Blue = &b, .Alpha = &a});
-  });
+  return MapCurves(self, dest, TransferTable, {red, green, blue, alpha});
 }
 
 }
