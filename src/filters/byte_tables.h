@@ -5,8 +5,6 @@
 
 namespace zor {
 
-using SampleTable = std::array<Sample, 256>;
-
 /// A row as plain bytes: each place in the pixel has a table, or none and is left alone. This is for planes
 /// that lie alike in both pictures.
 struct ByteTables {

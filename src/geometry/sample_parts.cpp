@@ -18,13 +18,13 @@ void CountDifferences(const Sample* table, Multiplier multiplier, int* differenc
 
 }
 
-PartTable PartsOf(double part) {
-  PartTable table;
+SampleTable PartsOf(double part) {
+  SampleTable table;
   OnBestTarget<FillParts>(part, table.data());
   return table;
 }
 
-bool FindMultiplier(double part, const PartTable& table, Multiplier& multiplier) {
+bool FindMultiplier(double part, const SampleTable& table, Multiplier& multiplier) {
   const std::int32_t below = Truncate(part * 65536);
   for (const std::int32_t candidate : {below, below + 1}) {
     if (candidate > 65535) continue;

@@ -9,8 +9,7 @@ namespace zor {
 inline Sample PartOf(double part, Sample sample) { return Sample(Truncate(part * sample)); }
 
 /// The same for all samples.
-using PartTable = std::array<Sample, 256>;
-PartTable PartsOf(double part);
+SampleTable PartsOf(double part);
 
 /// A multiplication by whole numbers that gives the same for all samples: 256ths, and 256ths of these.
 struct Multiplier {
@@ -26,6 +25,6 @@ struct Multiplier {
 /// neighbours among those with denominators up to 255, which is wider than 1/65536 and so holds a whole
 /// number of these. False for a part of 1, and where the rounding of a product put the table beside every
 /// fraction.
-bool FindMultiplier(double part, const PartTable& table, Multiplier& multiplier);
+bool FindMultiplier(double part, const SampleTable& table, Multiplier& multiplier);
 
 }

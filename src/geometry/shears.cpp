@@ -105,7 +105,7 @@ class RowRuns {
  private:
   /// The part of the background, and behind it those of all samples.
   void FillParts(const Sample* from, const Shift& shift) const {
-    const PartTable table = PartsOf(shift.Part);
+    const SampleTable table = PartsOf(shift.Part);
     for (int c = 0; c < Step; ++c) Parts[c] = table[Pixel[c]];
     const std::ptrdiff_t count = std::ptrdiff_t{Of.From.Width} * Step;
     Sample* parts = Parts.get() + Step;

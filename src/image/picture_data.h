@@ -10,6 +10,9 @@ namespace zor {
 /// One byte, in every format.
 using Sample = std::uint8_t;
 
+/// What becomes of each sample value.
+using SampleTable = std::array<Sample, 256>;
+
 struct Store;
 
 /// The instance data of a PictureZOR. The host allocates it zero-filled; a constructor fills it, and after

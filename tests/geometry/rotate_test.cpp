@@ -269,7 +269,7 @@ TEST(Rotate, MultipliesByWholeNumbers) {
   for (int i = 0; i < 20000; ++i) parts.push_back(noise.Between(1, 1 << 30) * 0x1p-31 + 0.25);
   int found = 0;
   for (const double part : parts) {
-    const zor::PartTable table = zor::PartsOf(part);
+    const zor::SampleTable table = zor::PartsOf(part);
     zor::Multiplier multiplier;
     const bool fits = zor::FindMultiplier(part, table, multiplier);
     found += fits;
