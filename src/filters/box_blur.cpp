@@ -1,5 +1,3 @@
-#include <limits>
-
 #include "filters/box_mean.h"
 #include "filters/filters.h"
 #include "filters/packed_rows.h"
@@ -18,23 +16,25 @@ namespace {
 class SourceRows {
  public:
   SourceRows(const FilterCall& call, const PackedRows& packing)
-      : Of(call.Source), Packing(packing), Line(NewBuffer(std::size_t(packing.Samples()))) {
-    if (!call.SharesPixels || !Line) return;
-    const std::int64_t bytes = std::int64_t{Of.Height} * packing.Samples();
-    if (bytes <= std::numeric_limits<std::ptrdiff_t>::max()) Copy = NewBuffer(std::size_t(bytes));
-    bool copied = Copy != nullptr;
-    for (std::int32_t y = 0; copied && y < Of.Height; ++y)
-      copied = WithRow(Of, y, [&](Sample* row) {
-        std::memcpy(Copied(y), Packing.Packed(row, Line.get()), std::size_t(Packing.Samples()));
-      });
-    if (!copied) Line.reset();
+      : Of(call.Source),
+        Packing(packing),
+        Copies(call.SharesPixels),
+        Line(NewBuffer(std::size_t(packing.Samples()))),
+        Copy(NewBuffer(Copies ? Of.Height : 0, packing.Samples())) {}
+  explicit operator bool() const { return Line && (Copy || !Copies); }
+
+  /// Before the first row is asked for. False when a row can't be reached.
+  bool Begin() {
+    bool reached = true;
+    for (std::int32_t y = 0; Copies && reached && y < Of.Height; ++y)
+      reached = WithRow(Of, y, [&](Sample* row) { Packing.Load(row, Copied(y)); });
+    return reached;
   }
-  explicit operator bool() const { return Line != nullptr; }
 
   /// Calls work(samples of row y). False when the row can't be reached.
   template <class Work>
   bool With(std::int64_t y, Work&& work) {
-    if (Copy) return work(static_cast<const Sample*>(Copied(y))), true;
+    if (Copies) return work(static_cast<const Sample*>(Copied(y))), true;
     return WithRow(Of, std::int32_t(y), [&](Sample* row) { work(Packing.Packed(row, Line.get())); });
   }
 
@@ -43,6 +43,7 @@ class SourceRows {
 
   PictureData& Of;
   const PackedRows& Packing;
+  bool Copies;
   Buffer Line, Copy;
 };
 
@@ -70,11 +71,7 @@ template <class Sum>
 class ColumnSums {
  public:
   ColumnSums(std::ptrdiff_t samples, std::int64_t height, std::int64_t r, const BoxMean<Sum>& mean)
-      : Samples(samples),
-        Height(height),
-        Radius(r),
-        Mean(mean),
-        Memory(NewBuffer(std::size_t(samples) * sizeof(Sum))) {}
+      : Samples(samples), Height(height), Radius(r), Mean(mean), Memory(NewBuffer(samples, sizeof(Sum))) {}
   explicit operator bool() const { return Memory != nullptr; }
 
   /// Writes the means around row y; y is 0 first, then one more each time.
@@ -153,9 +150,9 @@ class ExtendedRow {
         Reach(std::ptrdiff_t(std::min<std::int64_t>(width, r))),
         Radius(r),
         Pixel(planes),
-        Memory(NewBuffer(Samples())),
-        Eights(NewBuffer(Samples() * sizeof(Sum))),
-        Sums(NewBuffer(Samples() * sizeof(Sum))) {}
+        Memory(NewBuffer(Samples(), 1)),
+        Eights(NewBuffer(Samples(), sizeof(Sum))),
+        Sums(NewBuffer(Samples(), sizeof(Sum))) {}
   explicit operator bool() const { return Memory && Eights && Sums; }
 
   Sample* Row() const { return Memory.get() + (Before + Reach) * Pixel; }
@@ -177,7 +174,9 @@ class ExtendedRow {
  private:
   static constexpr std::ptrdiff_t Before = 32;
 
-  std::size_t Samples() const { return std::size_t(Before + Width + 2 * Reach + 1) * std::size_t(Pixel); }
+  std::int64_t Samples() const {
+    return (std::int64_t{Before} + Width + std::int64_t{2} * Reach + 1) * Pixel;
+  }
   Sum* At(const Buffer& buffer) const { return reinterpret_cast<Sum*>(buffer.get()) + Before * Pixel; }
 
   std::ptrdiff_t Width, Reach;
@@ -186,8 +185,9 @@ class ExtendedRow {
   Buffer Memory, Eights, Sums;
 };
 
+/// False when a row can't be reached. Without memory nothing is done.
 template <class Sum>
-void Blur(const FilterCall& call, std::int64_t r, bool vertical, bool horizontal) {
+bool Blur(const FilterCall& call, std::int64_t r, bool vertical, bool horizontal) {
   const PackedRows packing(call);
   const BoxMean<Sum> mean(2 * r + 1);
   const std::int32_t height = call.Source.Height;
@@ -195,18 +195,27 @@ void Blur(const FilterCall& call, std::int64_t r, bool vertical, bool horizontal
   ColumnSums<Sum> columns(packing.Samples(), height, r, mean);
   const ExtendedRow<Sum> line(call.Source.Width, packing.Count(), horizontal ? r : 0);
   const Buffer result = NewBuffer(std::size_t(packing.Samples()));
-  bool reached = source && columns && line && result;
+  if (!source || !columns || !line || !result) return true;
+
+  const auto along = [&](Sample* row) {
+    packing.Write(row, result.get(), [&](Sample* out) { line.Means(out, mean); });
+  };
+  const auto store = [&](Sample* row) { packing.Store(line.Row(), row); };
+  // The rows go along only after all have gone down, which shows where they overlap.
+  const bool later = vertical && horizontal && call.SharesPixels;
+  bool reached = source.Begin();
   for (std::int32_t y = 0; reached && y < height; ++y) {
     reached = vertical ? columns.MoveTo(y, source, line.Row()) : source.With(y, [&](const Sample* row) {
       std::copy_n(row, packing.Samples(), line.Row());
     });
-    reached = reached && WithRow(call.Dest, y, [&](Sample* row) {
-                if (horizontal)
-                  packing.Write(row, result.get(), [&](Sample* out) { line.Means(out, mean); });
-                else
-                  packing.Store(line.Row(), row);
-              });
+    reached = reached && (horizontal && !later ? WithRow(call.Dest, y, along) : WithRow(call.Dest, y, store));
   }
+  for (std::int32_t y = 0; later && reached && y < height; ++y)
+    reached = WithRow(call.Dest, y, [&](Sample* row) {
+      packing.LoadDest(row, line.Row());
+      along(row);
+    });
+  return reached;
 }
 
 /// Whether two pictures have the same samples in the same places.
@@ -227,13 +236,13 @@ bool SamePixels(PictureData& a, PictureData& b) {
 PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, double radius, Boolean vertical,
                           Boolean horizontal) {
   return RunFilter(self, dest, {.InPlace = false}, [&](const FilterCall& call) {
-    if (call.Source.Width < 1 || (!vertical && !horizontal)) return;
+    if (call.Source.Width < 1 || (!vertical && !horizontal)) return true;
     // One sample is its own mean.
     const std::int64_t r = Truncate(radius), n = 2 * r + 1;
     if (r < 1) return Blur<std::uint16_t>(call, 0, false, false);
     if (BoxMean<std::uint16_t>::Holds(n)) return Blur<std::uint16_t>(call, r, vertical, horizontal);
     if (BoxMean<std::uint32_t>::Holds(n)) return Blur<std::uint32_t>(call, r, vertical, horizontal);
-    Blur<std::uint64_t>(call, r, vertical, horizontal);
+    return Blur<std::uint64_t>(call, r, vertical, horizontal);
   });
 }
 

@@ -14,8 +14,8 @@ PictureZOR* DiffuseFilter(PictureZOR* self, PictureZOR* dest, Integer level) {
     const auto near = [&](std::int64_t place, std::int64_t count) {
       return std::clamp<std::int64_t>(place + std::rand() % choices - reach, 0, count - 1);
     };
+    bool reached = true;
     ForPlaneCount(call.In.Count, [&](auto n) {
-      bool reached = true;
       for (std::int32_t y = 0; reached && y < height; ++y)
         for (std::int32_t x = 0; reached && x < width; ++x) {
           Sample pixel[n];
@@ -31,6 +31,7 @@ PictureZOR* DiffuseFilter(PictureZOR* self, PictureZOR* dest, Integer level) {
                     });
         }
     });
+    return reached;
   });
 }
 

@@ -1,3 +1,5 @@
+#include <optional>
+
 #include "filters/filters.h"
 #include "filters/packed_rows.h"
 #include "image/arithmetic.h"
@@ -14,16 +16,18 @@ void Differences(const Sample* row, const Sample* other, Sample* out, std::ptrdi
   for (std::ptrdiff_t i = 0; i < count; ++i) out[i] = Clamp(row[i] - other[i] + 128);
 }
 
-/// The displaced row comes with its ends repeated, so that it can be read `shift` samples further on.
-void EngraveRows(const FilterCall& call, std::int32_t level) {
+/// The displaced row comes with its ends repeated, so that it can be read `shift` samples further on. False
+/// when a row can't be reached; without memory nothing, and nothing is done.
+std::optional<bool> EngraveRows(const FilterCall& call, std::int32_t level) {
   const PackedRows packing(call);
   const std::int32_t width = call.Source.Width, height = call.Source.Height, pixel = packing.Count();
   // From the width on every pixel looks at an end.
   const std::ptrdiff_t shift = std::ptrdiff_t{std::clamp(level, -width, width)} * pixel;
   const std::ptrdiff_t samples = packing.Samples();
   const Buffer row = NewBuffer(std::size_t(samples)), result = NewBuffer(std::size_t(samples)),
-               other = NewBuffer(std::size_t(samples) * 3);
-  bool reached = row && result && other;
+               other = NewBuffer(samples, 3);
+  if (!row || !result || !other) return std::nullopt;
+  bool reached = true;
   Sample* const first = other.get() + samples;
   for (std::int32_t y = 0; reached && y < height; ++y)
     reached = WithRow(call.Source, y, [&](Sample* source) { packing.Load(source, row.get()); }) &&
@@ -38,13 +42,14 @@ void EngraveRows(const FilterCall& call, std::int32_t level) {
                                             static_cast<const Sample*>(first + shift), out, samples);
                 });
               });
+  return reached;
 }
 
 /// One pixel after the other, each reading what those before it have left.
-void EngravePixels(const FilterCall& call, std::int32_t level) {
+bool EngravePixels(const FilterCall& call, std::int32_t level) {
   const std::int32_t width = call.Source.Width, height = call.Source.Height;
+  bool reached = true;
   ForPlaneCount(call.In.Count, [&](auto n) {
-    bool reached = true;
     for (std::int32_t y = 0; reached && y < height; ++y)
       for (std::int32_t x = 0; reached && x < width; ++x) {
         int value[n];
@@ -62,13 +67,16 @@ void EngravePixels(const FilterCall& call, std::int32_t level) {
                   });
       }
   });
+  return reached;
 }
 
 }
 
 PictureZOR* EngraveFilter(PictureZOR* self, PictureZOR* dest, Integer level) {
   return RunFilter(self, dest, {.Groups = FilterRules::GrayAndRGB}, [&](const FilterCall& call) {
-    call.SharesPixels ? EngravePixels(call, level) : EngraveRows(call, level);
+    if (!call.SharesPixels)
+      if (const auto reached = EngraveRows(call, level)) return *reached;
+    return EngravePixels(call, level);
   });
 }
 

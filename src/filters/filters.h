@@ -13,7 +13,7 @@ inline constexpr ConstantRecord DitherConstants[] = {
 
 // Filters that look at one sample at a time. Those with a `dest` take it as RunFilter does: nil makes a new
 // picture, `dest` may be the source, and the result is the destination with a reference for the caller, or
-// nil. A group that a filter doesn't serve leaves the destination as it is.
+// nil, also when a row can't be reached. A group that a filter doesn't serve leaves the destination as it is.
 
 /// 255 - v for every sample of the rectangle, alpha included, in place.
 void Invert(PictureZOR* self, Integer x, Integer y, Integer w, Integer h);
@@ -62,8 +62,9 @@ Boolean UnsharpFilter(PictureZOR* self, PictureZOR* origpixels, Double Amount, I
 PictureZOR* DitherFilter(PictureZOR* self, PictureZOR* dest, Integer matrix, Integer levels);
 
 // Filters that look at the surroundings of a pixel. `dest` is as RunFilter takes it: nil makes a new picture,
-// and the result is the destination with a reference for the caller, or nil. Each plane is treated by itself,
-// alpha like a colour. A group that a filter doesn't serve leaves the destination as it is.
+// and the result is the destination with a reference for the caller, or nil, also when a row can't be
+// reached. Each plane is treated by itself, alpha like a colour. A group that a filter doesn't serve leaves
+// the destination as it is.
 
 /// Sums up the samples around each sample, weighted by a square of numbers, row by row, whose middle is the
 /// sample itself; an even square has one more row and column before the sample than behind it. Beyond the
@@ -98,8 +99,8 @@ PictureZOR* BoxBlurFractionalFilter(PictureZOR* self, PictureZOR* dest, Double r
 
 /// The mean of the most frequent among `levels` classes of values, the lowest of them on a tie, within
 /// `range` pixels around each sample, as far as there are any. `levels` below 1 count as 1, above 256 as 256;
-/// a negative range counts as 0. Nil for a `dest` with another `PixelSize`; one that shares memory with the
-/// source as in ApplyMatrix.
+/// a negative range counts as 0. Nil for a given `dest` with another `PixelSize`; one that shares memory with
+/// the source as in ApplyMatrix.
 PictureZOR* OilFilter(PictureZOR* self, PictureZOR* dest, Integer levels, Integer range);
 /// Each pixel comes from a place up to `level` columns and rows away, chosen by the process's `rand`, or from
 /// the edge where that is nearer; a negative level counts as 0. For gray and RGB. A `dest` that shares memory

@@ -27,18 +27,20 @@ class FractionalBlur {
         Of(blend),
         Pixel(Packing.Count()),
         Band(call.Source, Packing, 1, 1, 0),
-        Line(NewBuffer(std::size_t(Packing.Samples() + 2 * Pixel))),
+        Line(NewBuffer(std::size_t(Packing.Samples()) + 2 * std::size_t(Pixel))),
         Result(NewBuffer(std::size_t(Packing.Samples()))) {}
 
-  void Run() {
+  /// False when a row can't be reached. Without memory nothing is done.
+  bool Run() {
+    if (!Band || !Line || !Result) return true;
     const std::int32_t height = Call.Source.Height;
-    bool reached = Band && Line && Result;
-    // The rows go along only after all have gone down, which shows where the source is written meanwhile.
+    bool reached = true;
+    // The rows go along only after all have gone down, which shows where they overlap or are the source's.
     for (std::int32_t y = 0; reached && y < height; ++y)
       reached = Down(y) && (Call.SharesPixels ? Store(y) : Along(y));
-    if (!Call.SharesPixels) return;
-    for (std::int32_t y = 0; reached && y < height; ++y)
+    for (std::int32_t y = 0; Call.SharesPixels && reached && y < height; ++y)
       reached = WithRow(Call.Dest, y, [&](Sample* row) { Packing.LoadDest(row, First()); }) && Along(y);
+    return reached;
   }
 
  private:
@@ -81,7 +83,7 @@ PictureZOR* BoxBlurFractionalFilter(PictureZOR* self, PictureZOR* dest, Double r
   Held result{RunFilter(self, dest, {}, [&](const FilterCall& call) {
     served = true;
     const double fraction = radius - std::floor(radius), f = std::isnan(fraction) ? 0 : fraction;
-    if (call.Source.Width > 0) FractionalBlur(call, {f, 1.0 / (f + f + 1.0)}).Run();
+    return call.Source.Width < 1 || FractionalBlur(call, {f, 1.0 / (f + f + 1.0)}).Run();
   })};
   return served ? result.HandOn() : nullptr;
 }

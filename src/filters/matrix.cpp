@@ -1,6 +1,7 @@
 #include <cmath>
 #include <cstdlib>
 #include <limits>
+#include <optional>
 #include <type_traits>
 
 #include "filters/filters.h"
@@ -100,15 +101,16 @@ float SingleFactor(double scaleFactor, std::int64_t bound) {
   return 0;
 }
 
-/// Sums of a type that holds them, a stretch of the row at a time. False without memory, and nothing is done.
+/// Sums of a type that holds them, a stretch of the row at a time. False when a row can't be reached; without
+/// memory nothing, and nothing is done.
 template <class Sum, class Product>
-bool ConvolveRows(const FilterCall& call, const Matrix& matrix) {
+std::optional<bool> ConvolveRows(const FilterCall& call, const Matrix& matrix) {
   constexpr std::ptrdiff_t Stretch = 2048;
   const PackedRows packing(call);
   const std::int32_t dimension = matrix.Dimension, half = matrix.Half(), pixel = packing.Count();
   PackedBand band(call.Source, packing, half, std::max(dimension - 1 - half, 0), half);
   const Buffer result = NewBuffer(std::size_t(packing.Samples()));
-  if (!band || !result) return false;
+  if (!band || !result) return std::nullopt;
   const float single = SingleFactor(matrix.ScaleFactor, matrix.Bound());
   alignas(64) Sum sums[Stretch];
   const auto convolve = [&](std::int32_t y, std::ptrdiff_t first, std::ptrdiff_t count) {
@@ -155,15 +157,15 @@ bool ConvolveRows(const FilterCall& call, const Matrix& matrix) {
                   }
                 });
               });
-  return true;
+  return reached;
 }
 
-/// One pixel after the other, each reading what those before it have left.
-void ConvolvePixels(const FilterCall& call, const Matrix& matrix) {
+/// One pixel after the other, each reading what those before it have left. False when a row can't be reached.
+bool ConvolvePixels(const FilterCall& call, const Matrix& matrix) {
   const std::int32_t dimension = matrix.Dimension, half = matrix.Half();
   const std::int32_t lastColumn = call.Source.Width - 1, lastRow = call.Source.Height - 1;
+  bool reached = true;
   ForPlaneCount(call.In.Count, [&](auto n) {
-    bool reached = true;
     for (std::int32_t y = 0; reached && y <= lastRow; ++y)
       for (std::int32_t x = 0; reached && x <= lastColumn; ++x) {
         std::int64_t sum[n];
@@ -182,9 +184,10 @@ void ConvolvePixels(const FilterCall& call, const Matrix& matrix) {
                   });
       }
   });
+  return reached;
 }
 
-bool Convolve(const FilterCall& call, const Matrix& matrix) {
+std::optional<bool> ConvolveRows(const FilterCall& call, const Matrix& matrix) {
   using std::int16_t, std::int32_t, std::int64_t;
   constexpr std::int64_t narrow = std::numeric_limits<int16_t>::max(),
                          middle = std::numeric_limits<int32_t>::max();
@@ -192,7 +195,6 @@ bool Convolve(const FilterCall& call, const Matrix& matrix) {
   const bool narrowProducts =
       std::all_of(std::begin(matrix.Weight), std::end(matrix.Weight),
                   [&](std::int32_t weight) { return 255 * std::abs(std::int64_t{weight}) <= narrow; });
-  if (call.SharesPixels) return false;
   if (bound <= narrow) return ConvolveRows<int16_t, int16_t>(call, matrix);
   if (bound <= middle)
     return narrowProducts ? ConvolveRows<int32_t, int16_t>(call, matrix)
@@ -207,7 +209,9 @@ PictureZOR* ApplyMatrix(PictureZOR* self, PictureZOR* dest, Integer matrixDimens
   if (matrixDimension > MostRows) return nullptr;
   const Matrix of = MatrixOf(matrixDimension, matrix, delta, scaleFactor);
   return RunFilter(self, dest, {}, [&](const FilterCall& call) {
-    if (!Convolve(call, of)) ConvolvePixels(call, of);
+    if (!call.SharesPixels)
+      if (const auto reached = ConvolveRows(call, of)) return *reached;
+    return ConvolvePixels(call, of);
   });
 }
 

@@ -32,7 +32,7 @@ PictureZOR* NeonFilter(PictureZOR* self, PictureZOR* dest) {
     const PackedRows packing(call);
     const std::int32_t height = call.Source.Height;
     const std::ptrdiff_t samples = packing.Samples(), pixel = packing.Count();
-    const std::size_t bytes = std::size_t(samples + pixel);
+    const std::size_t bytes = std::size_t(samples) + std::size_t(pixel);
     Buffer current = NewBuffer(bytes), next = NewBuffer(bytes);
     const Buffer result = NewBuffer(bytes);
     const auto load = [&](std::int32_t y, Sample* into) {
@@ -42,7 +42,8 @@ PictureZOR* NeonFilter(PictureZOR* self, PictureZOR* dest) {
           into[samples + c] = Behind(call.Source, row, packing.SourcePlanes(), c);
       });
     };
-    bool reached = current && next && result && load(0, current.get());
+    if (!current || !next || !result) return true;
+    bool reached = load(0, current.get());
     for (std::int32_t y = 0; reached && y < height; ++y) {
       if (y + 1 < height)
         reached = load(y + 1, next.get());
@@ -56,6 +57,7 @@ PictureZOR* NeonFilter(PictureZOR* self, PictureZOR* dest) {
                 });
       current.swap(next);
     }
+    return reached;
   });
 }
 

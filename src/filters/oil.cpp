@@ -58,9 +58,7 @@ bool Oil(const FilterCall& call, std::int32_t levels, std::int32_t range) {
 }
 
 PictureZOR* OilFilter(PictureZOR* self, PictureZOR* dest, Integer levels, Integer range) {
-  if (dest && GroupOf(DataOf(self)) != Group::None && DataOf(dest).PixelSize != DataOf(self).PixelSize)
-    return nullptr;
-  return RunFilter(self, dest, {}, [&](const FilterCall& call) {
+  return RunFilter(self, dest, {.SamePixelSize = true}, [&](const FilterCall& call) {
     return Oil(call, std::clamp(levels, 1, 256), std::max(range, 0));
   });
 }

@@ -1,5 +1,3 @@
-#include <limits>
-
 #include "filters/oil_rows.h"
 #include "filters/packed_rows.h"
 #include "image/targets.h"
@@ -77,10 +75,8 @@ std::optional<bool> OilRows(const FilterCall& call, std::int32_t levels, std::in
   const std::ptrdiff_t classes = (levels + 31) / 32 * 32, samples = packing.Samples(),
                        pixel = packing.Count();
   const std::int64_t cells = (std::int64_t{samples} + pixel) * classes;
-  if (cells > std::numeric_limits<std::ptrdiff_t>::max() / std::int64_t(sizeof(ColumnSum)))
-    return std::nullopt;
-  const Buffer counts = NewBuffer(std::size_t(cells) * sizeof(Count)),
-               columnSums = NewBuffer(SingleValues ? 1 : std::size_t(cells) * sizeof(ColumnSum)),
+  const Buffer counts = NewBuffer(cells, sizeof(Count)),
+               columnSums = NewBuffer(SingleValues ? 1 : cells, sizeof(ColumnSum)),
                line = NewBuffer(std::size_t(samples)), result = NewBuffer(std::size_t(samples));
   if (!counts || !columnSums || !line || !result) return std::nullopt;
   Count* const count = reinterpret_cast<Count*>(counts.get());

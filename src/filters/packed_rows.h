@@ -54,8 +54,8 @@ class PackedBand {
         Before(before),
         After(after),
         Margin(std::ptrdiff_t{margin} * packing.Count()),
-        RowBytes(std::size_t(packing.Samples() + 2 * Margin)),
-        Memory(NewBuffer((std::size_t(before) + std::size_t(after) + 1) * RowBytes)) {}
+        RowBytes(std::size_t(packing.Samples()) + 2 * std::size_t(Margin)),
+        Memory(NewBuffer(std::int64_t{before} + after + 1, std::int64_t(RowBytes))) {}
   explicit operator bool() const { return Memory != nullptr; }
 
   /// Makes the rows around y available; y is 0 first, then one more each time. False when a row can't be

@@ -15,6 +15,9 @@ struct FilterRules {
   bool InPlace = true;
   /// Whether the result is as wide as the source is high.
   bool Turned = false;
+  /// Whether the pixels of a given `dest` must be of the size of the source's. Those of a new picture for a
+  /// view of wider pixels never are.
+  bool SamePixelSize = false;
 };
 
 /// A filter's two pictures, both usable, with the planes of the source's group in each.
@@ -22,15 +25,17 @@ struct FilterCall {
   PictureData &Source, &Dest;
   Group Of;
   PlaneList In, Out;
-  /// Whether what is written may show in the source. Then the order of reading and writing, pixel by pixel,
-  /// makes the result, and a form with another order steps aside.
+  /// Whether what is written may show in the source, or in other rows of the destination, as in a caller's
+  /// block with less than a row from one row to the next. Then the order of reading and writing, pixel by
+  /// pixel, makes the result, and a form with another order steps aside.
   bool SharesPixels;
 };
 
 /// The way into every method with a `dest`. Takes `dest`, or makes a picture of the source's size and format,
 /// and runs body once if the source's group is served. The result is the destination with a reference for the
 /// caller. Nil when a picture isn't usable, when `dest` is smaller than the result or lacks a plane that
-/// would be written, when it is the source and may not be, or when a body that gives a Boolean gives false.
+/// would be written, when it is the source and may not be, or when a body that gives a Boolean gives false:
+/// a row can't be reached then, and what was written until then stays.
 template <class Body>
 PictureZOR* RunFilter(PictureZOR* self, PictureZOR* dest, const FilterRules& rules, Body&& body) {
   PictureData& source = DataOf(self);
@@ -45,10 +50,16 @@ PictureZOR* RunFilter(PictureZOR* self, PictureZOR* dest, const FilterRules& rul
   Group group = GroupOf(source);
   if (rules.Groups == FilterRules::GrayAndRGB && group >= Group::CMYK) group = Group::None;
   if (!HasPlanes(group, into, rules.WritesAlpha)) return nullptr;
+  if (rules.SamePixelSize && dest && group != Group::None && into.PixelSize != source.PixelSize)
+    return nullptr;
   MayYield(into);
   if (group == Group::None) return result.HandOn();
-  const FilterCall call{
-      source, into, group, PlanesOf(group, source), PlanesOf(group, into), SharePixels(source, into)};
+  const FilterCall call{source,
+                        into,
+                        group,
+                        PlanesOf(group, source),
+                        PlanesOf(group, into),
+                        SharePixels(source, into) || !RowsAreApart(into)};
   if constexpr (std::is_void_v<decltype(body(call))>)
     body(call);
   else if (!body(call))

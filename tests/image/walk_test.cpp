@@ -9,35 +9,6 @@
 namespace picturezor {
 namespace {
 
-// Catches a row kept over a window move, and an edge that isn't repeated.
-TEST(RowBand, HoldsTheRowsAround) {
-  for (const int reach : {0, 1, 3, 12})
-    ForEveryStore(3, 9, Format::GA, [&](const Picture& picture) {
-      SetPacked(picture, Noise(21).Many(54));
-      const std::vector<Samples> rows = StoredRows(picture);
-      zor::RowBand band(DataOf(picture), reach);
-      for (int y = 0; y < 9; ++y) {
-        ASSERT_TRUE(band.MoveTo(y));
-        for (int r = y - reach; r <= y + reach; ++r) {
-          const Samples& row = rows[std::size_t(std::clamp(r, 0, 8))];
-          EXPECT_EQ(Samples(band[r], band[r] + row.size()), row) << y << " " << r;
-        }
-      }
-    });
-}
-
-// In a caller's block a row may be longer than the way to the next one.
-TEST(RowBand, HoldsRowsThatOverlap) {
-  const MemoryBlock block(Noise(23).Many(4 * 5 + 9));
-  const Picture picture(block, 3, 6, Format::RGB, 4);
-  zor::RowBand band(DataOf(picture), 1);
-  for (int y = 0; y < 6; ++y) {
-    ASSERT_TRUE(band.MoveTo(y));
-    const auto row = block.Data().subspan(std::size_t(y) * 4, 9);
-    EXPECT_EQ(Samples(band[y], band[y] + 9), Samples(row.begin(), row.end())) << y;
-  }
-}
-
 // A walk that reads what it has written gives the same on a window that moves as in memory.
 TEST(Walk, ReadsAndWritesOnePicture) {
   for (const int down : {1, 2, 6})
@@ -65,7 +36,6 @@ TEST(Walk, EndsAtARowThatCantBeReached) {
   EXPECT_FALSE(zor::Walk(zor::From(data)).Rows(12, [&](std::int32_t, std::uint8_t*) { ++done; }));
   EXPECT_EQ(done, 5);
   EXPECT_FALSE(zor::WithRow(data, 11, [&](std::uint8_t*) { ++done; }));
-  EXPECT_FALSE(zor::RowBand(data, 1).MoveTo(0));
   EXPECT_EQ(done, 5);
   data.RowsPerBlock = rows;
   EXPECT_TRUE(zor::WithRow(data, 11, [](std::uint8_t*) {})) << "the next call tries again";

@@ -1,5 +1,7 @@
 #include "support/area_filter.h"
 
+#include "support/every_target.h"
+
 namespace picturezor {
 namespace {
 
@@ -115,6 +117,21 @@ void ExpectLikeModel(const AreaFilter& filter, std::initializer_list<std::pair<i
         SCOPED_TRACE(std::to_string(picture.Width()) + " x " + std::to_string(picture.Height()));
         ExpectLikeModel(filter, picture, noise);
       });
+  }
+}
+
+void ExpectLikeModelOnEveryTarget(const AreaFilter& filter, Format format,
+                                  std::initializer_list<std::pair<int, int>> sizes) {
+  const unsigned seed = std::random_device{}();
+  for (const auto& [width, height] : sizes) {
+    SCOPED_TRACE(testing::Message() << width << " x " << height << ", seed " << seed);
+    const Picture picture(width, height, format);
+    FillWithNoise(picture, seed);
+    const Planar source = PlanesIn(picture, width, height);
+    Planar wanted = source;
+    filter.Model(source, wanted);
+    ForEveryTarget(
+        [&, w = width, h = height] { EXPECT_EQ(PlanesIn(filter.Run(picture, {}), w, h).Of, wanted.Of); });
   }
 }
 

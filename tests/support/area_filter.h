@@ -41,4 +41,8 @@ struct AreaFilter {
 /// pictures, larger ones with another order of planes, and the source itself.
 void ExpectLikeModel(const AreaFilter& filter, std::initializer_list<std::pair<int, int>> sizes);
 
+/// Compares a filter with its model on noise for every instruction set.
+void ExpectLikeModelOnEveryTarget(const AreaFilter& filter, Format format,
+                                  std::initializer_list<std::pair<int, int>> sizes);
+
 }
