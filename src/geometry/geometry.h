@@ -19,7 +19,8 @@ void Rotate180(PictureZOR* self);
 PictureZOR* Rotate180(PictureZOR* self, PictureZOR* dest);
 
 /// A quarter turn counter-clockwise: the source's top right pixel comes to the top left. `dest` is as wide as
-/// the source is high. In tiles of rows that are in the address space at the same time.
+/// the source is high. In tiles of rows that are in the address space at the same time; where rows of `dest`
+/// overlap, as they may in a caller's block, the samples end as the slow form leaves them.
 PictureZOR* Rotate90(PictureZOR* self, PictureZOR* dest);
 /// A quarter turn clockwise: the source's bottom left pixel comes to the top left.
 PictureZOR* Rotate270(PictureZOR* self, PictureZOR* dest);
@@ -33,7 +34,8 @@ PictureZOR* Rotate270slow(PictureZOR* self, PictureZOR* dest);
 /// itself with one more reference. Others are three shears, which split each sample between two neighbours
 /// and so blur a little; alpha is sheared like the colours, which are not weighted by it. Nil for an angle
 /// that is infinite or not a number, for a picture that isn't usable or has no colour family, and when one of
-/// the three pictures can't be made or is the source's own store.
+/// the three pictures can't be made, has rows that overlap or is the source's own store. They come from the
+/// source's factory.
 PictureZOR* Rotate(PictureZOR* self, Double angle, Integer Red, Integer Green, Integer Blue, Integer Alpha,
                    Integer Gray, Integer Cyan, Integer Magenta, Integer Yellow, Integer Black);
 

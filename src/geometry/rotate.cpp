@@ -28,11 +28,12 @@ Buffer Shifts(std::int32_t count, Distance&& distance) {
 }
 const Shift* In(const Buffer& shifts) { return reinterpret_cast<const Shift*>(shifts.get()); }
 
-/// The rotation of one picture.
+/// The rotation of one picture. New pictures come from the factories of the one that was asked, also where an
+/// exact turn has made another one of it first.
 class Rotation {
  public:
-  Rotation(PictureData& base, double angle, const std::array<Sample, 5>& background)
-      : Base(base), Of(GroupOf(base)), Background(background) {
+  Rotation(const PictureData& asked, PictureData& base, double angle, const std::array<Sample, 5>& background)
+      : Asked(asked), Base(base), Of(GroupOf(base)), Background(background) {
     const double theta = angle * Pi / 180.0;
     S = Sine(theta);
     T = Tangent(theta * 0.5);
@@ -56,16 +57,17 @@ class Rotation {
 
  private:
   /// A picture for a shear of `source`, in its format. None where it can't hold the result, or where writing
-  /// it would write what is read.
+  /// it would write what is read, or one of its rows where another one is.
   Held NewPicture(const PictureData& source, double width, double height) const {
     constexpr double most = std::numeric_limits<std::int32_t>::max();
     if (width > most || height > most) return Held{nullptr};
     Held made{
-        CreatePictureThroughFactory(&Base, std::int32_t(width), std::int32_t(height), source.ImageFormat)};
+        CreatePictureThroughFactory(&Asked, std::int32_t(width), std::int32_t(height), source.ImageFormat)};
     if (!made) return made;
     PictureData& data = made.Data();
     if (!Usable(data) || data.Width < width || data.Height < height || !HasPlanes(Of, data, true) ||
-        SharePixels(data, source) || SharePixels(data, Base))
+        !RowsAreApart(data) || SharePixels(data, source) || SharePixels(data, Base) ||
+        SharePixels(data, Asked))
       return Held{nullptr};
     MayYield(data);
     return made;
@@ -94,6 +96,7 @@ class Rotation {
     return shifts && ShearRows(Between(from, into), In(shifts), height);
   }
 
+  const PictureData& Asked;
   PictureData& Base;
   Group Of;
   std::array<Sample, 5> Background;
@@ -146,7 +149,7 @@ PictureZOR* Rotate(PictureZOR* self, Double angle, Integer Red, Integer Green, I
     return {};
   }();
   if (GroupOf(base.Data()) == Group::None) return nullptr;
-  return Rotation(base.Data(), angle, background).Run();
+  return Rotation(DataOf(self), base.Data(), angle, background).Run();
 }
 
 }

@@ -219,10 +219,11 @@ class ColumnRuns {
     StoreBlock(taken, given);
     for (std::ptrdiff_t i = 0; i < BlockBytes; ++i)
       taken[i] = Sample(Multiplier{High[at + i], Low[at + i]}(taken[i]));
-    OnBestTarget<ShearLanes>(in + (before + 1 - firstRow) * from.Stride, from.Stride,
-                             out + (first - top) * into.Stride, into.Stride, std::ptrdiff_t(end - first),
-                             static_cast<const std::uint16_t*>(High + at),
-                             static_cast<const std::uint16_t*>(Low + at), taken);
+    if (first < end)
+      OnBestTarget<ShearLanes>(in + (before + 1 - firstRow) * from.Stride, from.Stride,
+                               out + (first - top) * into.Stride, into.Stride, std::ptrdiff_t(end - first),
+                               static_cast<const std::uint16_t*>(High + at),
+                               static_cast<const std::uint16_t*>(Low + at), taken);
     for (std::int64_t y = end; y < bottom; ++y) StoreBlock(out + (y - top) * into.Stride, filled);
     if (end == shift + height && end >= top && end < bottom)
       for (std::ptrdiff_t i = 0; i < BlockBytes && at + i < RowBytes; ++i)

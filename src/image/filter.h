@@ -39,12 +39,12 @@ struct FilterCall {
 template <class Body>
 PictureZOR* RunFilter(PictureZOR* self, PictureZOR* dest, const FilterRules& rules, Body&& body) {
   PictureData& source = DataOf(self);
-  if (!Usable(source) || (dest == self && !rules.InPlace)) return nullptr;
+  if (!Usable(source)) return nullptr;
   MayYield(source);
   const std::int32_t width = rules.Turned ? source.Height : source.Width;
   const std::int32_t height = rules.Turned ? source.Width : source.Height;
   Held result{dest ? Locked(dest) : CreatePictureThroughFactory(&source, width, height, source.ImageFormat)};
-  if (!result) return nullptr;
+  if (!result || (result.Object() == self && !rules.InPlace)) return nullptr;
   PictureData& into = result.Data();
   if (!Usable(into) || into.Width < width || into.Height < height) return nullptr;
   Group group = GroupOf(source);

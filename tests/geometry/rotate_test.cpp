@@ -168,10 +168,12 @@ TEST(Rotate, TakesItsPicturesFromTheFactory) {
     });
     const StoredPicture file(StoredPicture::Mapped, w, h, Format::RGB);
     SetPacked(file.Get(), pixels);
-    // What an exact turn made first has no factory of its own.
-    PictureFactory::SetFactory(mapped);
+    // Also where an exact turn comes first.
+    kept.clear();
+    file.Get().SetFactory(mapped);
     const Picture onFiles = file.Get().Rotate(angle, Corners);
-    PictureFactory::SetFactory({});
+    file.Get().SetFactory({});
+    EXPECT_EQ(kept.size(), angle == 100 ? 4u : 3u);
     ASSERT_TRUE(onFiles);
     EXPECT_TRUE(onFiles.IsMapping());
     EXPECT_EQ(Packed(onFiles), Packed(wanted));
@@ -197,7 +199,11 @@ TEST(Rotate, RefusesPicturesThatDontServe) {
   const std::function<Picture(int, int, Format)> makers[] = {
       [&](int, int, Format) { return whole; }, [&](int, int, Format) { return whole.ClipImage(); },
       [](int width, int height, Format) { return Picture(width, height, Format::G); },
-      [same = Picture(80, 80, Format::RGB)](int, int, Format) { return same; }};
+      [same = Picture(80, 80, Format::RGB)](int, int, Format) { return same; },
+      // Its rows overlap.
+      [](int width, int height, Format) {
+        return Picture(MemoryBlock(std::size_t(width * (height + 2))), width, height, Format::RGB, width);
+      }};
   for (std::size_t i = 0; i < std::size(makers); ++i) {
     const PictureFactory factory(makers[i]);
     picture.SetFactory(factory);
