@@ -2,6 +2,10 @@
 #include <cstring>
 #include <utility>
 
+#ifdef __SSE2__
+#include <emmintrin.h>
+#endif
+
 #include "image/picture_data.h"
 #include "image/targets.h"
 
@@ -12,6 +16,8 @@ namespace zor {
 
 using Block = Sample __attribute__((vector_size(16)));
 constexpr std::ptrdiff_t BlockBytes = 16;
+/// The same as four lanes.
+using Quads = std::uint32_t __attribute__((vector_size(16)));
 
 inline Block LoadBlock(const Sample* from) {
   Block block;
@@ -20,13 +26,40 @@ inline Block LoadBlock(const Sample* from) {
 }
 inline void StoreBlock(Sample* into, Block block) { std::memcpy(into, &block, BlockBytes); }
 
-/// Byte j of the result is byte Pick(j) of a and b in a row, 0 to 31.
-template <auto Pick>
-Block Shuffled(Block a, Block b) {
+constexpr std::ptrdiff_t CacheLine = 64;
+/// How far an address is behind the start of its cache line.
+inline std::ptrdiff_t InCacheLine(const Sample* at) {
+  return std::ptrdiff_t(reinterpret_cast<Word>(at) % CacheLine);
+}
+
+/// Asks for the cache line of an address, which may be anywhere.
+inline void Prefetch(const Sample* from, std::ptrdiff_t ahead) {
+  __builtin_prefetch(reinterpret_cast<const void*>(reinterpret_cast<Word>(from) + Word(ahead)));
+}
+
+/// Stores a block past the caches where the machine can, so that a line isn't read before it is written. All
+/// blocks of a cache line in a row, from its start on; and `EndStream` after the last one.
+inline void StreamBlock(Sample* into, Block block) {
+#ifdef __SSE2__
+  _mm_stream_si128(reinterpret_cast<__m128i*>(into), __m128i(block));
+#else
+  StoreBlock(into, block);
+#endif
+}
+/// Lets other threads see what was streamed.
+inline void EndStream() {
+#ifdef __SSE2__
+  _mm_sfence();
+#endif
+}
+
+/// Element j of the result is element Pick(j) of a and b in a row.
+template <auto Pick, class Vector>
+Vector Shuffled(Vector a, Vector b) {
   return [&]<std::size_t... J>(std::index_sequence<J...>) {
     return __builtin_shufflevector(a, b, Pick(int(J))...);
   }
-  (std::make_index_sequence<BlockBytes>{});
+  (std::make_index_sequence<sizeof(Vector) / sizeof(a[0])>{});
 }
 
 /// Whether bytes are shuffled in one instruction.

@@ -43,7 +43,9 @@ struct Tile {
     return WithRows({Call.Source, Source.Y, Source.Height}, {Call.Dest, FirstDestRow(), Source.Width},
                     [&](const RowRun& from, const RowRun& into) {
                       const Transposition pixels = Between(from, into);
-                      Call.SharesPixels ? InOrder(pixels) : Transpose(pixels, Call.In, Call.Out);
+                      // Where what is written shows in other places too, the order makes the result.
+                      const bool free = !Call.SharesPixels && RowsAreApart(Call.Dest);
+                      free ? Transpose(pixels, Call.In, Call.Out) : InOrder(pixels);
                     });
   }
   /// Row by row from the top, pixel by pixel from the left.

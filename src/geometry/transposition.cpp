@@ -4,35 +4,41 @@
 
 #include "geometry/blocks.h"
 
-// Written rows take whole cache lines, and the band of source rows that they come from is read from left to
-// right. Gray goes in squares of 16 x 16, wider pixels in squares of 4 x 4 with each pixel in a lane of 4
-// bytes.
+// A band of rows becomes a band of columns, which takes whole cache lines of each row that is written. It
+// goes through squares in registers: 16 x 16 for gray, 4 x 4 for wider pixels, each of them in a lane of 4
+// bytes. A large result is streamed to memory, line by line: a line isn't read to be overwritten, and needs
+// no place in the caches, where a column of lines would push each other out. Where the rows or columns are no
+// multiple of a band or a piece, the last one starts earlier and writes some samples a second time.
 
 namespace zor {
 namespace {
 
-/// Rows of a band.
-constexpr std::ptrdiff_t Band = 64;
+/// Rows of a band: they fill whole cache lines, however many bytes a pixel has.
+constexpr int Band = 64;
+/// Columns that are done through all bands before the next ones: written rows whose pages are in use.
+constexpr std::ptrdiff_t Strip = 1024;
+/// Bytes that a source row is asked for ahead.
+constexpr std::ptrdiff_t Ahead = 128;
+/// A result of so many bytes leaves no room in the caches for itself and its source.
+constexpr std::ptrdiff_t Streamed = 8 << 20;
 
-/// Of two vectors, the low or the high halves, alternating by Unit bytes.
-template <int Unit, int Half>
+/// Of two vectors, the elements of the low or the high halves by turns.
+template <int Side, int Half>
 constexpr int Interleaved(int j) {
-  const int unit = j / Unit;
-  return unit % 2 * int(BlockBytes) + Half * int(BlockBytes) / 2 + unit / 2 * Unit + j % Unit;
+  return j % 2 * Side + Half * Side / 2 + j / 2;
 }
 
-/// Transposes a square of Units, BlockBytes / Unit of them on each side. A stage interleaves the rows of the
-/// first half with those of the second.
-template <int Unit>
-void TransposeSquare(Block (&rows)[BlockBytes / Unit]) {
-  constexpr int side = int(BlockBytes) / Unit;
-  for (int stage = 1; stage < side; stage *= 2) {
-    Block mixed[side];
-    for (int i = 0; i < side / 2; ++i) {
-      mixed[2 * i] = Shuffled<Interleaved<Unit, 0>>(rows[i], rows[i + side / 2]);
-      mixed[2 * i + 1] = Shuffled<Interleaved<Unit, 1>>(rows[i], rows[i + side / 2]);
+/// Transposes a square. A stage interleaves the rows of the first half with those of the second.
+template <class Vector, int Side>
+void TransposeSquare(Vector (&rows)[Side]) {
+  for (int stage = 1; stage < Side; stage *= 2) {
+    Vector mixed[Side];
+    for (int i = 0; i < Side / 2; ++i) {
+      mixed[2 * i] = Shuffled<Interleaved<Side, 0>>(rows[i], rows[i + Side / 2]);
+      mixed[2 * i + 1] = Shuffled<Interleaved<Side, 1>>(rows[i], rows[i + Side / 2]);
     }
-    std::copy_n(mixed, side, rows);
+    // One by one, so that they stay in registers.
+    for (int i = 0; i < Side; ++i) rows[i] = mixed[i];
   }
 }
 
@@ -45,48 +51,90 @@ constexpr int Packed(int j) {
   return (pixel / 4 - Third) * int(BlockBytes) + pixel % 4 * 4 + byte % 3;
 }
 
-/// Rows of a square, and columns.
+/// Rows of a piece, and columns.
+constexpr int PieceHeight = 16;
 template <int Step>
-constexpr int SquareHeight = 16;
-template <int Step>
-constexpr int SquareWidth = Step == 1 ? 16 : 4;
+constexpr int PieceWidth = Step == 1 ? 16 : 4;
 
 template <int Step>
 void TransposePiece(const Sample* from, std::ptrdiff_t fromStride, Sample* into, std::ptrdiff_t intoStride) {
   if constexpr (Step == 1) {
     Block rows[16];
     for (int y = 0; y < 16; ++y) rows[y] = LoadBlock(from + y * fromStride);
-    TransposeSquare<1>(rows);
+    TransposeSquare(rows);
     for (int x = 0; x < 16; ++x) StoreBlock(into + x * intoStride, rows[x]);
   } else {
-    Block squares[4][4];
-    for (int y = 0; y < 16; ++y) {
+    Quads squares[4][4];
+    for (int y = 0; y < PieceHeight; ++y) {
       const Block row = LoadBlock(from + y * fromStride);
-      squares[y / 4][y % 4] = Step == 3 ? Shuffled<Spread>(row, row) : row;
+      squares[y / 4][y % 4] = Quads(Step == 3 ? Shuffled<Spread>(row, row) : row);
     }
-    for (auto& square : squares) TransposeSquare<4>(square);
+    for (auto& square : squares) TransposeSquare(square);
     for (int x = 0; x < 4; ++x) {
       Sample* row = into + x * intoStride;
+      const auto pixels = [&](int i) { return Block(squares[i][x]); };
       if constexpr (Step == 4) {
-        for (int i = 0; i < 4; ++i) StoreBlock(row + i * BlockBytes, squares[i][x]);
+        for (int i = 0; i < 4; ++i) StoreBlock(row + i * BlockBytes, pixels(i));
       } else {
-        StoreBlock(row, Shuffled<Packed<0>>(squares[0][x], squares[1][x]));
-        StoreBlock(row + BlockBytes, Shuffled<Packed<1>>(squares[1][x], squares[2][x]));
-        StoreBlock(row + 2 * BlockBytes, Shuffled<Packed<2>>(squares[2][x], squares[3][x]));
+        StoreBlock(row, Shuffled<Packed<0>>(pixels(0), pixels(1)));
+        StoreBlock(row + BlockBytes, Shuffled<Packed<1>>(pixels(1), pixels(2)));
+        StoreBlock(row + 2 * BlockBytes, Shuffled<Packed<2>>(pixels(2), pixels(3)));
       }
     }
   }
 }
 
-/// The part of a rectangle that whole pieces cover, whose sides are multiples of a piece's.
+/// Columns of a band, from left to right.
+template <int Step, int Rows>
+void TransposeBand(const Sample* from, std::ptrdiff_t fromStride, Sample* into, std::ptrdiff_t intoStride,
+                   std::ptrdiff_t width, bool streamed) {
+  constexpr int columns = PieceWidth<Step>, bytes = Rows * Step;
+  for (std::ptrdiff_t next = 0; next < width; next += columns) {
+    const std::ptrdiff_t x = std::min(next, width - columns);
+    alignas(CacheLine) Sample lines[columns * bytes];
+    for (int y = 0; y < Rows; y += PieceHeight) {
+      const Sample* piece = from + y * fromStride + x * Step;
+      if (x * Step % CacheLine < columns * Step)
+        for (int i = 0; i < PieceHeight; ++i) Prefetch(piece + i * fromStride, Ahead);
+      TransposePiece<Step>(piece, fromStride, lines + y * Step, bytes);
+    }
+    for (int column = 0; column < columns; ++column) {
+      Sample* row = into + (x + column) * intoStride;
+      const Sample* line = lines + column * bytes;
+      for (int i = 0; i < bytes; i += int(BlockBytes))
+        streamed ? StreamBlock(row + i, LoadBlock(line + i)) : StoreBlock(row + i, LoadBlock(line + i));
+    }
+  }
+}
+
+/// All rows of the columns that pieces cover, at least a piece wide and a band high.
+/// Bands from `firstStreamed` on are streamed, unless it is negative.
+template <int Step, int Rows>
+void TransposeBands(const Sample* from, std::ptrdiff_t fromStride, Sample* into, std::ptrdiff_t intoStride,
+                    std::ptrdiff_t width, std::ptrdiff_t height, std::ptrdiff_t firstStreamed) {
+  for (std::ptrdiff_t next = 0; next < width; next += Strip) {
+    const std::ptrdiff_t left = std::min<std::ptrdiff_t>(next, width - PieceWidth<Step>);
+    const std::ptrdiff_t columns = std::min(Strip, width - left);
+    const auto band = [&](std::ptrdiff_t top, bool streamed) {
+      TransposeBand<Step, Rows>(from + top * fromStride + left * Step, fromStride,
+                                into + left * intoStride + top * Step, intoStride, columns, streamed);
+    };
+    if (firstStreamed > 0) band(0, false);
+    std::ptrdiff_t top = std::max<std::ptrdiff_t>(firstStreamed, 0);
+    for (; top + Rows <= height; top += Rows) band(top, firstStreamed >= 0);
+    if (top < height) band(height - Rows, false);
+  }
+  EndStream();
+}
+
+/// The first pixel of a written row that starts a cache line, as it does in all rows; -1 where there is none
+/// or the result is small.
 template <int Step>
-void TransposePieces(const Sample* from, std::ptrdiff_t fromStride, Sample* into, std::ptrdiff_t intoStride,
-                     std::ptrdiff_t width, std::ptrdiff_t height) {
-  for (std::ptrdiff_t top = 0; top < height; top += Band)
-    for (std::ptrdiff_t x = 0; x < width; x += SquareWidth<Step>)
-      for (std::ptrdiff_t y = top; y < std::min(top + Band, height); y += SquareHeight<Step>)
-        TransposePiece<Step>(from + y * fromStride + x * Step, fromStride, into + x * intoStride + y * Step,
-                             intoStride);
+std::ptrdiff_t FirstStreamed(const Sample* into, std::ptrdiff_t stride, std::ptrdiff_t bytes) {
+  if (bytes < Streamed || stride % CacheLine != 0) return -1;
+  for (std::ptrdiff_t x = 0; x < CacheLine; ++x)
+    if (InCacheLine(into + x * Step) == 0) return x;
+  return -1;
 }
 
 /// Any layouts, in squares that stay in the cache.
@@ -104,27 +152,29 @@ void TransposePlain(const Transposition& pixels, const PlaneList& in, const Plan
       }
 }
 
-/// Takes whole pieces and gives back what is left: the columns at the right, and the rows below.
+/// In pieces where they fit; the rest plainly.
 template <int Step>
 void TransposeInPieces(const Transposition& pixels, const PlaneList& in, const PlaneList& out) {
-  // A row of the last piece is read to the end of its 16 bytes.
-  const std::ptrdiff_t readable =
-      pixels.Width - (BlockBytes / Step - SquareWidth<Step> + (Step == 3 ? 1 : 0));
-  const std::ptrdiff_t width = std::max<std::ptrdiff_t>(readable, 0) / SquareWidth<Step> * SquareWidth<Step>;
-  const std::ptrdiff_t height = pixels.Height / SquareHeight<Step> * SquareHeight<Step>;
-  OnBestTarget<TransposePieces<Step>>(static_cast<const Sample*>(pixels.From + FirstOffset(in)),
-                                      pixels.FromStride, pixels.Into + FirstOffset(out), pixels.IntoStride,
-                                      width, height);
-  Transposition right = pixels, below = pixels;
-  right.From += width * Step;
-  right.Into += width * pixels.IntoStride;
-  right.Width -= width;
-  below.From += height * pixels.FromStride;
-  below.Into += height * Step;
-  below.Width = width;
-  below.Height -= height;
-  TransposePlain<Step>(right, in, out);
-  TransposePlain<Step>(below, in, out);
+  const Sample* from = pixels.From + FirstOffset(in);
+  Sample* into = pixels.Into + FirstOffset(out);
+  // The row of a piece is read to the end of a block.
+  const std::ptrdiff_t room = pixels.Width * Step - BlockBytes;
+  const std::ptrdiff_t covered = room < 0 ? 0 : room / Step + PieceWidth<Step>;
+  Transposition rest = pixels;
+  if (covered > 0 && pixels.Height >= Band) {
+    const std::ptrdiff_t first = FirstStreamed<Step>(into, pixels.IntoStride, covered * pixels.Height * Step);
+    OnBestTarget<TransposeBands<Step, Band>>(from, pixels.FromStride, into, pixels.IntoStride, covered,
+                                             pixels.Height, first);
+  } else if (covered > 0 && pixels.Height >= PieceHeight) {
+    OnBestTarget<TransposeBands<Step, PieceHeight>>(from, pixels.FromStride, into, pixels.IntoStride, covered,
+                                                    pixels.Height, std::ptrdiff_t{-1});
+  } else {
+    return TransposePlain<Step>(pixels, in, out);
+  }
+  rest.From += covered * Step;
+  rest.Into += covered * pixels.IntoStride;
+  rest.Width -= covered;
+  TransposePlain<Step>(rest, in, out);
 }
 
 }

@@ -13,7 +13,8 @@ struct Transposition {
   std::ptrdiff_t Width, Height;
 };
 
-/// Transposes a rectangle without common samples between its sides, in an order that is easy on the caches.
+/// Transposes a rectangle in an order that is easy on the caches. Its sides have no samples in common, and
+/// neither have the rows that are written.
 void Transpose(const Transposition& pixels, const PlaneList& in, const PlaneList& out);
 
 }

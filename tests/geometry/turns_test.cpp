@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <array>
 #include <functional>
 
 #include "geometry/planes.h"
@@ -120,6 +121,53 @@ TEST(Turns, WriteOtherOrdersAndLargerPictures) {
     }
 }
 
+// What goes through vectors, in bands, and past the caches against what goes pixel by pixel, at all the edges
+// that these have, and from and into the middle of rows.
+TEST(Turns, EndAsTheSlowForms) {
+  constexpr ImageSize sizes[] = {{6, 16}, {5, 100}, {21, 63}, {40, 64}, {17, 65}, {90, 150}, {1100, 130}};
+  constexpr ImageSize large[] = {{2950, 2900}, {1700, 1700}, {1450, 1500}};
+  const auto agree = [](const Picture& source, const ImageSize& size, int left) {
+    const Picture fast(size.Height + 9, size.Width, source.ImageFormat()), slow = fast.Clone();
+    const auto part = [&](const Picture& whole) {
+      return whole.ClipImage({left, 0, size.Height, size.Width});
+    };
+    source.Rotate90slow(part(slow));
+    ForEveryTarget([&] { EXPECT_EQ(Packed(source.Rotate90(part(fast))), Packed(part(slow))); });
+    source.Rotate270slow(part(slow));
+    ForEveryTarget([&] { EXPECT_EQ(Packed(source.Rotate270(part(fast))), Packed(part(slow))); });
+    EXPECT_EQ(StoredRows(fast), StoredRows(slow));
+  };
+  for (std::size_t i = 0; i < 3; ++i) {
+    const Format format = std::array{Format::G, Format::RGB, Format::RGBA}[i];
+    SCOPED_TRACE(int(format));
+    for (const ImageSize& size : sizes)
+      for (const int left : {0, 3}) {
+        SCOPED_TRACE(testing::Message() << size.Width << " x " << size.Height << " at " << left);
+        const Picture source(size.Width + 5, size.Height, format);
+        FillWithNoise(source, 59);
+        agree(source.ClipImage({left, 0, size.Width, size.Height}), size, left);
+      }
+    const Picture source(large[i].Width, large[i].Height, format);
+    FillWithNoise(source, 60);
+    agree(source, large[i], 7);
+  }
+}
+
+// Rows of a caller's block that overlap hold what was written last.
+TEST(Turns, WriteOverlappingRowsInTheSlowOrder) {
+  const Picture source(70, 90, Format::RGB);
+  FillWithNoise(source, 61);
+  const std::pair<Picture (Picture::*)(const Picture&) const, Picture (Picture::*)(const Picture&) const>
+      pairs[] = {{&Picture::Rotate90, &Picture::Rotate90slow},
+                 {&Picture::Rotate270, &Picture::Rotate270slow}};
+  for (const auto& [fast, slow] : pairs) {
+    const MemoryBlock blocks[] = {MemoryBlock(100 * 70 + 270), MemoryBlock(100 * 70 + 270)};
+    (source.*fast)(Picture(blocks[0], 90, 70, Format::RGB, 100));
+    (source.*slow)(Picture(blocks[1], 90, 70, Format::RGB, 100));
+    EXPECT_TRUE(std::ranges::equal(blocks[0].Data(), blocks[1].Data()));
+  }
+}
+
 TEST(Turns, RefuseWhatTheyCantWrite) {
   const Picture source(6, 9, Format::RGBA);
   for (const Way& way : Ways()) {
@@ -134,6 +182,11 @@ TEST(Turns, RefuseWhatTheyCantWrite) {
     closed.Close();
     EXPECT_FALSE(way.Turn(closed, {}));
     EXPECT_FALSE(way.Turn(source, closed));
+    const Picture square(6, 6, Format::G);
+    const PictureFactory itself([&](int, int, Format) { return square; });
+    square.SetFactory(itself);
+    EXPECT_FALSE(way.Turn(square, {}));
+    square.SetFactory({});
   }
 }
 
