@@ -1,8 +1,10 @@
 #include <algorithm>
 
+#include "geometry/blocks.h"
 #include "geometry/geometry.h"
 #include "geometry/reversal.h"
 #include "image/filter.h"
+#include "image/targets.h"
 #include "image/walk.h"
 
 namespace zor {
@@ -11,7 +13,19 @@ namespace {
 /// Turns a row around its middle. Pixels of both halves are exchanged; one in the middle stays.
 void MirrorRow(const Reversal& reversal, Sample* row, const PictureData& picture) {
   const std::int32_t half = picture.Width / 2;
-  reversal.Swap(row, row + std::ptrdiff_t{picture.Width - half} * picture.PixelSize, half);
+  const std::ptrdiff_t toNext = IsMirrored(picture) ? -picture.RowSize : picture.RowSize;
+  reversal.Swap(row, row + std::ptrdiff_t{picture.Width - half} * picture.PixelSize, half, toNext);
+}
+
+/// Exchanges two runs of bytes, a cache line at a time.
+void SwapRuns(Sample* a, Sample* b, std::ptrdiff_t bytes) {
+  std::ptrdiff_t i = 0;
+  for (Sample line[CacheLine]; i + CacheLine <= bytes; i += CacheLine) {
+    std::memcpy(line, a + i, CacheLine);
+    std::memcpy(a + i, b + i, CacheLine);
+    std::memcpy(b + i, line, CacheLine);
+  }
+  for (; i < bytes; ++i) std::swap(a[i], b[i]);
 }
 
 /// Two rows of one picture, exchanged in place or through copies of both.
@@ -50,10 +64,14 @@ class RowExchange {
  private:
   void Swap(Sample* a, Sample* b) const {
     if (IsReversed) return Reversed.Swap(a, b, Of.Width);
-    ForAlikePlanes(Planes, Of.Width, [&](auto planesOn, std::ptrdiff_t width) {
-      const auto top = planesOn(a), bottom = planesOn(b);
-      for (std::ptrdiff_t x = 0; x < width; ++x)
-        for (int c = 0; c < top.Count; ++c) std::swap(top(c, x), bottom(c, x));
+    if (FillPixels(Planes)) {
+      const std::ptrdiff_t first = FirstOffset(Planes), bytes = std::ptrdiff_t{Of.Width} * Planes.Step;
+      return OnBestTarget<SwapRuns>(a + first, b + first, bytes);
+    }
+    ForPlaneCount(Planes.Count, [&](auto n) {
+      const PlaneRow<n> top(a, Planes), bottom(b, Planes);
+      for (std::ptrdiff_t x = 0; x < Of.Width; ++x)
+        for (int c = 0; c < n; ++c) std::swap(top(c, x), bottom(c, x));
     });
   }
   void Copy(Sample* from, Sample* into) const {
@@ -112,6 +130,9 @@ void Rotate180(PictureZOR* self) { ExchangeHalves(self, true); }
 
 PictureZOR* Rotate180(PictureZOR* self, PictureZOR* dest) {
   return RunFilter(self, dest, {.InPlace = false}, [](const FilterCall& call) {
+    // Rows are read from the top where the order makes the result. Else from the bottom, so that both
+    // pictures are gone through in one direction from end to end.
+    const bool inOrder = call.SharesPixels || !RowsAreApart(call.Dest);
     const Reversal reversal(call.In, call.Out, call.SharesPixels);
     const std::int32_t width = call.Source.Width, height = call.Source.Height;
     const std::int32_t most = std::min(RowsAtOnce(call.Source), RowsAtOnce(call.Dest));
@@ -119,8 +140,10 @@ PictureZOR* Rotate180(PictureZOR* self, PictureZOR* dest) {
       count = std::min(most, height - y);
       const bool reached = WithRows({call.Source, y, count}, {call.Dest, height - y - count, count},
                                     [&](const RowRun& from, const RowRun& into) {
-                                      for (std::int32_t i = 0; i < count; ++i)
-                                        reversal.Copy(from[i], into[count - 1 - i], width);
+                                      for (std::int32_t i = 0; i < count; ++i) {
+                                        const std::int32_t row = inOrder ? i : count - 1 - i;
+                                        reversal.Copy(from[row], into[count - 1 - row], width);
+                                      }
                                     });
       if (!reached) return false;
     }

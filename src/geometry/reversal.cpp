@@ -32,11 +32,16 @@ constexpr Block Blend(Block changed, Block old, Block mask) { return (changed & 
 
 template <int Step>
 void SwapBlocks(Sample* left, Sample* rightEnd, std::ptrdiff_t blocks, const Sample* fromLow,
-                const Sample* fromHigh) {
+                const Sample* fromHigh, std::ptrdiff_t toNext) {
+  constexpr std::ptrdiff_t blocksInLine = CacheLine / BlockBytes;
   const Block lowMask = LoadBlock(fromLow), highMask = LoadBlock(fromHigh);
   if (blocks <= 0) return;
   Block low = LoadBlock(left), high = LoadBlock(rightEnd - BlockBytes);
   for (;; --blocks) {
+    if (toNext != 0 && blocks % blocksInLine == 0) {
+      Prefetch(left, toNext);
+      Prefetch(rightEnd, toNext);
+    }
     const Block nowLow = low, nowHigh = high;
     Sample *intoLeft = left, *intoRight = rightEnd - BlockBytes;
     left += PixelsInBlock<Step> * Step;
@@ -55,12 +60,18 @@ void SwapBlocks(Sample* left, Sample* rightEnd, std::ptrdiff_t blocks, const Sam
 
 template <int Step>
 void CopyBlocks(const Sample* fromEnd, Sample* into, std::ptrdiff_t blocks, const Sample* fromLow) {
+  constexpr int bytes = PixelsInBlock<Step> * Step;
   const Block mask = LoadBlock(fromLow);
-  for (; blocks > 0; --blocks) {
-    const Block pixels = LoadBlock(fromEnd - BlockBytes);
-    StoreBlock(into, Blend(Shuffled<ToLow<Step>>(pixels, pixels), LoadBlock(into), mask));
-    into += PixelsInBlock<Step> * Step;
-    fromEnd -= PixelsInBlock<Step> * Step;
+  if (blocks <= 0) return;
+  Block old = LoadBlock(into);
+  for (;; --blocks) {
+    const Block pixels = LoadBlock(fromEnd - BlockBytes), now = old;
+    // Read before this one is written, as above.
+    if (blocks > 1) old = LoadBlock(into + bytes);
+    StoreBlock(into, Blend(Shuffled<ToLow<Step>>(pixels, pixels), now, mask));
+    if (blocks == 1) return;
+    into += bytes;
+    fromEnd -= bytes;
   }
 }
 
@@ -87,11 +98,11 @@ Reversal::Reversal(const PlaneList& in, const PlaneList& out, bool inOrder)
   }
 }
 
-void Reversal::Swap(Sample* a, Sample* b, std::ptrdiff_t count) const {
+void Reversal::Swap(Sample* a, Sample* b, std::ptrdiff_t count, std::ptrdiff_t toNext) const {
   std::ptrdiff_t done = 0;
   const auto swapBlocks = [&]<int Step>() {
     const std::ptrdiff_t blocks = BlocksIn<Step>(count);
-    OnBestTarget<SwapBlocks<Step>>(a + Edge, b + Edge + count * Step, blocks, FromLow, FromHigh);
+    OnBestTarget<SwapBlocks<Step>>(a + Edge, b + Edge + count * Step, blocks, FromLow, FromHigh, toNext);
     done = blocks * PixelsInBlock<Step>;
   };
   if (InBlocks) ForPlaneCount(In.Step, [&](auto step) { swapBlocks.template operator()<step>(); });

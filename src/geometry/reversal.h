@@ -10,8 +10,8 @@ class Reversal {
   Reversal(const PlaneList& in, const PlaneList& out, bool inOrder = false);
 
   /// Exchanges count pixels from a on with those from b on, the last of them first; of one layout. The two
-  /// don't overlap.
-  void Swap(Sample* a, Sample* b, std::ptrdiff_t count) const;
+  /// don't overlap. What lies toNext bytes further is wanted next.
+  void Swap(Sample* a, Sample* b, std::ptrdiff_t count, std::ptrdiff_t toNext = 0) const;
   /// The pixels of a row to those of another.
   void Copy(Sample* from, Sample* into, std::ptrdiff_t count) const;
 
