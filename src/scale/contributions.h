@@ -19,6 +19,8 @@ struct Contribution {
   std::int32_t Count;
   /// The sum of the weights before they were rounded, rounded once.
   float Sum;
+  /// A line with the same weights that comes first, if it is known, otherwise this one.
+  std::int32_t Alike;
 };
 
 /// The contributions of one axis, freed with the table.
@@ -36,8 +38,12 @@ class ContributionTable {
   std::int32_t Count() const { return LineCount; }
 
  private:
+  struct EntryBlock;
+  class Filler;
+
   Contribution* Lines;
   std::int32_t LineCount;
+  EntryBlock* Blocks = nullptr;
 };
 
 }
