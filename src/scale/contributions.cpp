@@ -4,7 +4,6 @@
 #include <bit>
 #include <cmath>
 #include <cstdlib>
-#include <iterator>
 
 #include "image/arithmetic.h"
 
@@ -41,30 +40,37 @@ class KnownValues {
   Known Values[1 << SizeBits];
 };
 
-/// Numbers of source lines that are multiples of this are exact, and so are their differences: the weights of
-/// a line then depend only on where its centre lies between two source lines.
-constexpr double ExactUnit = 0x1p-20;
+/// Distances in whole numbers of 2^-20 source lines.
+using ExactDistance = std::int64_t;
+constexpr double ExactUnits = 0x1p20;
 
-bool IsExact(double lines) { return std::floor(lines / ExactUnit) == lines / ExactUnit; }
+/// Whether a distance is such a number. Then so are the differences of these, exactly, and the weights of a
+/// line depend only on where its centre lies between two source lines.
+bool IsExact(double lines, ExactDistance& exact) {
+  exact = ExactDistance(lines * ExactUnits);
+  return double(exact) == lines * ExactUnits;
+}
 
-/// The first lines of some fractions of their centres.
-class KnownFractions {
+/// The lines that came first with some fractions of their centres.
+class FirstLines {
  public:
-  KnownFractions() { std::fill(std::begin(Fractions), std::end(Fractions), -1.0); }
-  /// The line that this fraction was asked for first, as far as that is known; `line` if it wasn't.
-  std::int32_t FirstLine(double fraction, std::int32_t line) {
-    const auto slot = std::size_t(fraction / ExactUnit) * 0x9E3779B1U >> 20 & (Slots - 1);
-    if (Fractions[slot] != fraction) {
-      Fractions[slot] = fraction;
-      Lines[slot] = line;
-    }
-    return Lines[slot];
+  struct Line {
+    std::int32_t Number;
+    ExactDistance Centre;
+  };
+  FirstLines() { std::fill_n(Lines, 1 << SizeBits, Line{0, -1}); }
+  /// The line that came first with the same fraction, as far as that is known, or else this one.
+  Line Like(const Line& line) {
+    const ExactDistance fraction = Fraction(line.Centre);
+    Line& first = Lines[std::uint32_t(fraction) * 0x9E3779B1U >> (32 - SizeBits)];
+    if (first.Centre < 0 || Fraction(first.Centre) != fraction) first = line;
+    return first;
   }
 
  private:
-  static constexpr std::size_t Slots = 256;
-  double Fractions[Slots];
-  std::int32_t Lines[Slots];
+  static ExactDistance Fraction(ExactDistance centre) { return centre & (ExactDistance(ExactUnits) - 1); }
+  static constexpr int SizeBits = 8;
+  Line Lines[1 << SizeBits];
 };
 
 }
@@ -84,7 +90,10 @@ class ContributionTable::Filler {
         Scale(scale),
         Width(scale < 1.0 ? SearchRadius(kernel) / scale : SearchRadius(kernel)),
         Shrinks(scale < 1.0),
-        Values(kernel) {}
+        Values(kernel) {
+    ExactDistance width;
+    HasExactWidth = IsExact(Width, width);
+  }
   void Fill(std::int32_t d) {
     Contribution& line = Table.Lines[d];
     line.Alike = d;
@@ -94,10 +103,11 @@ class ContributionTable::Filler {
     // Each candidate gives one entry at most.
     if (left > right || !HasRoom(std::size_t(right - left) + 1)) return;
     line.Entries = Free;
-    const bool whole = centre >= Width && farRight < SourceCount && IsExact(centre) && IsExact(Width);
-    if (whole) line.Alike = Fractions.FirstLine(centre - std::floor(centre), d);
-    if (line.Alike != d)
-      Copy(line, std::int32_t(std::floor(centre) - std::floor((line.Alike + 0.5) / Scale)));
+    FirstLines::Line own{d, 0}, first = own;
+    const bool whole = HasExactWidth && centre >= Width && farRight < SourceCount;
+    if (whole && IsExact(centre, own.Centre)) first = Firsts.Like(own);
+    if (first.Number != d)
+      Copy(line, first.Number, std::int32_t((own.Centre - first.Centre) / ExactDistance(ExactUnits)));
     else
       Compute(line, centre, left, right);
     Free += line.Count;
@@ -116,13 +126,13 @@ class ContributionTable::Filler {
     }
     line.Sum = float(sum);
   }
-  /// The line that it is alike, so many source lines further.
-  void Copy(Contribution& line, std::int32_t further) const {
-    const Contribution& first = Table.Lines[line.Alike];
-    for (std::int32_t i = 0; i < first.Count; ++i)
-      line.Entries[i] = {first.Entries[i].Weight, first.Entries[i].Pixel + further};
-    line.Count = first.Count;
-    line.Sum = first.Sum;
+  void Copy(Contribution& line, std::int32_t alike, std::int32_t further) const {
+    const Contribution& from = Table.Lines[alike];
+    for (std::int32_t i = 0; i < from.Count; ++i)
+      line.Entries[i] = {from.Entries[i].Weight, from.Entries[i].Pixel + further};
+    line.Count = from.Count;
+    line.Sum = from.Sum;
+    line.Alike = alike;
   }
   bool HasRoom(std::size_t entries) {
     if (entries <= Room) return true;
@@ -139,9 +149,9 @@ class ContributionTable::Filler {
   ContributionTable& Table;
   std::int32_t SourceCount;
   double Scale, Width;
-  bool Shrinks;
+  bool Shrinks, HasExactWidth;
   KnownValues Values;
-  KnownFractions Fractions;
+  FirstLines Firsts;
   ContributionEntry* Free = nullptr;
   std::size_t Room = 0;
 };

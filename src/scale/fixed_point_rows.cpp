@@ -91,6 +91,7 @@ struct GroupMaker {
   const FixedPointRows::Shares& Lines;
   const int Channels = Rows.Pair.Channels;
   const int Step = Rows.Pair.Source.Step;
+  std::uint32_t Pattern[Lanes][Lanes] = {};
 
   /// What a group takes in: its leftmost source pixel, how far right of that a line begins, and the most that
   /// one takes in. A line may begin left of the one before it, since weights of 0 have no entries.
@@ -143,16 +144,27 @@ struct GroupMaker {
   int Lane(int part, int pixel, int channel) const {
     return (part * Rows.Pixels + pixel) * Channels + channel;
   }
-  void FillIndex(FixedPointRows::ColumnGroup& group, std::int32_t start) const {
+  /// The index of a lane whose line begins with the group's first source pixel; the four bytes of a lane
+  /// are below VectorBytes, also when the same is added to each.
+  void MakePattern() {
     for (int part = 0; part < Rows.Parts; ++part)
-      for (std::int32_t p = 0; p < group.Columns; ++p) {
-        const Line& line = Lines[group.FirstColumn + p];
-        const std::int32_t first = line.Reach > 0 ? line.First - start : 0;
-        for (int c = 0; c < Channels; ++c)
-          for (int t = 0; t < Taps; ++t)
-            group.Index[Lane(part, p, c) * Taps + t] =
-                std::uint8_t((first + part * Taps + t) * Step + Rows.Pair.Source.Offset[c] - Rows.Lead);
+      for (int c = 0; c < Channels; ++c) {
+        std::uint8_t bytes[Taps];
+        for (int t = 0; t < Taps; ++t)
+          bytes[t] = std::uint8_t((part * Taps + t) * Step + Rows.Pair.Source.Offset[c] - Rows.Lead);
+        std::memcpy(&Pattern[part][c], bytes, Taps);
       }
+  }
+  void FillIndex(FixedPointRows::ColumnGroup& group, std::int32_t start) const {
+    for (std::int32_t p = 0; p < group.Columns; ++p) {
+      const Line& line = Lines[group.FirstColumn + p];
+      const auto further = line.Reach > 0 ? std::uint32_t((line.First - start) * Step) * 0x01010101U : 0;
+      for (int part = 0; part < Rows.Parts; ++part)
+        for (int c = 0; c < Channels; ++c) {
+          const std::uint32_t bytes = Pattern[part][c] + further;
+          std::memcpy(group.Index + Lane(part, p, c) * Taps, &bytes, Taps);
+        }
+    }
   }
   /// Fills all of a group but what comes of the shares; gives its steps.
   std::int32_t PlaceGroup(FixedPointRows::ColumnGroup& group, std::int32_t number) const {
@@ -219,6 +231,7 @@ bool FixedPointRows::Build() {
   GroupMemory = NewBuffer(std::size_t(groups + 1) * sizeof(ColumnGroup));
   if (!GroupMemory) return false;
   Groups = reinterpret_cast<ColumnGroup*>(Aligned(GroupMemory));
+  maker.MakePattern();
   std::size_t steps = 0;
   for (std::int32_t g = 0; g < groups; ++g) steps += std::size_t(maker.PlaceGroup(Groups[g], g));
   WeightMemory = NewBuffer((steps + 1) * std::size_t(Digits) * VectorBytes);
