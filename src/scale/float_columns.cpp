@@ -30,8 +30,8 @@ int WorthTogether(const ScaleContext& context, std::int32_t longest) {
 
 }
 
-FloatColumns::FloatColumns(const ScaleContext& context, const ContributionTable& table,
-                           const HorizontalPass* pass)
+ColumnPlan::ColumnPlan(const ScaleContext& context, const ContributionTable& table,
+                       const HorizontalPass* pass)
     : Context(context),
       Table(table),
       Pass(pass),
@@ -39,15 +39,15 @@ FloatColumns::FloatColumns(const ScaleContext& context, const ContributionTable&
   std::int32_t longest = 1;
   for (std::int32_t y = 0; y < table.Count(); ++y) longest = std::max(longest, table[y].Count);
   Together = WorthTogether(context, longest);
-  std::int32_t reach = 1;
   for (std::int32_t y = 0; y < table.Count(); ++y) {
     const RowRange range = RowsOf(y, std::min(Together, table.Count() - y));
-    reach = std::max(reach, range.Last - range.First + 1);
+    Reach = std::max(Reach, range.Last - range.First + 1);
   }
-  Rows.Slots = reach + (pass ? pass->RowsTogether() : 1) - 1;
+  Slots = Reach + (pass ? pass->RowsTogether() : 1) - 1;
 
-  const auto fits = [&](std::size_t room) { return room / sizeof(float) / std::size_t(Rows.Slots); };
-  std::size_t samples = fits(CacheRoom);
+  const auto fits = [&](std::size_t room) { return room / sizeof(float) / std::size_t(Slots); };
+  // Every stripe walks the whole source again, which a mapped one has to be read for.
+  std::size_t samples = fits(pass && context.Source->IsMapping ? MostRoom : CacheRoom);
   if (samples < NarrowStripe) samples = std::min(NarrowStripe, fits(MostRoom));
   if (samples < NarrowestStripe) return;
   const std::int32_t unit = pass ? pass->ColumnUnit() : 1;
@@ -55,21 +55,10 @@ FloatColumns::FloatColumns(const ScaleContext& context, const ContributionTable&
   const std::int64_t units = (std::int64_t{context.ResultWidth} + unit - 1) / unit;
   const auto unitsThatFit = std::max<std::int64_t>(std::int64_t(samples) / Samples.Order.Count / unit, 1);
   Stripe = std::int32_t(std::min(units, unitsThatFit)) * unit;
-  Rows.Room = WholeBlocks(std::ptrdiff_t{Stripe} * Samples.Order.Count) + Block;
-
-  // One allocation, its rows aligned like vectors.
-  const std::size_t rowBytes = std::size_t(Rows.Room) * sizeof(float) * std::size_t(Rows.Slots);
-  const std::size_t shareBytes = std::size_t(reach) * LineSums::Most * sizeof(float);
-  Memory = NewBuffer(Block + rowBytes + shareBytes + std::size_t(Rows.Room) * std::size_t(Together));
-  if (!Memory) return;
-  const auto address = reinterpret_cast<Word>(Memory.get());
-  Sample* aligned = Memory.get() + (Block - address % Block) % Block;
-  Rows.Memory = reinterpret_cast<float*>(aligned);
-  Shares = reinterpret_cast<float*>(aligned + rowBytes);
-  ScratchMemory = aligned + rowBytes + shareBytes;
+  Room = WholeBlocks(std::ptrdiff_t{Stripe} * Samples.Order.Count) + Block;
 }
 
-FloatColumns::RowRange FloatColumns::RowsOf(std::int32_t y, int count) const {
+ColumnPlan::RowRange ColumnPlan::RowsOf(std::int32_t y, int count) const {
   RowRange range{std::numeric_limits<std::int32_t>::max(), -1};
   for (std::int32_t i = y; i < y + count; ++i) {
     const Contribution& line = Table[i];
@@ -80,16 +69,29 @@ FloatColumns::RowRange FloatColumns::RowsOf(std::int32_t y, int count) const {
   return range.Last < 0 ? RowRange{0, -1} : range;
 }
 
+FloatColumns::FloatColumns(const ColumnPlan& plan) : Plan(plan), Rows{nullptr, plan.Room, plan.Slots} {
+  // One allocation, its rows aligned like vectors.
+  const std::size_t rowBytes = std::size_t(Rows.Room) * sizeof(float) * std::size_t(Rows.Slots);
+  const std::size_t shareBytes = std::size_t(plan.Reach) * LineSums::Most * sizeof(float);
+  Memory = NewBuffer(Block + rowBytes + shareBytes + std::size_t(Rows.Room) * std::size_t(plan.Together));
+  if (!Memory) return;
+  const auto address = reinterpret_cast<Word>(Memory.get());
+  Sample* aligned = Memory.get() + (Block - address % Block) % Block;
+  Rows.Memory = reinterpret_cast<float*>(aligned);
+  Shares = reinterpret_cast<float*>(aligned + rowBytes);
+  ScratchMemory = aligned + rowBytes + shareBytes;
+}
+
 void FloatColumns::Begin(Columns columns) {
   Of = columns;
   NextRow = 0;
 }
 
-bool FloatColumns::Need(RowRange range) {
+bool FloatColumns::Need(ColumnPlan::RowRange range) {
   NextRow = std::max(NextRow, range.First);
-  const int together = Pass ? Pass->RowsTogether() : 1;
+  const int together = Plan.Pass ? Plan.Pass->RowsTogether() : 1;
   while (NextRow <= range.Last) {
-    const int count = Context.Source->Height - NextRow >= together ? together : 1;
+    const int count = Plan.Context.Source->Height - NextRow >= together ? together : 1;
     if (!Fill(NextRow, count)) return false;
     NextRow += count;
   }
@@ -97,13 +99,13 @@ bool FloatColumns::Need(RowRange range) {
 }
 
 bool FloatColumns::Fill(std::int32_t row, int count) {
-  if (Pass) {
+  if (Plan.Pass) {
     float* into[LineSums::Most * 2];
     for (int r = 0; r < count; ++r) into[r] = Rows[row + r];
-    return Pass->MakeFloats(row, count, Samples.Order, Of, into);
+    return Plan.Pass->MakeFloats(row, count, Plan.Samples.Order, Of, into);
   }
-  const std::ptrdiff_t bytes = Samples.Order.Count;
-  const bool reached = WithRow(*Context.Temp, row, [&](const Sample* samples) {
+  const std::ptrdiff_t bytes = Plan.Samples.Order.Count;
+  const bool reached = WithRow(*Plan.Context.Temp, row, [&](const Sample* samples) {
     OnBestTarget<Widen>(samples + Of.First * bytes, Of.Count() * bytes, Rows[row]);
   });
   if (!reached) std::fill_n(Rows[row], Rows.Room, 0.0F);
@@ -111,12 +113,12 @@ bool FloatColumns::Fill(std::int32_t row, int count) {
 }
 
 bool FloatColumns::Make(std::int32_t y, int count, Sample* const* into) {
-  if (!Need(RowsOf(y, count))) return false;
+  if (!Need(Plan.RowsOf(y, count))) return false;
   LineSums sums{};
   sums.Rows = Rows;
   sums.Shares = Shares;
-  sums.Samples = std::ptrdiff_t{Of.Count()} * Samples.Order.Count;
-  if (count == Together)
+  sums.Samples = std::ptrdiff_t{Of.Count()} * Plan.Samples.Order.Count;
+  if (count == Plan.Together)
     MakeTogether(y, count, into, sums);
   else
     for (int i = 0; i < count; ++i) MakeTogether(y + i, 1, into + i, sums);
@@ -124,13 +126,13 @@ bool FloatColumns::Make(std::int32_t y, int count, Sample* const* into) {
 }
 
 void FloatColumns::MakeTogether(std::int32_t y, int count, Sample* const* into, LineSums& sums) {
-  const RowRange range = RowsOf(y, count);
+  const ColumnPlan::RowRange range = Plan.RowsOf(y, count);
   sums.FirstRow = range.First;
   sums.RowCount = range.Last - range.First + 1;
   sums.LineCount = count;
   std::fill_n(Shares, std::ptrdiff_t{sums.RowCount} * count, 0.0F);
   for (int i = 0; i < count; ++i) {
-    const Contribution& line = Table[y + i];
+    const Contribution& line = Plan.Table[y + i];
     sums.Of[i] = &line;
     sums.Into[i] = into[i];
     if (MakeFloat(line, Shares + i, range.First, count, sums.Lines[i])) continue;
@@ -143,7 +145,7 @@ void FloatColumns::MakeTogether(std::int32_t y, int count, Sample* const* into, 
 }
 
 void FloatColumns::MakePlain(const Contribution& line, Sample* into) const {
-  const std::ptrdiff_t samples = std::ptrdiff_t{Of.Count()} * Samples.Order.Count;
+  const std::ptrdiff_t samples = std::ptrdiff_t{Of.Count()} * Plan.Samples.Order.Count;
   for (std::ptrdiff_t i = 0; i < samples; i += ExactTile) {
     ExactSums sums(int(std::min<std::ptrdiff_t>(ExactTile, samples - i)));
     for (std::int32_t t = 0; t < line.Count; ++t)

@@ -34,6 +34,10 @@ std::int64_t RoundedUp(std::int64_t a, std::int64_t b) { return a >= 0 ? (a + b 
 
 constexpr double One = 1 << FixedPointLine::Bits;
 
+/// The plain form of a line of more entries may round by more than a unit of the fixed point: with shares of
+/// 4 in all, by (n + 2) 2^-53 times 4 times 255.
+constexpr std::int32_t MostEntries = 1 << 20;
+
 /// The shares of a line on a lattice, each rounded up to a multiple of `unit`. False where they pass 24 bits,
 /// or the quotients grow by so much that one could reach the next whole number.
 bool RoundShares(const Contribution& line, const Lattice& lattice, std::int32_t unit, std::int32_t* shares) {
@@ -98,7 +102,7 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
   if (const Lattice lattice = LatticeOf(line); lattice.Denominator > 0)
     for (const std::int32_t unit : {65536, 256, 1})
       if (RoundShares(line, lattice, unit, shares)) return true;
-  if (AlwaysInDoubt(line)) return false;
+  if (AlwaysInDoubt(line) || line.Count > MostEntries) return false;
   Shares sizes;
   for (std::int32_t i = 0; i < line.Count; ++i) {
     const double exact = double(line.Entries[i].Weight) / line.Sum * One;

@@ -4,7 +4,7 @@
 #include "image/lifecycle.h"
 #include "image/stores.h"
 #include "scale/kernels.h"
-#include "scale/passes.h"
+#include "scale/vertical_pass.h"
 
 namespace zor {
 
@@ -50,8 +50,6 @@ class ScalePreparation {
   Outcome Prepare(const ScaleRequest& request);
   Outcome FindTemp(const ScaleRequest& request);
   bool MakeTemp();
-  template <class OnRows>
-  bool RunInPassing(PictureData* yields, OnRows&& onRows) const;
   ContributionTable AcrossTable(PictureData* yields) const;
   ContributionTable DownTable(PictureData* yields) const;
 
@@ -62,21 +60,18 @@ class ScalePreparation {
   Outcome Of;
 };
 
-/// Without a temporary picture: the rows between the passes are made when a line looks at them.
-template <class OnRows>
-bool ScalePreparation::RunInPassing(PictureData* yields, OnRows&& onRows) const {
-  const ContributionTable across = AcrossTable(yields), down = DownTable(yields);
-  if (!across || !down) return false;
-  const HorizontalPass pass(Pictures, across);
-  return onRows(Pictures.ResultHeight, [&](std::int32_t first, std::int32_t last) {
-    return VerticalPass(Pictures, down, &pass, first, last, yields);
-  });
-}
-
 template <class OnRows>
 bool ScalePreparation::Run(PictureData* yields, OnRows&& onRows) {
+  const auto onLines = [&](const VerticalPass& pass) {
+    return onRows(Pictures.ResultHeight,
+                  [&](std::int32_t first, std::int32_t last) { return pass.Run(first, last, yields); });
+  };
   if (!Pictures.Temp) {
-    if (RunInPassing(yields, onRows)) return true;
+    // The rows between the passes are made when a line looks at them.
+    const ContributionTable across = AcrossTable(yields), down = DownTable(yields);
+    if (!across || !down) return false;
+    const HorizontalPass rows(Pictures, across);
+    if (const VerticalPass lines(Pictures, down, &rows); lines) return onLines(lines);
     if (!MakeTemp()) return false;
   }
   {
@@ -87,9 +82,7 @@ bool ScalePreparation::Run(PictureData* yields, OnRows&& onRows) {
     if (!onRows(Pictures.Source->Height, make)) return false;
   }
   const ContributionTable table = DownTable(yields);
-  return table && onRows(Pictures.ResultHeight, [&](std::int32_t first, std::int32_t last) {
-           return VerticalPass(Pictures, table, nullptr, first, last, yields);
-         });
+  return table && onLines({Pictures, table, nullptr});
 }
 
 }

@@ -28,9 +28,9 @@ struct alignas(128) WorkerSlot {
 
 WorkerSlot WorkerTable[MostSlots];
 
-/// Set while somebody uses the table.
+/// Set while somebody uses the table; and whether that is this thread.
 std::atomic_flag TableInUse;
-pthread_t TableUser;
+thread_local bool UsesTable;
 
 void* RunSlices(void* argument) {
   auto& slot = *static_cast<WorkerSlot*>(argument);
@@ -48,12 +48,11 @@ void* RunSlices(void* argument) {
 /// A fork takes the table along but not the threads. A caller that forked while it waited finds its slices
 /// pending without a thread, and does them itself.
 void ForgetThreads() {
-  const bool inUse = TableInUse.test() && pthread_equal(TableUser, pthread_self());
   for (WorkerSlot& slot : WorkerTable) {
     slot.Started = false;
-    slot.Pending = slot.Pending && inUse;
+    slot.Pending = slot.Pending && UsesTable;
   }
-  if (!inUse) TableInUse.clear();
+  if (!UsesTable) TableInUse.clear();
 }
 
 bool Start(WorkerSlot& slot) {
@@ -121,7 +120,7 @@ void WaitFor(WorkerSlot& slot) {
 
 void ParallelFor(std::int32_t threads, std::int32_t count, void* context, ParallelWorker worker) {
   if (threads < 0 || TableInUse.test_and_set()) return worker(0, count - 1, context);
-  TableUser = pthread_self();
+  UsesTable = true;
   const int slots = SlotCount(threads);
   const std::int32_t chunk = count / slots;
   bool started[MostSlots];
@@ -139,6 +138,7 @@ void ParallelFor(std::int32_t threads, std::int32_t count, void* context, Parall
   REALYieldToRB();
   for (int i = 0; i < slots; ++i)
     if (started[i]) WaitFor(WorkerTable[i]);
+  UsesTable = false;
   TableInUse.clear();
 }
 

@@ -12,8 +12,8 @@ using ParallelWorker = void (*)(std::int32_t first, std::int32_t last, void* con
 ///
 /// The threads are made when they are first needed, are parked between calls and end with the process. The
 /// calling thread lets the host's other threads run meanwhile. One of these that comes here too does its work
-/// itself. A range whose thread can't be made is done here; after a fork the child makes threads of its own,
-/// and does here what the parent's were doing.
+/// itself, without yielding. A range whose thread can't be made is done here; after a fork the child makes
+/// threads of its own, and does here what the parent's were doing.
 void ParallelFor(std::int32_t threads, std::int32_t count, void* context, ParallelWorker worker);
 
 }

@@ -1,0 +1,33 @@
+#pragma once
+#include "scale/contributions.h"
+#include "scale/fixed_point_rows.h"
+#include "scale/scale_context.h"
+
+namespace zor {
+
+/// The first pass, prepared for all its rows. Its rows may then be made in any order and on several threads.
+class HorizontalPass {
+ public:
+  HorizontalPass(const ScaleContext& context, const ContributionTable& table);
+  /// Makes the rows first to last of temp; `yields` may yield after each if it is given. False when a row of
+  /// the source can't be reached.
+  bool Run(std::int32_t first, std::int32_t last, PictureData* yields) const;
+
+  /// How many rows are made best together.
+  int RowsTogether() const;
+  /// A run of columns begins with a multiple of this.
+  int ColumnUnit() const { return Fast ? Fast.GroupPixels() : 1; }
+  /// Makes some columns of `count` rows from `first` on, as floats, at most RowsTogether of them; into[r] has
+  /// room for 64 floats more. False when a row of the source can't be reached.
+  bool MakeFloats(std::int32_t first, int count, const PixelOrder& order, Columns columns,
+                  float* const* into) const;
+
+ private:
+  static constexpr int MostRowsTogether = 8;
+
+  const ScaleContext& Context;
+  const ContributionTable& Table;
+  FixedPointRows Fast;
+};
+
+}
