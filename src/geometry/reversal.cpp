@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <utility>
 
-#include "geometry/blocks.h"
+#include "image/byte_blocks.h"
 
 // A block of 16 bytes holds some whole pixels and at most a part of one more, so it is read so that the part
 // lies on the side that the rows go on at: the pixels stand at the low end of a block of the left side, at

@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <cmath>
 
-#include "geometry/blocks.h"
 #include "geometry/sample_parts.h"
+#include "image/byte_blocks.h"
 #include "image/walk.h"
 
 // Where the planes fill the pixel in both pictures alike, all samples of a row are one run of bytes: a

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "geometry/blocks.h"
+#include "image/byte_blocks.h"
 
 // A band of rows becomes a band of columns, which takes whole cache lines of each row that is written. It
 // goes through squares in registers: 16 x 16 for gray, 4 x 4 for wider pixels, each of them in a lane of 4
@@ -21,26 +21,6 @@ constexpr std::ptrdiff_t Strip = 1024;
 constexpr std::ptrdiff_t Ahead = 128;
 /// A result of so many bytes leaves no room in the caches for itself and its source.
 constexpr std::ptrdiff_t Streamed = 8 << 20;
-
-/// Of two vectors, the elements of the low or the high halves by turns.
-template <int Side, int Half>
-constexpr int Interleaved(int j) {
-  return j % 2 * Side + Half * Side / 2 + j / 2;
-}
-
-/// Transposes a square. A stage interleaves the rows of the first half with those of the second.
-template <class Vector, int Side>
-void TransposeSquare(Vector (&rows)[Side]) {
-  for (int stage = 1; stage < Side; stage *= 2) {
-    Vector mixed[Side];
-    for (int i = 0; i < Side / 2; ++i) {
-      mixed[2 * i] = Shuffled<Interleaved<Side, 0>>(rows[i], rows[i + Side / 2]);
-      mixed[2 * i + 1] = Shuffled<Interleaved<Side, 1>>(rows[i], rows[i + Side / 2]);
-    }
-    // One by one, so that they stay in registers.
-    for (int i = 0; i < Side; ++i) rows[i] = mixed[i];
-  }
-}
 
 /// Three bytes a pixel to lanes of four, and four pixels of lanes back to 48 bytes without gaps.
 constexpr int Spread(int j) { return j % 4 == 3 ? 0 : j / 4 * 3 + j % 4; }

@@ -22,7 +22,7 @@ class FixedPointRows {
   explicit operator bool() const { return Built; }
   /// Columns are made in groups of so many pixels; a run of columns begins with a group.
   int GroupPixels() const { return Pixels; }
-  /// Makes some columns of RowsTogether rows, or of one, out of as many rows of the source. into[r] is where
+  /// Makes some columns of up to RowsTogether rows, out of as many rows of the source. into[r] is where
   /// the first pixel goes; as floats, 16 of them have to fit from each group's first on.
   void Run(const Sample* const* from, Sample* const* into, int rows, const PixelOrder& order,
            Columns columns) const;

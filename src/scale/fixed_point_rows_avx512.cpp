@@ -187,9 +187,8 @@ struct GroupRunner {
   static void RunRows(const FixedPointRows& plan, const Sample* const* from, Value* const* into, int rows,
                       const PixelOrder& order, Columns columns) {
     if (rows == FixedPointRows::RowsTogether)
-      RunDigits<FixedPointRows::RowsTogether, Writer>(plan, from, into, order, columns);
-    else
-      RunDigits<1, Writer>(plan, from, into, order, columns);
+      return RunDigits<FixedPointRows::RowsTogether, Writer>(plan, from, into, order, columns);
+    for (int r = 0; r < rows; ++r) RunDigits<1, Writer>(plan, from + r, into + r, order, columns);
   }
 };
 

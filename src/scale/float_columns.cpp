@@ -8,8 +8,7 @@
 namespace zor {
 namespace {
 
-/// Samples of a block that SumLines makes at a time.
-constexpr int Block = 64;
+constexpr int Block = LineSums::Block;
 /// Bytes of the rows that are kept: they stay in the second-level cache, unless a line looks at very many.
 constexpr std::size_t CacheRoom = 384 << 10, MostRoom = 3 << 20;
 constexpr std::size_t NarrowStripe = 16 * Block, NarrowestStripe = 4 * Block;
@@ -69,17 +68,21 @@ ColumnPlan::RowRange ColumnPlan::RowsOf(std::int32_t y, int count) const {
   return range.Last < 0 ? RowRange{0, -1} : range;
 }
 
-FloatColumns::FloatColumns(const ColumnPlan& plan) : Plan(plan), Rows{nullptr, plan.Room, plan.Slots} {
+FloatColumns::FloatColumns(const ColumnPlan& plan) : Plan(plan) {
   // One allocation, its rows aligned like vectors.
-  const std::size_t rowBytes = std::size_t(Rows.Room) * sizeof(float) * std::size_t(Rows.Slots);
-  const std::size_t shareBytes = std::size_t(plan.Reach) * LineSums::Most * sizeof(float);
-  Memory = NewBuffer(Block + rowBytes + shareBytes + std::size_t(Rows.Room) * std::size_t(plan.Together));
+  const auto room = std::size_t(plan.Room), reach = std::size_t(plan.Reach);
+  const std::size_t rowBytes = room * sizeof(float) * std::size_t(plan.Slots);
+  const std::size_t lookedBytes = reach * sizeof(float*), shareBytes = reach * LineSums::Most * sizeof(float);
+  Memory = NewBuffer(Block + rowBytes + lookedBytes + shareBytes + room * std::size_t(plan.Together));
+  if (plan.Pass) PassScratch = NewBuffer(plan.Pass->ScratchBytes() + 1);
+  if (plan.Pass && !PassScratch) Memory.reset();
   if (!Memory) return;
   const auto address = reinterpret_cast<Word>(Memory.get());
   Sample* aligned = Memory.get() + (Block - address % Block) % Block;
-  Rows.Memory = reinterpret_cast<float*>(aligned);
-  Shares = reinterpret_cast<float*>(aligned + rowBytes);
-  ScratchMemory = aligned + rowBytes + shareBytes;
+  Rows = reinterpret_cast<float*>(aligned);
+  Looked = reinterpret_cast<const float**>(aligned + rowBytes);
+  Shares = reinterpret_cast<float*>(aligned + rowBytes + lookedBytes);
+  ScratchMemory = aligned + rowBytes + lookedBytes + shareBytes;
 }
 
 void FloatColumns::Begin(Columns columns) {
@@ -91,7 +94,7 @@ bool FloatColumns::Need(ColumnPlan::RowRange range) {
   NextRow = std::max(NextRow, range.First);
   const int together = Plan.Pass ? Plan.Pass->RowsTogether() : 1;
   while (NextRow <= range.Last) {
-    const int count = Plan.Context.Source->Height - NextRow >= together ? together : 1;
+    const int count = std::min(together, Plan.Context.Source->Height - NextRow);
     if (!Fill(NextRow, count)) return false;
     NextRow += count;
   }
@@ -100,22 +103,22 @@ bool FloatColumns::Need(ColumnPlan::RowRange range) {
 
 bool FloatColumns::Fill(std::int32_t row, int count) {
   if (Plan.Pass) {
-    float* into[LineSums::Most * 2];
-    for (int r = 0; r < count; ++r) into[r] = Rows[row + r];
-    return Plan.Pass->MakeFloats(row, count, Plan.Samples.Order, Of, into);
+    float* into[FloatRows::RowsTogether];
+    for (int r = 0; r < count; ++r) into[r] = RowAt(row + r);
+    return Plan.Pass->MakeFloats(row, count, Plan.Samples.Order, Of, into, PassScratch.get());
   }
   const std::ptrdiff_t bytes = Plan.Samples.Order.Count;
   const bool reached = WithRow(*Plan.Context.Temp, row, [&](const Sample* samples) {
-    OnBestTarget<Widen>(samples + Of.First * bytes, Of.Count() * bytes, Rows[row]);
+    OnBestTarget<Widen>(samples + Of.First * bytes, Of.Count() * bytes, RowAt(row));
   });
-  if (!reached) std::fill_n(Rows[row], Rows.Room, 0.0F);
+  if (!reached) std::fill_n(RowAt(row), Plan.Room, 0.0F);
   return true;
 }
 
 bool FloatColumns::Make(std::int32_t y, int count, Sample* const* into) {
   if (!Need(Plan.RowsOf(y, count))) return false;
   LineSums sums{};
-  sums.Rows = Rows;
+  sums.Rows = Looked;
   sums.Shares = Shares;
   sums.Samples = std::ptrdiff_t{Of.Count()} * Plan.Samples.Order.Count;
   if (count == Plan.Together)
@@ -130,6 +133,7 @@ void FloatColumns::MakeTogether(std::int32_t y, int count, Sample* const* into, 
   sums.FirstRow = range.First;
   sums.RowCount = range.Last - range.First + 1;
   sums.LineCount = count;
+  for (std::int32_t row = range.First; row <= range.Last; ++row) Looked[row - range.First] = RowAt(row);
   std::fill_n(Shares, std::ptrdiff_t{sums.RowCount} * count, 0.0F);
   for (int i = 0; i < count; ++i) {
     const Contribution& line = Plan.Table[y + i];
@@ -137,21 +141,11 @@ void FloatColumns::MakeTogether(std::int32_t y, int count, Sample* const* into, 
     sums.Into[i] = into[i];
     if (MakeFloat(line, Shares + i, range.First, count, sums.Lines[i])) continue;
     // A line that is always in doubt is made by the plain form, and the others each by itself.
-    if (count == 1) return MakePlain(line, into[0]);
+    if (count == 1) return SumPlainLine(sums, 0);
     for (int k = 0; k < count; ++k) MakeTogether(y + k, 1, into + k, sums);
     return;
   }
   SumLines(sums);
-}
-
-void FloatColumns::MakePlain(const Contribution& line, Sample* into) const {
-  const std::ptrdiff_t samples = std::ptrdiff_t{Of.Count()} * Plan.Samples.Order.Count;
-  for (std::ptrdiff_t i = 0; i < samples; i += ExactTile) {
-    ExactSums sums(int(std::min<std::ptrdiff_t>(ExactTile, samples - i)));
-    for (std::int32_t t = 0; t < line.Count; ++t)
-      sums.Add(Rows[line.Entries[t].Pixel] + i, line.Entries[t].Weight);
-    sums.Store(line.Sum, into + i);
-  }
 }
 
 }

@@ -42,20 +42,22 @@ class FloatColumns {
   /// rising order. False when a row of the source can't be reached.
   bool Make(std::int32_t y, int count, Sample* const* into);
   /// Room for a line of the stripe, one of the plan's Together.
-  Sample* Scratch(int line) const { return ScratchMemory + line * Rows.Room; }
+  Sample* Scratch(int line) const { return ScratchMemory + line * Plan.Room; }
 
  private:
   bool Need(ColumnPlan::RowRange range);
   bool Fill(std::int32_t row, int count);
   void MakeTogether(std::int32_t y, int count, Sample* const* into, LineSums& sums);
-  void MakePlain(const Contribution& line, Sample* into) const;
+  float* RowAt(std::int32_t row) const { return Rows + row % Plan.Slots * Plan.Room; }
 
   const ColumnPlan& Plan;
   Columns Of{};
   /// The first row that isn't there yet.
   std::int32_t NextRow = 0;
-  RowRing Rows;
-  Buffer Memory;
+  Buffer Memory, PassScratch;
+  /// A ring of rows, and those that lines look at.
+  float* Rows = nullptr;
+  const float** Looked = nullptr;
   float* Shares = nullptr;
   Sample* ScratchMemory = nullptr;
 };

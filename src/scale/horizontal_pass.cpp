@@ -7,32 +7,53 @@
 namespace zor {
 
 HorizontalPass::HorizontalPass(const ScaleContext& context, const ContributionTable& table)
-    : Context(context), Table(table), Fast(context.Pair, table, context.Source->Width) {}
+    : Context(context),
+      Table(table),
+      Fixed(context.Pair, table, context.Source->Width),
+      Single(Fixed ? FloatRows() : FloatRows(context.Pair, table, context.Source->Width)),
+      Together(BestTogether()) {}
 
-int HorizontalPass::RowsTogether() const {
-  // Rows of a mapped picture aren't in hand together.
-  if (Context.Source->IsMapping || (Context.Temp && Context.Temp->IsMapping)) return 1;
-  return Fast ? FixedPointRows::RowsTogether : zor::RowsTogether(Context.Pair.Channels);
+int HorizontalPass::BestTogether() const {
+  const int best = Fixed    ? FixedPointRows::RowsTogether
+                   : Single ? FloatRows::RowsTogether
+                            : zor::RowsTogether(Context.Pair.Channels);
+  const std::int32_t inHand = Context.Temp ? std::min(RowsAtOnce(*Context.Source), RowsAtOnce(*Context.Temp))
+                                           : RowsAtOnce(*Context.Source);
+  return std::clamp(inHand, 1, best);
+}
+
+void HorizontalPass::MakeSamples(const RowRun& from, const RowRun& into, int rows, Sample* scratch) const {
+  const Columns all{0, Context.ResultWidth};
+  const PixelOrder& order = Context.Pair.Temp;
+  const Sample* read[MostRowsTogether];
+  Sample* written[MostRowsTogether];
+  for (int r = 0; r < rows; ++r) {
+    read[r] = from[r];
+    written[r] = into[r];
+  }
+  if (Fixed)
+    Fixed.Run(read, written, rows, order, all);
+  else if (Single)
+    Single.Run(read, written, rows, order, all, scratch);
+  else
+    ExactHorizontal(read, written, rows, Context.Pair, order, Table, all);
 }
 
 bool HorizontalPass::Run(std::int32_t first, std::int32_t last, PictureData* yields) const {
-  const int together = RowsTogether();
-  const Columns all{0, Context.ResultWidth};
+  const Buffer scratch = NewBuffer(ScratchBytes() + 1);
+  if (!scratch) return false;
   for (std::int32_t y = first; y <= last;) {
-    int rows = last - y + 1 >= together ? together : 1;
-    const Sample* from[MostRowsTogether];
-    Sample* into[MostRowsTogether];
-    for (int r = 0; r < rows; ++r) {
-      from[r] = FetchRow(*Context.Source, y + r);
-      if (!from[r]) return false;
-      into[r] = FetchRow(*Context.Temp, y + r);
-      // The rows before one that can't be reached are made one by one.
-      if (!into[r]) rows = 1;
+    int rows = std::min(Together, last - y + 1);
+    const auto make = [&](const RowRun& from, const RowRun& into) {
+      MakeSamples(from, into, rows, scratch.get());
+    };
+    const auto made = [&] { return WithRows({*Context.Source, y, rows}, {*Context.Temp, y, rows}, make); };
+    if (!made() && rows > 1) {
+      // Perhaps they can be reached one by one.
+      rows = 1;
+      made();
     }
-    if (into[0] && Fast)
-      Fast.Run(from, into, rows, Context.Pair.Temp, all);
-    else if (into[0])
-      ExactHorizontal(from, into, rows, Context.Pair, Context.Pair.Temp, Table, all);
+    if (!FetchRow(*Context.Source, y)) return false;
     for (int r = 0; yields && r < rows; ++r) MayYield(*yields);
     y += rows;
   }
@@ -40,19 +61,26 @@ bool HorizontalPass::Run(std::int32_t first, std::int32_t last, PictureData* yie
 }
 
 bool HorizontalPass::MakeFloats(std::int32_t first, int count, const PixelOrder& order, Columns columns,
-                                float* const* into) const {
-  const Sample* from[MostRowsTogether];
-  for (int r = 0; r < count; ++r) {
-    from[r] = FetchRow(*Context.Source, first + r);
-    if (!from[r]) return false;
+                                float* const* into, Sample* scratch) const {
+  RowRun run;
+  if (!RowSpan{*Context.Source, first, count}.Fetch(run)) {
+    bool all = count > 1;
+    for (int r = 0; r < count && all; ++r) all = MakeFloats(first + r, 1, order, columns, into + r, scratch);
+    return all;
   }
-  if (Fast) {
-    Fast.Run(from, into, count, order, columns);
+  const Sample* from[MostRowsTogether];
+  for (int r = 0; r < count; ++r) from[r] = run[r];
+  if (Fixed) {
+    Fixed.Run(from, into, count, order, columns);
     return true;
   }
-  constexpr std::int32_t Tile = 512;
-  Sample samples[MostRowsTogether][Tile * 5];
-  Sample* tiles[MostRowsTogether];
+  if (Single) {
+    Single.Run(from, into, count, order, columns, scratch);
+    return true;
+  }
+  constexpr std::int32_t Tile = 512, MostRows = 8;
+  Sample samples[MostRows][Tile * 5];
+  Sample* tiles[MostRows];
   for (int r = 0; r < count; ++r) tiles[r] = samples[r];
   for (std::int64_t x = columns.First; x < columns.End; x += Tile) {
     const Columns tile{std::int32_t(x), std::int32_t(std::min<std::int64_t>(x + Tile, columns.End))};

@@ -1,6 +1,7 @@
 #pragma once
 #include "scale/contributions.h"
 #include "scale/fixed_point_rows.h"
+#include "scale/float_rows.h"
 #include "scale/scale_context.h"
 
 namespace zor {
@@ -10,24 +11,32 @@ class HorizontalPass {
  public:
   HorizontalPass(const ScaleContext& context, const ContributionTable& table);
   /// Makes the rows first to last of temp; `yields` may yield after each if it is given. False when a row of
-  /// the source can't be reached.
+  /// the source can't be reached, and without memory.
   bool Run(std::int32_t first, std::int32_t last, PictureData* yields) const;
 
   /// How many rows are made best together.
-  int RowsTogether() const;
+  int RowsTogether() const { return Together; }
   /// A run of columns begins with a multiple of this.
-  int ColumnUnit() const { return Fast ? Fast.GroupPixels() : 1; }
+  int ColumnUnit() const { return Fixed ? Fixed.GroupPixels() : 1; }
+  /// What MakeFloats needs to work in.
+  std::size_t ScratchBytes() const { return Fixed ? 0 : Single.ScratchBytes(); }
   /// Makes some columns of `count` rows from `first` on, as floats, at most RowsTogether of them; into[r] has
   /// room for 64 floats more. False when a row of the source can't be reached.
-  bool MakeFloats(std::int32_t first, int count, const PixelOrder& order, Columns columns,
-                  float* const* into) const;
+  bool MakeFloats(std::int32_t first, int count, const PixelOrder& order, Columns columns, float* const* into,
+                  Sample* scratch) const;
 
  private:
-  static constexpr int MostRowsTogether = 8;
+  static constexpr int MostRowsTogether = FloatRows::RowsTogether;
+
+  int BestTogether() const;
+  void MakeSamples(const RowRun& from, const RowRun& into, int rows, Sample* scratch) const;
 
   const ScaleContext& Context;
   const ContributionTable& Table;
-  FixedPointRows Fast;
+  FixedPointRows Fixed;
+  /// Where the other form isn't served.
+  FloatRows Single;
+  int Together;
 };
 
 }

@@ -9,56 +9,70 @@
 namespace zor {
 namespace {
 
-// Four vectors of 16 lanes a block, whatever the instruction set.
-constexpr int Lanes = 16, Vectors = 4, Block = Vectors * Lanes;
-using Floats [[gnu::vector_size(Lanes * 4)]] = float;
-using Integers [[gnu::vector_size(Lanes * 4)]] = std::int32_t;
-using Bytes [[gnu::vector_size(Lanes)]] = Sample;
+// What every processor with vectors has.
+constexpr int Lanes = 4, Vectors = 8, Block = Lanes * Vectors;
+using Floats [[gnu::vector_size(Lanes * sizeof(float))]] = float;
 
 /// What becomes of sums: cut off and clamped.
-inline void StoreBytes(const Floats& sums, Sample* into) {
-  Integers whole = __builtin_convertvector(sums, Integers);
-  whole = whole < 0 ? 0 : whole;
-  whole = whole > 255 ? 255 : whole;
-  const Bytes bytes = __builtin_convertvector(whole, Bytes);
-  std::memcpy(into, &bytes, sizeof bytes);
-}
-
-void SumLine(const LineSums* sums, int line) {
-  const auto [start, gap] = sums->Lines[line];
-  for (std::ptrdiff_t i = 0; i < sums->Samples; i += Block) {
-    Floats sum[Vectors];
-    for (int k = 0; k < Vectors; ++k) sum[k] = Floats{} + start;
-    for (std::int32_t row = 0; row < sums->RowCount; ++row) {
-      const float share = sums->Shares[row * sums->LineCount + line];
-      const auto* samples = reinterpret_cast<const Floats*>(sums->Rows[sums->FirstRow + row] + i);
-      for (int k = 0; k < Vectors; ++k) sum[k] += share * samples[k];
-    }
-    Sample lower[Block], upper[Block];
-    for (int k = 0; k < Vectors; ++k) StoreBytes(sum[k], lower + k * Lanes);
-    const std::ptrdiff_t count = std::min<std::ptrdiff_t>(Block, sums->Samples - i);
-    if (gap > 0.0F) {
-      for (int k = 0; k < Vectors; ++k) StoreBytes(sum[k] + gap, upper + k * Lanes);
-      if (std::memcmp(lower, upper, Block) != 0)
-        for (std::ptrdiff_t at = 0; at < count; ++at)
-          if (lower[at] != upper[at]) lower[at] = PlainSample(*sums->Of[line], sums->Rows, i + at);
-    }
-    std::memcpy(sums->Into[line] + i, lower, std::size_t(count));
+void StoreBytes(const Floats* sums, float added, Sample* into) {
+  float values[Block];
+  std::memcpy(values, sums, sizeof values);
+  for (int i = 0; i < Block; ++i) {
+    const float sum = values[i] + added, least = sum > 0.0F ? sum : 0.0F;
+    into[i] = Sample(std::int32_t(least < 255.0F ? least : 255.0F));
   }
 }
 
+/// The samples of a line from i on, at most Block of them.
+void SumBlock(const LineSums& sums, int line, std::ptrdiff_t i) {
+  const auto [start, gap] = sums.Lines[line];
+  Floats sum[Vectors];
+  for (int k = 0; k < Vectors; ++k) sum[k] = Floats{} + start;
+  for (std::int32_t row = 0; row < sums.RowCount; ++row) {
+    const float share = sums.Shares[row * sums.LineCount + line];
+    const auto* samples = reinterpret_cast<const Floats*>(sums.Rows[row] + i);
+    for (int k = 0; k < Vectors; ++k) sum[k] += share * samples[k];
+  }
+  Sample lower[Block], upper[Block];
+  StoreBytes(sum, 0.0F, lower);
+  const std::ptrdiff_t count = std::min<std::ptrdiff_t>(Block, sums.Samples - i);
+  if (gap > 0.0F) {
+    StoreBytes(sum, gap, upper);
+    if (std::memcmp(lower, upper, Block) != 0)
+      for (std::ptrdiff_t at = 0; at < count; ++at)
+        if (lower[at] != upper[at]) lower[at] = PlainSample(sums, line, i + at);
+  }
+  std::memcpy(sums.Into[line] + i, lower, std::size_t(count));
 }
 
-Sample PlainSample(const Contribution& line, const RowRing& rows, std::ptrdiff_t at) {
+void SumLine(const LineSums& sums, int line) {
+  for (std::ptrdiff_t i = 0; i < sums.Samples; i += Block) SumBlock(sums, line, i);
+}
+
+}
+
+Sample PlainSample(const LineSums& sums, int line, std::ptrdiff_t at) {
+  const Contribution& of = *sums.Of[line];
   double sum = 0.0;
-  for (std::int32_t t = 0; t < line.Count; ++t)
-    sum += double(line.Entries[t].Weight) * double(rows[line.Entries[t].Pixel][at]);
-  return ExactQuotient(sum, line.Sum);
+  for (std::int32_t t = 0; t < of.Count; ++t)
+    sum += double(of.Entries[t].Weight) * double(sums.Rows[of.Entries[t].Pixel - sums.FirstRow][at]);
+  return ExactQuotient(sum, of.Sum);
+}
+
+void SumPlainLine(const LineSums& sums, int line) {
+  const Contribution& of = *sums.Of[line];
+  for (std::ptrdiff_t i = 0; i < sums.Samples; i += ExactTile) {
+    ExactSums exact(int(std::min<std::ptrdiff_t>(ExactTile, sums.Samples - i)));
+    for (std::int32_t t = 0; t < of.Count; ++t)
+      exact.Add(sums.Rows[of.Entries[t].Pixel - sums.FirstRow] + i, of.Entries[t].Weight);
+    exact.Store(of.Sum, sums.Into[line] + i);
+  }
 }
 
 void SumLines(const LineSums& sums) {
   if (CurrentTarget >= Target::AVX512) return SumLinesAVX512(sums);
-  for (int line = 0; line < sums.LineCount; ++line) OnBestTarget<SumLine>(&sums, line);
+  if (CurrentTarget >= Target::AVX2) return SumLinesAVX2(sums);
+  for (int line = 0; line < sums.LineCount; ++line) SumLine(sums, line);
 }
 
 }

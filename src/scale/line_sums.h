@@ -6,19 +6,15 @@
 
 namespace zor {
 
-/// Rows between the passes as floats, of which the last few are there.
-struct RowRing {
-  float* Memory;
-  std::ptrdiff_t Room;
-  std::int32_t Slots;
-  float* operator[](std::int32_t row) const { return Memory + row % Slots * Room; }
-};
-
-/// A few lines of the result that are summed together, since they look at much the same rows.
+/// A few lines that are summed together, since they look at much the same rows of floats. A row is what the
+/// lines' entries stand for: a row between the passes, or a column of a few source rows at once.
 struct LineSums {
   static constexpr int Most = 4;
+  /// Floats that are summed at a time; a row has room for so many more than it has samples.
+  static constexpr int Block = 64;
 
-  RowRing Rows;
+  /// The rows from FirstRow on, each aligned like a vector.
+  const float* const* Rows;
   std::int32_t FirstRow, RowCount;
   int LineCount;
   const Contribution* Of[Most];
@@ -32,10 +28,13 @@ struct LineSums {
 /// Makes the lines, of which there are 1, 2 or 4.
 void SumLines(const LineSums& sums);
 
-/// A sample by the plain form; a float that was made of a sample is that sample.
-Sample PlainSample(const Contribution& line, const RowRing& rows, std::ptrdiff_t at);
+/// Makes one of the lines, or one sample of it, by the plain form; a float that was made of a sample is that
+/// sample.
+void SumPlainLine(const LineSums& sums, int line);
+Sample PlainSample(const LineSums& sums, int line, std::ptrdiff_t at);
 
-/// The form of SumLines for processors with AVX-512.
+/// The forms of SumLines for processors with AVX2 and with AVX-512.
+void SumLinesAVX2(const LineSums& sums);
 void SumLinesAVX512(const LineSums& sums);
 
 }

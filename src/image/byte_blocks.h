@@ -62,6 +62,26 @@ Vector Shuffled(Vector a, Vector b) {
   (std::make_index_sequence<sizeof(Vector) / sizeof(a[0])>{});
 }
 
+/// Of two vectors, the elements of the low or the high halves by turns.
+template <int Side, int Half>
+constexpr int Interleaved(int j) {
+  return j % 2 * Side + Half * Side / 2 + j / 2;
+}
+
+/// Transposes a square. A stage interleaves the rows of the first half with those of the second.
+template <class Vector, int Side>
+void TransposeSquare(Vector (&rows)[Side]) {
+  for (int stage = 1; stage < Side; stage *= 2) {
+    Vector mixed[Side];
+    for (int i = 0; i < Side / 2; ++i) {
+      mixed[2 * i] = Shuffled<Interleaved<Side, 0>>(rows[i], rows[i + Side / 2]);
+      mixed[2 * i + 1] = Shuffled<Interleaved<Side, 1>>(rows[i], rows[i + Side / 2]);
+    }
+    // One by one, so that they stay in registers.
+    for (int i = 0; i < Side; ++i) rows[i] = mixed[i];
+  }
+}
+
 /// Whether bytes are shuffled in one instruction.
 inline bool ShufflesBytes() { return CurrentTarget != Target::Plain; }
 
