@@ -1,4 +1,5 @@
 #include <benchmark/benchmark.h>
+#include <dlfcn.h>
 
 #include <algorithm>
 #include <cstdio>
@@ -7,6 +8,7 @@
 #include <iostream>
 #include <map>
 #include <memory>
+#include <string_view>
 #include <utility>
 
 #include "picturezor/host.h"
@@ -62,6 +64,30 @@ class Collector : public benchmark::ConsoleReporter {
   std::map<std::string, std::vector<double>> Timings;
 };
 
+constexpr const char* InstructionSetNames[] = {"plain", "avx2", "avx512", "all"};
+int instructionSets = 3;
+
+/// Takes --instruction_sets=NAME out of the arguments. False for an unknown name.
+bool TakeInstructionSets(std::vector<char*>& arguments) {
+  constexpr std::string_view option = "--instruction_sets=";
+  const auto given =
+      std::ranges::find_if(arguments, [&](const char* a) { return std::string_view(a).starts_with(option); });
+  if (given == arguments.end()) return true;
+  const auto name = std::ranges::find(InstructionSetNames, std::string_view(*given).substr(option.size()));
+  if (name == std::end(InstructionSetNames)) return false;
+  instructionSets = int(name - InstructionSetNames);
+  arguments.erase(given);
+  return true;
+}
+
+/// Loads the module as the tests have it, which can be told.
+void LoadModule() {
+  Host::Load(PICTUREZOR_MODULE);
+  void* module = dlopen(PICTUREZOR_MODULE, RTLD_NOW | RTLD_NOLOAD);
+  auto* target = static_cast<int*>(dlsym(module, "_ZN3zor13CurrentTargetE"));
+  *target = std::min(*target, instructionSets);
+}
+
 std::string Processor() {
   std::ifstream file("/proc/cpuinfo");
   for (std::string line; std::getline(file, line);)
@@ -100,7 +126,8 @@ void PrintRoom(const std::string& room, Collector& times) {
 }
 
 void PrintTables(Collector& times) {
-  std::printf("Machine: %s. Compiler: %s.", Processor().c_str(), PICTUREZOR_COMPILER);
+  std::printf("Machine: %s. Instruction sets: %s. Compiler: %s.", Processor().c_str(),
+              InstructionSetNames[instructionSets], PICTUREZOR_COMPILER);
   const char* between = " Peers: ";
   for (const auto& [name, version] : Peers())
     std::printf("%s%s %s", std::exchange(between, ", "), name.c_str(), version.c_str());
@@ -115,6 +142,8 @@ void PrintTables(Collector& times) {
 }
 
 }
+
+int InstructionSets() { return instructionSets; }
 
 bool AddRace(const std::string& room, const std::string& work, std::vector<Contender> contenders,
              double pixels) {
@@ -175,10 +204,14 @@ int main(int count, char** arguments) {
                             "--benchmark_min_time=0.05"})
     all.push_back(const_cast<char*>(given));
   all.insert(all.end(), arguments + 1, arguments + count);
+  if (!picturezor::bench::TakeInstructionSets(all)) {
+    std::fprintf(stderr, "--instruction_sets=plain, avx2, avx512 or all\n");
+    return 1;
+  }
   int allCount = int(all.size());
   benchmark::Initialize(&allCount, all.data());
   if (benchmark::ReportUnrecognizedArguments(allCount, all.data())) return 1;
-  picturezor::Host::Load(PICTUREZOR_MODULE);
+  picturezor::bench::LoadModule();
   picturezor::bench::Collector collector;
   benchmark::RunSpecifiedBenchmarks(&collector);
   picturezor::bench::PrintTables(collector);

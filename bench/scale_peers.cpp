@@ -68,8 +68,11 @@ std::optional<Contender> Zimg(Format format, Kernel kernel, const Sizes& sizes) 
                      parameters.resample_filter = filter.Name;
                      parameters.filter_param_a = filter.A;
                      parameters.filter_param_b = filter.B;
-                     // Wide vectors too.
-                     parameters.cpu_type = ZIMG_CPU_AUTO_64B;
+#if defined(__x86_64__) || defined(__i386__)
+                     constexpr zimg_cpu_type_e processors[] = {ZIMG_CPU_X86_SSE2, ZIMG_CPU_X86_AVX2,
+                                                               ZIMG_CPU_X86_AVX512_SKX, ZIMG_CPU_AUTO_64B};
+                     parameters.cpu_type = processors[InstructionSets()];
+#endif
                      const auto build = [=] {
                        const std::shared_ptr<zimg_filter_graph> graph(
                            zimg_filter_graph_build(&from, &into, &parameters), zimg_filter_graph_free);
