@@ -1,8 +1,8 @@
 #include <algorithm>
 
-#include "geometry/blocks.h"
 #include "geometry/geometry.h"
 #include "geometry/reversal.h"
+#include "image/byte_blocks.h"
 #include "image/filter.h"
 #include "image/targets.h"
 #include "image/walk.h"
