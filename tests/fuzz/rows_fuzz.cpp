@@ -1,6 +1,8 @@
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <stdexcept>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -61,9 +63,16 @@ class Program {
     }
   }
 
+  /// Of the size and format of another one as often as of its own, since most rows want pictures that fit.
   Picture NewPicture() {
-    const int width = In.Between(1, 40), height = In.Between(1, 24);
-    const auto format = Format(In.Between(0, 41));
+    int width = In.Between(1, 40), height = In.Between(1, 24);
+    auto format = Format(In.Between(0, 41));
+    if (In.Byte() & 1)
+      if (const Picture like = Any(); like && like.Valid() && like.Width() > 0 && like.Height() > 0) {
+        width = std::min(like.Width(), 64);
+        height = std::min(like.Height(), 64);
+        if (In.Byte() & 3) format = like.ImageFormat();
+      }
     switch (In.Between(0, 3)) {
       case 0:
         return Filled(Picture::Mapped(Files[std::size_t(In.Between(0, 3))].Path(), width, height, format, 1));
@@ -147,9 +156,22 @@ class Program {
     return {};
   }
 
+  /// By its name, so that an input means the same after other rows have come or gone: each row bids a number
+  /// made of its name and the input's, and the highest bid has it.
   const MethodEntry& AnyRow() {
-    const auto& rows = model::ClassNamed("PictureZOR").Methods;
-    return rows[std::size_t(In.Byte()) % rows.size()];
+    const int high = In.Byte(), number = high << 8 | In.Byte();
+    return *std::ranges::max_element(model::ClassNamed("PictureZOR").Methods, {},
+                                     [&](const MethodEntry& row) {
+                                       std::uint64_t bid = 14695981039346656037u ^ std::uint64_t(number);
+                                       const auto add = [&bid](std::string_view text) {
+                                         for (const char letter : text)
+                                           bid = (bid ^ std::uint8_t(letter)) * 1099511628211u;
+                                       };
+                                       add(row.LowerName);
+                                       for (const Parameter& parameter : row.Of.Parameters)
+                                         add(parameter.Type);
+                                       return bid ^ bid >> 29;
+                                     });
   }
 
   /// Sizes that would only take long, as asked of a row that makes pictures.
