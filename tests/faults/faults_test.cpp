@@ -5,9 +5,11 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
+#include <iterator>
 
 #include "faults/shim.h"
 #include "support/in_child.h"
@@ -53,6 +55,11 @@ struct Held {
   int Blocks = Shim().Blocks, Descriptors = Shim().Descriptors, Mapped = Windows();
 };
 
+bool IsShared(const MethodEntry& row) {
+  return std::ranges::any_of(model::ClassNamed("PictureZOR").SharedMethods,
+                             [&](const MethodEntry& shared) { return shared.Record == row.Record; });
+}
+
 int FilesInTemporaryFolder() {
   int files = 0;
   const std::string ours = "picturezor-test-" + std::to_string(getpid());
@@ -69,6 +76,7 @@ int Try(const MethodEntry& row, StoredPicture::Kind kind, Format format, int fir
     const RowArguments with(kind, format);
     const bool constructs = row.LowerName == "constructor";
     const Picture made = UnbuiltPicture(), self = constructs ? made : with.Self();
+    void* const object = IsShared(row) ? nullptr : self.Address();
     const std::vector<Value> arguments = with.Ordinary(row);
     const std::vector<Samples> rows =
         constructs || row.LowerName == "close" ? std::vector<Samples>() : StoredRows(self);
@@ -77,7 +85,7 @@ int Try(const MethodEntry& row, StoredPicture::Kind kind, Format format, int fir
                        row.Of.Result == "variant" || row.Of.Result == "string" ||
                        row.Of.Result == "memoryblock";
     Outcome outcome;
-    calls = WithFaults(first, count, [&] { outcome = CallRow(row, self.Address(), arguments); });
+    calls = WithFaults(first, count, [&] { outcome = CallRow(row, object, arguments); });
     const Value& result = outcome.Result;
     EXPECT_TRUE(outcome.Raised.empty() || (!result.Address && !result.Whole));
     if (row.Of.Result == "picturezor" && result.Address) {
@@ -112,7 +120,9 @@ int Try(const MethodEntry& row, StoredPicture::Kind kind, Format format, int fir
 // Catches a result that isn't tested, and what isn't given back on the way out.
 TEST(Faults, OfEachCallInEachRow) {
   int rows = 0, injected = 0;
-  for (const MethodEntry& row : model::ClassNamed("PictureZOR").Methods) {
+  std::vector<MethodEntry> all = model::ClassNamed("PictureZOR").Methods;
+  std::ranges::copy(model::ClassNamed("PictureZOR").SharedMethods, std::back_inserter(all));
+  for (const MethodEntry& row : all) {
     ++rows;
     for (const auto& [kind, format] : {std::pair(StoredPicture::Block, Format::RGBA),
                                        {StoredPicture::Block, Format::G},

@@ -25,7 +25,6 @@ Picture UnbuiltPicture() { return Picture(Object::Adopt(model::NewObject(model::
 RowArguments::RowArguments(StoredPicture::Kind kind, Format format)
     : First(kind, Width, Height, format),
       Second(kind, Width, Height, format),
-      Shown(Width, Height),
       Dot(1, 1, PictureForm::GWorld32),
       Block(BlockSize),
       EmptyBlock(std::size_t{0}),
@@ -50,7 +49,6 @@ RowArguments::RowArguments(StoredPicture::Kind kind, Format format)
     Hosts.back().MakeMask();
   }
   Hosts.emplace_back(1, 1);
-  Shown.MakeMask();
   const Picture closed(Width, Height, format);
   closed.Close();
   Odd = {UnbuiltPicture(),
@@ -98,7 +96,6 @@ Value RowArguments::Ordinary(const MethodEntry& row, const Parameter& parameter)
   if (type == "double") return {.Real = row.LowerName == "rotate" ? 30.0 : 1.5};
   if (type == "picturezor") return Of(Second.Get());
   if (type == "picture") return Of(Hosts[0]);
-  if (type == "picture") return Of(Shown);
   if (type == "memoryblock") return Of(Block);
   if (type == "integer()") return Of(Numbers);
   if (type == "folderitem") return Of(File);
@@ -133,9 +130,10 @@ std::vector<Value> RowArguments::Hostile(const model::TypeName& type) const {
     values.push_back(Of(Self()));
     for (const Picture& picture : Odd) values.push_back(Of(picture));
   }
-  if (type == "picture")
+  if (type == "picture") {
     for (const HostPicture& picture : Hosts) values.push_back(Of(picture));
-  if (type == "picture") values.push_back(Of(Dot));
+    values.push_back(Of(Dot));
+  }
   if (type == "memoryblock") values.push_back(Of(EmptyBlock));
   if (type == "string") values.push_back({.Address = EmptyText});
   if (type == "integer()")

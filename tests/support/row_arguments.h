@@ -32,7 +32,7 @@ class RowArguments {
  private:
   StoredPicture First, Second;
   std::vector<Picture> Odd;
-  HostPicture Shown, Dot;
+  HostPicture Dot;
   MemoryBlock Block, EmptyBlock;
   IntegerArray Numbers, NoNumbers, FewNumbers, ExtremeNumbers;
   TemporaryFile Path;
