@@ -48,8 +48,10 @@ Plane SkewRows(const Plane& from, int width, int height, int background,
 
 Plane Rotated(const Plane& base, double angle, int background) {
   const int w = base.Width, h = base.Height;
-  const double theta = angle * 3.141592653589793 / 180.0;
-  const double s = std::sin(theta), t = std::tan(theta * 0.5), c = std::cos(theta);
+  // With long numbers, which round to the nearest double. Besides, the library's own doubles take an
+  // instruction on PowerPC that qemu doesn't know.
+  const long double theta = angle * 3.141592653589793 / 180.0;
+  const double s = double(std::sin(theta)), t = double(std::tan(theta * 0.5)), c = double(std::cos(theta));
   const Plane first = SkewRows(base, w + int(h * std::fabs(t)), h, background,
                                [&](int y) { return t >= 0 ? t * (y + 0.5) : t * (y - h + 0.5); });
   const int w1 = first.Width, h2 = int(h * c + w * std::fabs(s)) + 1;

@@ -25,7 +25,7 @@ double Radius(Kernel kernel) {
 std::optional<double> ValueAt(Kernel kernel, double a) {
   const auto sinc = [](double t) {
     const double p = t * 3.141592653589793;
-    return t == 0 ? 1.0 : std::sin(p) / p;
+    return t == 0 ? 1.0 : double(std::sin(static_cast<long double>(p))) / p;
   };
   const double s = a * a;
   switch (kernel) {
