@@ -7,9 +7,22 @@
 namespace zor {
 namespace {
 
-// Eight sums side by side, whatever the instruction set: of one pixel of a few rows, all channels of it.
+// Eight sums side by side: of one pixel of a few rows, all channels of it.
 constexpr int Lanes = 8;
-using DoubleLanes [[gnu::vector_size(Lanes * sizeof(double))]] = double;
+class DoubleLanes {
+ public:
+  double operator[](int lane) const { return Parts[lane / PartLanes][lane % PartLanes]; }
+  void Set(int lane, double value) { Parts[lane / PartLanes][lane % PartLanes] = value; }
+  void Add(const DoubleLanes& terms, double weight) {
+    for (int p = 0; p < Lanes / PartLanes; ++p) Parts[p] += weight * terms.Parts[p];
+  }
+
+ private:
+  // Wider vectors come out as single lanes where a processor doesn't have them.
+  static constexpr int PartLanes = 2;
+  using Part [[gnu::vector_size(PartLanes * sizeof(double))]] = double;
+  Part Parts[Lanes / PartLanes] = {};
+};
 
 /// Source pixels that are held widened at a time.
 constexpr int Window = 128;
@@ -54,12 +67,12 @@ class WidePixels {
     DoubleLanes* terms = Of[x - First];
     const auto sample = [&](int plane) { return double(pixel[Pair.Source.Offset[plane]]); };
     if constexpr (Terms == 3) {
-      terms[0][lane] = sample(0) * RedShare;
-      terms[1][lane] = sample(1) * GreenShare;
-      terms[2][lane] = sample(2) * BlueShare;
-      if (Pair.Channels == 2) terms[0][lane + 1] = sample(3);
+      terms[0].Set(lane, sample(0) * RedShare);
+      terms[1].Set(lane, sample(1) * GreenShare);
+      terms[2].Set(lane, sample(2) * BlueShare);
+      if (Pair.Channels == 2) terms[0].Set(lane + 1, sample(3));
     } else {
-      for (int c = 0; c < Pair.Channels; ++c) terms[0][lane + c] = sample(c);
+      for (int c = 0; c < Pair.Channels; ++c) terms[0].Set(lane + c, sample(c));
     }
   }
 
@@ -90,13 +103,13 @@ void SumRows(const RowsInHand* rows) {
   WidePixels<Terms> wide(*rows, end);
   for (std::int32_t x = rows->Of.First; x < rows->Of.End; ++x) {
     const Contribution& line = rows->Table[x];
-    DoubleLanes sums = {};
+    DoubleLanes sums;
     for (std::int32_t i = 0; i < line.Count;) {
       wide.Need(line.Entries[i].Pixel, line.Entries[line.Count - 1].Pixel);
       for (; i < line.Count && wide.Has(line.Entries[i].Pixel); ++i) {
         const double weight = line.Entries[i].Weight;
         const DoubleLanes* terms = wide.At(line.Entries[i].Pixel);
-        for (int t = 0; t < Terms; ++t) sums += weight * terms[t];
+        for (int t = 0; t < Terms; ++t) sums.Add(terms[t], weight);
       }
     }
     StorePixel(*rows, x, sums, line.Sum);
