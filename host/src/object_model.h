@@ -70,6 +70,8 @@ struct Runtime {
   double Version = 0;
   PictureForm Pictures = PictureForm::GWorld32;
   int BytesOfDepth24 = 3;
+  /// What new pictures lack of the width that was asked for, and of the height.
+  int MissingColumns = 0, MissingRows = 0;
   /// Told the name of each service of pictures and QuickDraw that is called.
   std::function<void(const char* service)> OnPictureService;
   int CreationsLeft = -1;

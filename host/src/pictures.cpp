@@ -72,7 +72,10 @@ void unlockPictureDescription(void* picture) {
 
 void* newPicture(std::int32_t width, std::int32_t height, std::int32_t depth) {
   if (!Asked("newPicture") || depth != 32) return nullptr;
-  return Created([&] { return NewPicture(width, height, TheRuntime().Pictures); });
+  const Runtime& runtime = TheRuntime();
+  return Created([&] {
+    return NewPicture(width - runtime.MissingColumns, height - runtime.MissingRows, runtime.Pictures);
+  });
 }
 
 void REALPictureClearCache(void* picture) {

@@ -103,7 +103,11 @@ bool LockPictureForReading(HostPictureLock& lock, HostPicture* picture) {
 bool LockNewPicture(HostPictureLock& lock, std::int32_t width, std::int32_t height) {
   if (width < 1 || width > MostPixels || height < 1 || height > MostPixels) return false;
   const HeldPicture picture(newPicture(width, height, 32));
-  return LockPicture(lock, picture.get(), false, true) && lock.Width >= width && lock.Height >= height;
+  if (!LockPicture(lock, picture.get(), false, true)) return false;
+  // Rows as long as what was asked for are written.
+  if (lock.Width >= width && lock.Height >= height) return true;
+  ReleasePictureLock(lock);
+  return false;
 }
 
 void AdvanceLockRow(HostPictureLock& lock) {

@@ -88,6 +88,20 @@ TEST(Locks, NewPicturesAreNotConverted) {
     });
 }
 
+// Nor is one that can't hold what was asked for.
+TEST(Locks, NewPicturesAreLargeEnough) {
+  for (const PictureForm form : {PictureForm::GWorld32, PictureForm::Rows})
+    InHost(form, [] {
+      const Picture image(5, 4, Format::RGBA);
+      for (const auto& [columns, rows] : {std::pair{1, 0}, {0, 1}, {-1, -1}}) {
+        model::TheRuntime().MissingColumns = columns;
+        model::TheRuntime().MissingRows = rows;
+        EXPECT_EQ(bool(image.CopyPictureWithMask()), columns < 0);
+        EXPECT_EQ(Host::Count().OpenDescriptions, 0);
+      }
+    });
+}
+
 // Catches an endless conversion on a host that makes nothing but pictures which need one.
 TEST(Locks, AConversionIsNotConverted) {
   InHost(PictureForm::Form2, [] { EXPECT_FALSE(Opens(Small(PictureForm::Form2))); });
