@@ -18,27 +18,25 @@ constexpr Colour<3> InksToLight(Colour<4> c) {
   return light;
 }
 
-/// The planes that are read, and what makes red, green and blue of them.
+constexpr FamilyPair LightPairs[] = {
+    Pair<Family::Gray, Family::RGB, GrayToAll>,
+    Pair<Family::RGB, Family::RGB, Same<3>>,
+    Pair<Family::CMYK, Family::RGB, InksToLight>,
+};
+
+/// The planes that are read, as those of a family.
 struct Reading {
+  Family Of = Family::None;
   PlaneList Planes;
-  RowConverter Convert;
 };
 
 Reading ReadingOfColours(const PictureData& image, std::int32_t x) {
-  constexpr AlphaRule none = AlphaRule::None;
-  switch (FamilyOf(image)) {
-    case Family::Gray: return {PlanesOf(Group::Gray, image, x), ConvertRow<1, 3, GrayToAll, none>};
-    case Family::RGB: return {PlanesOf(Group::RGB, image, x), ConvertRow<3, 3, Same<3>, none>};
-    case Family::CMYK: return {PlanesOf(Group::CMYK, image, x), ConvertRow<4, 3, InksToLight, none>};
-    case Family::None: break;
-  }
-  return {};
+  return {FamilyOf(image), PlanesOf(GroupOf(image), image, x)};
 }
 
 Reading ReadingOfAlpha(const PictureData& image, std::int32_t x) {
   if (!image.HasAlpha) return {};
-  return {{1, image.PixelSize, {image.AlphaOffset + x * image.PixelSize}},
-          ConvertRow<1, 3, GrayToAll, AlphaRule::None>};
+  return {Family::Gray, {1, image.PixelSize, {image.AlphaOffset + x * image.PixelSize}}};
 }
 
 /// What is written in front of red, green and blue where a pixel has 4 bytes.
@@ -46,10 +44,12 @@ Sample TopByte(HostLayout layout) { return layout == HostLayout::RowTable ? 0x7F
 
 bool WriteRows(PictureData& image, const Rectangle& r, const Reading& reading, HostPictureLock& lock) {
   const PlaneList into = ColoursOf(lock);
+  const RowConversion toLight =
+      Find(LightPairs, reading.Of, reading.Planes, Family::RGB, into, AlphaRule::None);
   const Sample top = TopByte(lock.Layout);
   return Walk(Yielding(From(image, r.Y))).Rows(r.Height, [&](std::int32_t, const Sample* row) {
     if (lock.PixelBytes == 4) std::memset(lock.CurrentRow, top, std::size_t(r.Width) * 4);
-    reading.Convert(row, reading.Planes, lock.CurrentRow, into, r.Width);
+    toLight(row, lock.CurrentRow, r.Width);
     AdvanceLockRow(lock);
   });
 }
@@ -58,7 +58,7 @@ template <class ReadingOf>
 HostPicture* Export(PictureData& image, const Rectangle& rectangle, ReadingOf&& readingOf) {
   const Rectangle r = FilterRect(image, rectangle);
   const Reading reading = readingOf(image, r.X);
-  if (r.Empty() || !reading.Convert || !Usable(image)) return nullptr;
+  if (r.Empty() || reading.Of == Family::None || !Usable(image)) return nullptr;
   MayYield(image);
   HostPictureLock lock;
   if (!LockNewPicture(lock, r.Width, r.Height)) return nullptr;

@@ -33,47 +33,37 @@ OwnGWorld MakeGWorld(const PictureData& image, std::int32_t depth) {
   return failed ? nullptr : std::move(made);
 }
 
-/// The pixels of a GWorld that is locked: the planes that are written, and whether a byte 255 stands in
-/// front.
+/// The pixels of a GWorld that is locked: bytes of a pixel, whether a byte 255 stands in front, and what
+/// makes them of the image's.
 struct GWorldRows {
   Sample* First;
-  std::int32_t RowBytes;
-  PlaneList Planes;
-  RowConverter Convert;
-  bool Opaque = false;
+  std::int32_t RowBytes, Step;
+  bool Opaque;
+  RowConversion Convert;
 };
 
 GWorldRows RowsFor(const PictureData& image, std::int32_t depth, void* pixMap) {
-  GWorldRows rows{static_cast<Sample*>(GetPixBaseAddr(pixMap)), GetPixRowBytes(pixMap), {}, nullptr};
-  switch (depth) {
-    case 8:
-      rows.Planes = {1, 1, {0}};
-      rows.Convert = ConvertRow<1, 1, Same<1>, AlphaRule::None>;
-      break;
-    case 32:
-      rows.Planes = {4, 4, {1, 2, 3, 0}};
-      rows.Convert = ConvertRow<3, 3, Same<3>, AlphaRule::Copy>;
-      break;
-    default:
-      // The rows that came of it say whether a pixel of 24 bits takes 3 bytes or 4.
-      rows.Opaque = rows.RowBytes >= std::int64_t{image.Width} * 4;
-      rows.Planes = rows.Opaque ? PlaneList{3, 4, {1, 2, 3}} : PlaneList{3, 3, {0, 1, 2}};
-      rows.Convert = ConvertRow<3, 3, Same<3>, AlphaRule::None>;
-  }
-  return rows;
+  auto* first = static_cast<Sample*>(GetPixBaseAddr(pixMap));
+  const std::int32_t rowBytes = GetPixRowBytes(pixMap);
+  const PlaneList planes = PlanesOf(GroupOf(image), image), gray{1, 1, {0}}, inFront{4, 4, {1, 2, 3, 0}},
+                  packed{3, 3, {0, 1, 2}};
+  constexpr FamilyPair grays = Pair<Family::Gray, Family::Gray, Same<1>>;
+  constexpr FamilyPair colours = Pair<Family::RGB, Family::RGB, Same<3>>;
+  if (depth == 8) return {first, rowBytes, 1, false, {grays, AlphaRule::None, planes, gray}};
+  if (depth == 32) return {first, rowBytes, 4, false, {colours, AlphaRule::Copy, planes, inFront}};
+  // The rows that came of it say whether a pixel of 24 bits takes 3 bytes or 4.
+  if (rowBytes < std::int64_t{image.Width} * 4)
+    return {first, rowBytes, 3, false, {colours, AlphaRule::None, planes, packed}};
+  return {first, rowBytes, 4, true, {colours, AlphaRule::None, planes, inFront}};
 }
 
 bool CopyInto(const GWorldRows& rows, PictureData& image) {
-  const std::int64_t used = std::int64_t{image.Width} * rows.Planes.Step;
+  const std::int64_t used = std::int64_t{image.Width} * rows.Step;
   if (!rows.First || rows.RowBytes < used) return false;
-  const PlaneList from = PlanesOf(rows.Planes.Count == 4 ? Group::RGBAlpha
-                                  : image.IsGray         ? Group::Gray
-                                                         : Group::RGB,
-                                  image);
   return Walk(From(image)).Rows(image.Height, [&](std::int32_t y, const Sample* row) {
     Sample* into = rows.First + std::ptrdiff_t{y} * rows.RowBytes;
     if (rows.Opaque) std::memset(into, 255, std::size_t(used));
-    rows.Convert(row, from, into, rows.Planes, image.Width);
+    rows.Convert(row, into, image.Width);
   });
 }
 

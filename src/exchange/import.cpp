@@ -33,9 +33,11 @@ void DrawToGrayChannel(PictureData& image, HostPicture* pic, const Block& block,
   const Block part = CopyRect(image, lock.Width, lock.Height, block);
   const PlaneList from{1, lock.PixelBytes, {ColoursOf(lock, part.SourceX).Offset[colour]}};
   const PlaneList into{1, image.PixelSize, {image.GrayOffset + part.Dest.X * image.PixelSize}};
+  if (part.Dest.Empty()) return;
+  const RowConversion copy(Pair<Family::Gray, Family::Gray, Same<1>>, AlphaRule::None, from, into);
   SkipRows(lock, part.SourceY);
   Walk(Into(image, part.Dest.Y)).Rows(part.Dest.Height, [&](std::int32_t, Sample* row) {
-    ConvertRow<1, 1, Same<1>, AlphaRule::None>(lock.CurrentRow, from, row, into, part.Dest.Width);
+    copy(lock.CurrentRow, row, part.Dest.Width);
     AdvanceLockRow(lock);
   });
 }
@@ -45,9 +47,10 @@ void DrawColours(PictureData& image, HostPictureLock& lock, const Block& block) 
   if (part.Dest.Empty()) return;
   MayYield(image);
   const PlaneList from = ColoursOf(lock, part.SourceX), into = PlanesOf(Group::RGB, image, part.Dest.X);
+  const RowConversion copy(Pair<Family::RGB, Family::RGB, Same<3>>, AlphaRule::None, from, into);
   SkipRows(lock, part.SourceY);
   Walk(Yielding(Into(image, part.Dest.Y))).Rows(part.Dest.Height, [&](std::int32_t, Sample* row) {
-    ConvertRow<3, 3, Same<3>, AlphaRule::None>(lock.CurrentRow, from, row, into, part.Dest.Width);
+    copy(lock.CurrentRow, row, part.Dest.Width);
     AdvanceLockRow(lock);
   });
 }

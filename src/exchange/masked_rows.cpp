@@ -2,7 +2,6 @@
 
 #include <cstring>
 
-#include "image/conversion.h"
 #include "image/targets.h"
 
 namespace zor {
@@ -10,7 +9,7 @@ namespace {
 
 // What becomes of a pixel: from what stands there, the picture and the mask.
 
-struct TakeColours {
+struct ColoursAlone {
   static constexpr int Planes = 3;
   static Colour<3> Of(const Colour<3>&, const Colour<3>& c, const Colour<3>&) { return c; }
 };
@@ -88,13 +87,18 @@ MaskedRows::MaskedRows(MaskUse use, const PlaneList& picture, const PlaneList& m
                        std::int32_t width)
     : In(picture), InMask(mask), Out(image), Width(width), Invert(use.Invert) {
   if (use.For == MaskUse::Alpha) {
-    Plain = image.Count == 3 ? DrawRow<TakeColours>
+    Plain = image.Count == 3 ? DrawRow<ColoursAlone>
             : use.Invert     ? DrawRow<TakeMaskAsAlpha<true>>
                              : DrawRow<TakeMaskAsAlpha<false>>;
     return;
   }
   Plain = use.Invert ? DrawRow<BlendByMask<true>> : DrawRow<BlendByMask<false>>;
-  First = image.Offset[0] / image.Step * image.Step;
+  First = LeftOf(image);
+  PlaneList run = image;
+  for (int c = 0; c < 3; ++c) run.Offset[c] -= First;
+  constexpr FamilyPair same = Pair<Family::RGB, Family::RGB, Same<3>>;
+  TakeColours = RowConversion(same, AlphaRule::None, picture, run);
+  TakeMask = RowConversion(same, AlphaRule::None, mask, run);
   RunBytes = std::size_t(width) * std::size_t(image.Step);
   Colours = NewBuffer(RunBytes);
   Masks = NewBuffer(RunBytes);
@@ -113,10 +117,8 @@ void MaskedRows::operator()(const Sample* picture, const Sample* mask, Sample* i
 }
 
 void MaskedRows::BlendAsRun(const Sample* picture, const Sample* mask, Sample* image) const {
-  PlaneList run = Out;
-  for (int c = 0; c < 3; ++c) run.Offset[c] -= First;
-  ConvertRow<3, 3, Same<3>, AlphaRule::None>(picture, In, Colours.get(), run, Width);
-  ConvertRow<3, 3, Same<3>, AlphaRule::None>(mask, InMask, Masks.get(), run, Width);
+  TakeColours(picture, Colours.get(), Width);
+  TakeMask(mask, Masks.get(), Width);
   const Sample *colours = Colours.get(), *masks = Masks.get();
   if (Invert)
     OnBestTarget<BlendRun<true>>(colours, masks, image + First, RunBytes);

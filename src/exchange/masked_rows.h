@@ -1,5 +1,5 @@
 #pragma once
-#include "image/groups.h"
+#include "image/conversion.h"
 #include "image/walk.h"
 
 namespace zor {
@@ -35,6 +35,7 @@ class MaskedRows {
   // the picture and the mask laid out like them. Null where there is no memory for it.
   std::int32_t First = 0;
   std::size_t RunBytes = 0;
+  RowConversion TakeColours, TakeMask;
   Buffer Colours, Masks;
 };
 
