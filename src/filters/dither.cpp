@@ -30,22 +30,30 @@ struct Dither {
   }
 };
 
-void DitherRun(const Sample* in, Sample* out, const Sample* thresholds, std::ptrdiff_t count, Dither dither) {
-  for (std::ptrdiff_t i = 0; i < count; ++i) out[i] = dither(in[i], thresholds[i]);
+/// `mask` has 255 for samples and 0 for what lies between them; without Gaps it isn't looked at.
+template <bool Gaps>
+void DitherRun(const Sample* in, Sample* out, const Sample* thresholds, const Sample* mask,
+               std::ptrdiff_t count, Dither dither) {
+  for (std::ptrdiff_t i = 0; i < count; ++i) {
+    const Sample level = dither(in[i], thresholds[i]);
+    out[i] = Gaps ? Sample((level & mask[i]) | (out[i] & ~mask[i])) : level;
+  }
 }
 
-/// Rows whose planes fill the pixels of both pictures in the same order, as runs of bytes.
+/// Rows whose planes lie in the pixels of both pictures in the same way, as runs of bytes.
+template <bool Gaps>
 bool DitherRuns(const FilterCall& call, const DitherMatrix& matrix, const Dither& dither) {
-  const std::int32_t in = FirstOffset(call.In), out = FirstOffset(call.Out), planes = call.In.Count;
-  const std::ptrdiff_t rowBytes = std::ptrdiff_t{call.Source.Width} * planes;
+  const RowBytes bytes(call.In, call.Source.Width);
+  const std::int32_t out = FirstOffset(call.Out), step = call.In.Step;
+  const std::ptrdiff_t period = std::ptrdiff_t{matrix.Side} * step;
+  const BytePattern mask(period, [&](std::ptrdiff_t i) { return bytes.IsSample(i) ? 255 : 0; });
   return Walk(From(call.Source), Into(call.Dest))
       .Rows(call.Source.Height, [&](std::int32_t y, Sample* source, Sample* dest) {
         const Sample* cells = matrix.Cells + y % matrix.Side * matrix.Side;
-        const BytePattern thresholds(std::ptrdiff_t{matrix.Side} * planes,
-                                     [&](std::ptrdiff_t i) { return cells[i / planes]; });
-        thresholds.Along(rowBytes, [&](std::ptrdiff_t at, std::ptrdiff_t count, const Sample* bytes) {
-          OnBestTarget<DitherRun>(static_cast<const Sample*>(source + in + at), dest + out + at, bytes, count,
-                                  dither);
+        const BytePattern thresholds(period, [&](std::ptrdiff_t i) { return cells[i / step]; });
+        thresholds.Along(bytes.Count, [&](std::ptrdiff_t at, std::ptrdiff_t count, const Sample* units) {
+          OnBestTarget<DitherRun<Gaps>>(static_cast<const Sample*>(source + bytes.First + at),
+                                        dest + out + at, units, mask.First(), count, dither);
         });
       });
 }
@@ -71,9 +79,11 @@ PictureZOR* DitherFilter(PictureZOR* self, PictureZOR* dest, Integer matrix, Int
     const DitherMatrix* cells = MatrixOf(matrix);
     if (!cells) return true;
     const Dither dither(cells->Side, std::clamp(levels, 2, 256));
-    const bool runs =
-        FillPixelsAlike(call.In, call.Out) && (!call.SharesPixels || &call.Source == &call.Dest);
-    return runs ? DitherRuns(call, *cells, dither) : DitherSamples(call, *cells, dither);
+    const bool runs = call.Source.Width > 0 && LieAlike(call.In, call.Out) &&
+                      (!call.SharesPixels || &call.Source == &call.Dest);
+    if (!runs) return DitherSamples(call, *cells, dither);
+    return FillPixels(call.In) ? DitherRuns<false>(call, *cells, dither)
+                               : DitherRuns<true>(call, *cells, dither);
   });
 }
 

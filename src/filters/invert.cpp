@@ -22,16 +22,12 @@ void Invert(PictureZOR* self, Integer x, Integer y, Integer w, Integer h) {
 
   const PlaneList planes = PlanesOf(GroupOf(picture), picture, part.X);
   if (planes.Count == 0) return;
+  const RowBytes bytes(planes, part.Width);
   // 255 - v is v with all bits flipped; the bytes between the planes have none flipped.
-  const auto begin = planes.Offset.begin(), end = begin + planes.Count;
-  const std::int32_t first = *std::min_element(begin, end), last = *std::max_element(begin, end);
-  const BytePattern bits(planes.Step, [&](std::ptrdiff_t i) {
-    return std::find(begin, end, first + i % planes.Step) != end ? 255 : 0;
-  });
-  const std::ptrdiff_t rowBytes = std::ptrdiff_t{part.Width - 1} * planes.Step + last - first + 1;
+  const BytePattern bits = bytes.Mask();
   Walk(Yielding(Into(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
-    bits.Along(rowBytes, [&](std::ptrdiff_t at, std::ptrdiff_t count, const Sample* flipped) {
-      OnBestTarget<Flip>(row + first + at, flipped, count);
+    bits.Along(bytes.Count, [&](std::ptrdiff_t at, std::ptrdiff_t count, const Sample* flipped) {
+      OnBestTarget<Flip>(row + bytes.First + at, flipped, count);
     });
   });
 }

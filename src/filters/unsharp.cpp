@@ -1,10 +1,10 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdlib>
+#include <optional>
 
+#include "filters/byte_pattern.h"
 #include "filters/filters.h"
-#include "filters/unsharp_runs.h"
-#include "image/groups.h"
 #include "image/stores.h"
 #include "image/targets.h"
 #include "image/walk.h"
@@ -12,70 +12,153 @@
 namespace zor {
 namespace {
 
-/// Pushes samples away from those beside them, by the formula itself. Clamped first and truncated then, as
-/// vectors have it, which is the same; a sum that is not a number becomes 0 either way.
-void PushRun(Sample* samples, const Sample* beside, std::ptrdiff_t count, double factor,
+/// What becomes of sample a beside b: a factor times their difference, from b on. Clamped first and truncated
+/// then, as vectors have it, which is the same; a sum that is not a number becomes 0 either way.
+Sample Pushed(int a, int b, double factor, std::int32_t threshold) {
+  const double v = factor * (a - b) + b;
+  const int pushed = int(v > 0 ? v < 255 ? v : 255 : 0);
+  return Sample(std::abs(a - b) < threshold ? a : pushed);
+}
+
+/// Pushes the samples of a row away from those beside them. `mask` has 255 for samples and 0 for what lies
+/// between them.
+void PushRun(Sample* samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count, double factor,
              std::int32_t threshold) {
   for (std::ptrdiff_t i = 0; i < count; ++i) {
-    const int a = samples[i], b = beside[i], d = a - b;
-    const double v = factor * d + b;
-    const int pushed = int(v > 0 ? v < 255 ? v : 255 : 0);
-    samples[i] = Sample(std::abs(d) < threshold ? a : pushed);
+    const Sample pushed = Pushed(samples[i], beside[i], factor, threshold);
+    samples[i] = Sample((pushed & mask[i]) | (samples[i] & ~mask[i]));
   }
 }
 
-/// The same in whole numbers, for a factor without doubtful differences.
-void PushRunWhole(Sample* samples, const Sample* beside, std::ptrdiff_t count, std::int32_t multiplier,
-                  std::int32_t shift, std::int32_t threshold) {
+/// The formula in whole numbers of 16 bits, for nearly all factors that are used. n times a factor, rounded
+/// down, is n Whole + (n Part >> 16): the fractions that agree with the products fill an interval between
+/// neighbours among those with denominators up to 255, which is wider than 2^-16 and so holds a Part.
+struct WholePush {
+  struct Product {
+    std::uint16_t Whole, Part;
+  };
+  /// For a above b, and for a below b: there the product is rounded up, and so is 1 more than this one.
+  Product Above, Below;
+  /// Smaller differences leave a sample as it is.
+  std::int16_t Least;
+  /// A difference whose product lies a hair below a whole number, and counts as that number: the sum with b,
+  /// in a double, is rounded to it too, but not below a certain size.
+  struct Hair {
+    std::int16_t Difference = 256, From = 0;
+  };
+  static constexpr int MostHairs = 12;
+  std::array<Hair, MostHairs> Hairs{};
+  int HairCount = 0;
+
+  static std::optional<WholePush> Of(double factor, std::int32_t threshold);
+
+ private:
+  static std::optional<Product> ProductOf(double factor, bool negative);
+  bool FindHairs(double factor);
+};
+
+/// The sums stay in 16 bits.
+constexpr double MostFactor = 126;
+
+/// Whether a product isn't a whole number, but so near below one that a sum with b may be rounded to it. Sums
+/// that aren't clamped are rounded to 2^-45 at the coarsest.
+bool HairBelow(double product) {
+  const double whole = std::floor(product);
+  return product != whole && whole + 1 - product <= 0x1p-44;
+}
+double RoundedDown(double product) { return std::floor(product) + HairBelow(product); }
+
+std::optional<WholePush::Product> WholePush::ProductOf(double factor, bool negative) {
+  const auto rounded = [&](int n) {
+    // What is further away is clamped, whatever it is.
+    const double product = negative ? -RoundedDown(-factor * n) - 1 : RoundedDown(factor * n);
+    return std::int32_t(std::min(product, 256.0));
+  };
+  const std::int32_t whole = rounded(1);
+  // floor(n part / 2^16) == rest, for all n.
+  std::int32_t least = 0, most = 65535;
+  for (int n = 1; n <= 255; ++n) {
+    const std::int32_t rest = rounded(n) - n * whole;
+    least = std::max(least, ((rest << 16) + n - 1) / n);
+    if (rest + n * whole < 256) most = std::min(most, (((rest + 1) << 16) - 1) / n);
+  }
+  if (least > most) return std::nullopt;
+  return Product{std::uint16_t(whole), std::uint16_t(least)};
+}
+
+bool WholePush::FindHairs(double factor) {
+  for (int d = -255; d <= 255; ++d) {
+    const double product = factor * d, whole = std::floor(product) + 1;
+    if (!HairBelow(product)) continue;
+    // The largest sum that isn't rounded; larger ones are.
+    int from = 1;
+    for (int b = 0; b <= 255 && whole + b <= 255; ++b)
+      if (whole + b >= 1 && product + b != whole + b) from = int(whole) + b + 1;
+    if (from == 1) continue;
+    if (HairCount == MostHairs) return false;
+    Hairs[std::size_t(HairCount++)] = {std::int16_t(d), std::int16_t(from)};
+  }
+  return true;
+}
+
+std::optional<WholePush> WholePush::Of(double factor, std::int32_t threshold) {
+  if (!(factor > 0 && factor <= MostFactor)) return std::nullopt;
+  const auto above = ProductOf(factor, false), below = ProductOf(factor, true);
+  if (!above || !below) return std::nullopt;
+  WholePush push{*above, *below, std::int16_t(std::clamp(threshold, 0, 256))};
+  if (!push.FindHairs(factor)) return std::nullopt;
+  return push;
+}
+
+/// By masks, not by choices, so that it becomes vector code.
+template <int Hairs>
+void PushRunWhole(Sample* __restrict samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count,
+                  const WholePush& push) {
+  const auto [whole, part] = push.Above;
+  const std::uint16_t otherWhole = whole ^ push.Below.Whole, otherPart = part ^ push.Below.Part;
+  const std::int16_t least = push.Least;
+  std::int16_t difference[Hairs + 1], from[Hairs + 1];
+  for (int h = 0; h < Hairs; ++h) {
+    difference[h] = push.Hairs[std::size_t(h)].Difference;
+    from[h] = push.Hairs[std::size_t(h)].From;
+  }
   for (std::ptrdiff_t i = 0; i < count; ++i) {
-    const int a = samples[i], b = beside[i], d = a - b;
-    const int pushed = b + ((multiplier * d + WholeFactor::Bias) >> shift);
-    samples[i] = Sample(std::abs(d) < threshold ? a : std::clamp(pushed, 0, 255));
+    const std::int16_t a = samples[i], b = beside[i], d = std::int16_t(a - b), below = std::int16_t(-(d < 0));
+    const std::uint16_t n = std::uint16_t((d ^ below) - below);
+    const std::uint16_t high =
+        std::uint16_t(std::uint32_t{n} * std::uint16_t(part ^ (otherPart & below)) >> 16);
+    const std::uint16_t product =
+        std::uint16_t(std::uint16_t(n * std::uint16_t(whole ^ (otherWhole & below))) + high);
+    // Below b it is taken away, and 1 more.
+    std::int16_t v = std::int16_t(b + std::int16_t(product ^ below));
+    for (int h = 0; h < Hairs; ++h) {
+      const std::int16_t is = std::int16_t(-(d == difference[h])), small = std::int16_t(-(v < from[h]));
+      v = std::int16_t(v + (is & small));
+    }
+    v = v < 0 ? std::int16_t{0} : v > 255 ? std::int16_t{255} : v;
+    const Sample moved = Sample(Sample(-(std::int16_t(n) >= least)) & mask[i]);
+    samples[i] = Sample((Sample(v) & moved) | (Sample(a) & ~moved));
   }
 }
 
-/// The formula as a table by both samples, for planes that don't lie side by side and for pictures that share
+void PushRow(Sample* samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count,
+             const WholePush& push) {
+  if (push.HairCount == 0) return OnBestTarget<PushRunWhole<0>>(samples, beside, mask, count, push);
+  if (push.HairCount <= 4) return OnBestTarget<PushRunWhole<4>>(samples, beside, mask, count, push);
+  OnBestTarget<PushRunWhole<WholePush::MostHairs>>(samples, beside, mask, count, push);
+}
+
+/// The formula as a table by both samples, for planes that lie in other ways and for pictures that share
 /// samples: those have to be read one after the other, each after the ones before it have been written.
 struct PushTable {
   Sample Cell[256][256];
 
   PushTable(double factor, std::int32_t threshold) {
     for (int a = 0; a < 256; ++a)
-      for (int b = 0; b < 256; ++b) {
-        Cell[a][b] = Sample(a);
-        const Sample beside = Sample(b);
-        PushRun(&Cell[a][b], &beside, 1, factor, threshold);
-      }
+      for (int b = 0; b < 256; ++b) Cell[a][b] = Pushed(a, b, factor, threshold);
   }
 };
 
-void PushRow(Sample* samples, const Sample* beside, std::ptrdiff_t count, const WholeFactor& factor,
-             std::int32_t threshold) {
-  if (!factor.Fits) return OnBestTarget<PushRun>(samples, beside, count, factor.Factor, threshold);
-  if (CurrentTarget >= Target::AVX512) return PushRunAVX512(samples, beside, count, factor, threshold);
-  factor.AnyDoubtful
-      ? OnBestTarget<PushRun>(samples, beside, count, factor.Factor, threshold)
-      : OnBestTarget<PushRunWhole>(samples, beside, count, factor.Multiplier, factor.Shift, threshold);
-}
-
-}
-
-WholeFactor::WholeFactor(double factor) : Factor(factor) {
-  const double most = std::abs(factor) * 255;
-  while (Shift > 10 && most * (1 << Shift) >= 1 << 30) --Shift;
-  Fits = most * (1 << Shift) < 1 << 30;
-  if (!Fits) return;
-  Multiplier = std::int32_t(std::floor(factor * (1 << Shift) + 0.5));
-  for (int d = -255; d <= 255; ++d) {
-    // The sum of factor d and b, where it isn't clamped, is rounded to 2^-45 at the finest. So b makes no
-    // difference to what lies below the point, unless the product is a hair below a whole number.
-    const double product = factor * d, whole = std::floor(product);
-    const int step = (Multiplier * d + Bias) >> Shift;
-    const bool far = std::abs(product) > 512 && (product > 0 ? step > 255 : step < -255);
-    if (far || (step == whole && (product == whole || whole + 1 - product >= 0x1p-44))) continue;
-    Doubtful[std::size_t(d + 256) / 32] |= std::uint32_t{1} << (d + 256) % 32;
-    AnyDoubtful = true;
-  }
 }
 
 Boolean UnsharpFilter(PictureZOR* self, PictureZOR* origpixels, Double Amount, Integer Threshold) {
@@ -94,12 +177,18 @@ Boolean UnsharpFilter(PictureZOR* self, PictureZOR* origpixels, Double Amount, I
   const Group group = GroupOf(picture);
   const PlaneList planes = PlanesOf(group, picture), from = PlanesOf(group, blurred);
   Walk walk(From(blurred), Into(picture));
-  if (FillPixelsAlike(planes, from) && !SharePixels(picture, blurred)) {
-    const std::int32_t first = FirstOffset(planes), firstBeside = FirstOffset(from);
-    const std::ptrdiff_t count = std::ptrdiff_t{picture.Width} * planes.Count;
-    const WholeFactor whole(factor);
+  if (picture.Width > 0 && LieAlike(planes, from) && !SharePixels(picture, blurred)) {
+    const RowBytes bytes(planes, picture.Width);
+    const std::int32_t firstBeside = FirstOffset(from);
+    const BytePattern mask = bytes.Mask();
+    const std::optional<WholePush> whole = WholePush::Of(factor, Threshold);
     return walk.Rows(picture.Height, [&](std::int32_t, Sample* beside, Sample* row) {
-      PushRow(row + first, beside + firstBeside, count, whole, Threshold);
+      mask.Along(bytes.Count, [&](std::ptrdiff_t at, std::ptrdiff_t count, const Sample* bits) {
+        Sample* const samples = row + bytes.First + at;
+        const Sample* const others = beside + firstBeside + at;
+        whole ? PushRow(samples, others, bits, count, *whole)
+              : OnBestTarget<PushRun>(samples, others, bits, count, factor, Threshold);
+      });
     });
   }
   const PushTable pushed(factor, Threshold);

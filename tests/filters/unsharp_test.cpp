@@ -15,9 +15,33 @@ std::uint8_t Cell(int a, int b, double amount, int threshold) {
 
 /// All pairs of samples, and each amount in one picture.
 TEST(UnsharpFilter, PushesEveryPair) {
-  const double amounts[] = {
-      0,    0.1,   0.3,   0.5,  0.35, 1.0 / 3,          1,           2.7,   63,   1e5, 1e300,
-      -0.1, -0.25, -0.26, -0.5, -3,   double(INFINITY), double(NAN), 1e-17, 0.05, 0.2};
+  const double amounts[] = {0,
+                            0.1,
+                            0.3,
+                            0.5,
+                            0.35,
+                            0.025,
+                            0.33,
+                            0.82,
+                            31.25,
+                            31.26,
+                            0.155,
+                            1.0 / 3,
+                            1,
+                            2.7,
+                            63,
+                            1e5,
+                            1e300,
+                            -0.1,
+                            -0.25,
+                            -0.26,
+                            -0.5,
+                            -3,
+                            double(INFINITY),
+                            double(NAN),
+                            1e-17,
+                            0.05,
+                            0.2};
   const Picture all(256, 256, Format::G), blurred(256, 256, Format::G);
   Samples a, b;
   for (int i = 0; i < 65536; ++i) {
