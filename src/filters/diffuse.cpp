@@ -10,9 +10,10 @@ namespace zor {
 PictureZOR* DiffuseFilter(PictureZOR* self, PictureZOR* dest, Integer level) {
   return RunFilter(self, dest, {.Groups = FilterRules::GrayAndRGB}, [&](const FilterCall& call) {
     const std::int64_t width = call.Source.Width, height = call.Source.Height;
-    const std::int64_t reach = std::max(level, 0), choices = 2 * reach + 1;
+    const std::int64_t reach = std::max(level, 0);
+    const std::uint32_t choices = 2 * std::uint32_t(reach) + 1;
     const auto near = [&](std::int64_t place, std::int64_t count) {
-      return std::clamp<std::int64_t>(place + std::rand() % choices - reach, 0, count - 1);
+      return std::clamp<std::int64_t>(place + std::uint32_t(std::rand()) % choices - reach, 0, count - 1);
     };
     bool reached = true;
     ForPlaneCount(call.In.Count, [&](auto n) {

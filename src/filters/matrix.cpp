@@ -46,8 +46,8 @@ Sample Scaled(std::int64_t sum, double scaleFactor) {
                             : Scaled(double(sum) * scaleFactor);
 }
 
-/// As many weights as are summed up at a time, each with the samples that it goes to.
-constexpr int TapsAtATime = 9;
+/// As many weights as are summed up at a time, or a few of them, each with the samples that it goes to.
+constexpr int TapsAtATime = 9, FewTaps = 5;
 template <class Sum>
 struct Taps {
   const Sample* From[TapsAtATime];
@@ -55,12 +55,12 @@ struct Taps {
 };
 
 /// A Product holds the products of all these together.
-template <class Sum, class Product>
+template <class Sum, class Product, int Count>
 void AddTaps(Sum* sums, Taps<Sum> taps, std::ptrdiff_t count) {
   using Wrapping = std::conditional_t<sizeof(Product) == 8, std::uint64_t, std::uint32_t>;
   for (std::ptrdiff_t i = 0; i < count; ++i) {
     Wrapping sum = 0;
-    for (int t = 0; t < TapsAtATime; ++t) sum += Wrapping(taps.Weight[t]) * taps.From[t][i];
+    for (int t = 0; t < Count; ++t) sum += Wrapping(taps.Weight[t]) * taps.From[t][i];
     sums[i] = Sum(sums[i] + Product(sum));
   }
 }
@@ -119,11 +119,14 @@ std::optional<bool> ConvolveRows(const FilterCall& call, const Matrix& matrix) {
     int some = 0;
     std::int64_t together = 0;
     const auto add = [&] {
-      for (; some % TapsAtATime; ++some) {
+      if (some == 0) return;
+      const bool few = some <= FewTaps;
+      for (; some < (few ? FewTaps : TapsAtATime); ++some) {
         taps.From[some] = taps.From[0];
         taps.Weight[some] = 0;
       }
-      if (some) OnBestTarget<AddTaps<Sum, Product>>(static_cast<Sum*>(sums), taps, count);
+      few ? OnBestTarget<AddTaps<Sum, Product, FewTaps>>(static_cast<Sum*>(sums), taps, count)
+          : OnBestTarget<AddTaps<Sum, Product, TapsAtATime>>(static_cast<Sum*>(sums), taps, count);
       some = 0;
       together = 0;
     };
