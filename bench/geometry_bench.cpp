@@ -2,13 +2,11 @@
 #include <memory>
 
 #include "race.h"
+#include "vips_peer.h"
 
 #ifdef PICTUREZOR_OPENCV
 #include <opencv2/core.hpp>
 #include <opencv2/core/version.hpp>
-#endif
-#ifdef PICTUREZOR_VIPS
-#include <vips/vips.h>
 #endif
 #ifdef PICTUREZOR_GRAPHICSMAGICK
 #include <magick/api.h>
@@ -57,27 +55,6 @@ Contender Turn(Format format, int code) {
   return {"OpenCV", [=] {
             cv::setNumThreads(1);
             return [=, mat = MatOf(format), into = cv::Mat()]() mutable { cv::rotate(mat, into, code); };
-          }};
-}
-#endif
-
-#ifdef PICTUREZOR_VIPS
-/// Runs work on a picture in memory and writes its result to memory.
-Contender Vips(Format format, int (*work)(VipsImage*, VipsImage**)) {
-  return {"libvips", [=] {
-            vips_concurrency_set(1);
-            vips_cache_set_max(0);
-            auto pixels = std::make_shared<Bytes>(TestPicture(format).DataStringInFormat(format));
-            return [=] {
-              VipsImage* in = vips_image_new_from_memory(pixels->data(), pixels->size(), Width, Height,
-                                                         BytesPerPixel(format), VIPS_FORMAT_UCHAR);
-              VipsImage* out = nullptr;
-              std::size_t size = 0;
-              void* result = work(in, &out) == 0 ? vips_image_write_to_memory(out, &size) : nullptr;
-              g_free(result);
-              if (out) g_object_unref(out);
-              g_object_unref(in);
-            };
           }};
 }
 #endif
@@ -142,10 +119,6 @@ void AddFormat(const std::string& name, Format format) {
 const auto registered = [] {
 #ifdef PICTUREZOR_OPENCV
   NamePeer("OpenCV", CV_VERSION);
-#endif
-#ifdef PICTUREZOR_VIPS
-  VIPS_INIT("picturezor_bench");
-  NamePeer("libvips", vips_version_string());
 #endif
 #ifdef PICTUREZOR_GRAPHICSMAGICK
   InitializeMagick(nullptr);

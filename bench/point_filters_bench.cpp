@@ -2,6 +2,7 @@
 #include <memory>
 
 #include "race.h"
+#include "vips_peer.h"
 
 #ifdef PICTUREZOR_OPENCV
 #include <opencv2/core.hpp>
@@ -83,6 +84,17 @@ void AddTableRace(const std::string& name, Format format, [[maybe_unused]] int t
 #ifdef PICTUREZOR_OPENCV
   contenders.push_back(OpenCV(BytesPerPixel(format), LookUp(tables)));
 #endif
+#ifdef PICTUREZOR_VIPS
+  contenders.push_back(Vips(format, [tables](VipsImage* in, VipsImage** out) {
+    std::vector<std::uint8_t> entries;
+    for (int i = 0; i < 256 * tables; ++i) entries.push_back(std::uint8_t(255 - i / tables + i % tables));
+    VipsImage* table =
+        vips_image_new_from_memory_copy(entries.data(), entries.size(), 256, 1, tables, VIPS_FORMAT_UCHAR);
+    const int failed = vips_maplut(in, out, table, nullptr);
+    g_object_unref(table);
+    return failed;
+  }));
+#endif
   contenders.push_back(Memcpy(BytesOf(BytesPerPixel(format))));
   AddRace("filters", name, std::move(contenders));
 }
@@ -95,6 +107,10 @@ const auto registered = [] {
 #ifdef PICTUREZOR_OPENCV
     contenders.push_back(OpenCV(BytesPerPixel(format),
                                 [](const cv::Mat& source, cv::Mat&) { cv::bitwise_not(source, source); }));
+#endif
+#ifdef PICTUREZOR_VIPS
+    contenders.push_back(
+        Vips(format, [](VipsImage* in, VipsImage** out) { return vips_invert(in, out, nullptr); }));
 #endif
     contenders.push_back(Memcpy(BytesOf(BytesPerPixel(format))));
     AddRace("filters", name, std::move(contenders));
@@ -121,9 +137,12 @@ const auto registered = [] {
                [=](const Picture& s, const Picture& d) { s.TransferFilter(d, array); });
 
   for (const double amount : {0.5, 0.3}) {
-    std::vector<Contender> unsharp{Ours(Format::RGB, [=](const Picture& source, const Picture& dest) {
-      dest.UnsharpFilter(source, amount, 4);
-    })};
+    std::vector<Contender> unsharp{{"PictureZOR", [=] {
+                                      const Picture picture = TestPicture(Format::RGB);
+                                      return [=, blurred = picture.BoxBlurFilter({}, 2)] {
+                                        picture.UnsharpFilter(blurred, amount, 4);
+                                      };
+                                    }}};
 #ifdef PICTUREZOR_OPENCV
     // Without a threshold.
     unsharp.push_back(OpenCV(3, [=](const cv::Mat& source, cv::Mat& dest) {
