@@ -372,7 +372,11 @@ void AddFilter(CLI::App& app, Session& session) {
   auto list = std::make_shared<bool>(false);
   command->add_flag("--list", *list, "Name all filters");
   for (const FilterCommand& filter : Filters) AddOne(*command, session, filter);
+  command->allow_extras();
   command->callback([&session, command, list] {
+    if (command->get_subcommands().empty() && command->remaining_size() > 0)
+      throw CLI::ValidationError(command->remaining().front(),
+                                 "there is no such filter; --list names them all");
     if (*list)
       session.Work = List;
     else if (command->get_subcommands().empty())

@@ -139,6 +139,8 @@ TEST_F(Filter, WrongCommandLines) {
     EXPECT_THAT(outcome.Error, testing::MatchesRegex("picturezor: [^\n]+\n"));
     EXPECT_THAT(Files(), testing::ElementsAre("in.png"));
   }
+  EXPECT_THAT(Run({"filter", "sharpen-it", "in.png"}).Error,
+              HasSubstr(": sharpen-it: there is no such filter"));
   Fail({"filter", "transfer", "in.png", "--table", "@nowhere.txt", "-o", "out.png"}, "nowhere.txt",
        "can't be read");
 }
