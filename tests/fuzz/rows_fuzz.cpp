@@ -59,7 +59,10 @@ class Program {
       case 3: return SetFactories();
       case 4: return Host::FailCreationsAfter(In.Between(-3, 6));
       case 5: return Assign();
-      default: return Call();
+      case 6:
+      case 7:
+      case 8: return Call(Numbers::Fitting);
+      default: return Call(Numbers::Any);
     }
   }
 
@@ -141,8 +144,17 @@ class Program {
     Yielding = false;
   }
 
-  Value Argument(const Parameter& parameter) {
+  /// An operation that wants six numbers to fit would hardly ever get them by chance.
+  enum class Numbers { Any, Fitting };
+  int Fitting(const std::string& name) {
+    if (name.ends_with("width") || name.ends_with("height")) return In.Between(1, 24);
+    if (name == "mode") return In.Between(1, 7);
+    return In.Between(-2, 13);
+  }
+  Value Argument(const Parameter& parameter, Numbers numbers = Numbers::Any) {
     const model::TypeName& type = parameter.Type;
+    if (type == "integer" && numbers == Numbers::Fitting)
+      return {.Whole = Fitting(model::Lower(parameter.Name))};
     if (type == "integer" || type == "color") return {.Whole = In.Integer()};
     if (type == "boolean") return {.Whole = In.Byte() & 1};
     if (type == "double") return {.Real = In.Real()};
@@ -186,13 +198,13 @@ class Program {
     return pixels > MostPixels;
   }
 
-  void Call() {
+  void Call(Numbers numbers) {
     const MethodEntry& row = AnyRow();
     const bool constructs = row.LowerName == "constructor";
     const Picture self = constructs && In.Between(0, 7) ? UnbuiltPicture() : Any();
     if (!self) return;
     std::vector<Value> arguments;
-    for (const Parameter& parameter : row.Of.Parameters) arguments.push_back(Argument(parameter));
+    for (const Parameter& parameter : row.Of.Parameters) arguments.push_back(Argument(parameter, numbers));
     if (IsLarge(row, arguments) || !KeepsPromises(row, arguments)) return;
     const Outcome outcome = CallRow(row, self.Address(), arguments);
     if (constructs) Keep(self);
