@@ -68,9 +68,7 @@ Host::Alive Host::Count() { return TheRuntime().Alive; }
 
 int Host::CountOf(std::string_view className) {
   const Class* of = FindClass(className);
-  const auto& counts = TheRuntime().AliveOf;
-  const auto found = counts.find(of);
-  return found == counts.end() ? 0 : found->second;
+  return of ? of->Alive : 0;
 }
 
 std::vector<Host::MethodInfo> Host::Methods(std::string_view className) {

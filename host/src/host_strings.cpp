@@ -11,19 +11,20 @@ namespace {
 bool IsHigh(std::uint32_t unit) { return unit >= 0xD800 && unit < 0xDC00; }
 bool IsLow(std::uint32_t unit) { return unit >= 0xDC00 && unit < 0xE000; }
 
-void AppendUTF8(std::string& text, std::uint32_t code) {
+void AppendUTF8(Bytes& text, std::uint32_t code) {
   if (code < 0x80) {
-    text += char(code);
+    text.push_back(std::uint8_t(code));
     return;
   }
   const int more = code < 0x800 ? 1 : code < 0x10000 ? 2 : 3;
   constexpr unsigned Lead[] = {0, 0xC0, 0xE0, 0xF0};
-  text += char(Lead[more] | code >> (6 * more));
-  for (int part = more - 1; part >= 0; --part) text += char(0x80 | ((code >> (6 * part)) & 0x3F));
+  text.push_back(std::uint8_t(Lead[more] | code >> (6 * more)));
+  for (int part = more - 1; part >= 0; --part)
+    text.push_back(std::uint8_t(0x80 | ((code >> (6 * part)) & 0x3F)));
 }
 
-std::string UTF8FromUTF16(const std::string& bytes) {
-  std::string text;
+Bytes UTF8FromUTF16(const Bytes& bytes) {
+  Bytes text;
   const auto unit = [&](std::size_t i) {
     std::uint16_t value;
     std::memcpy(&value, bytes.data() + 2 * i, 2);
@@ -43,7 +44,7 @@ std::string UTF8FromUTF16(const std::string& bytes) {
 
 }
 
-StringRecord* NewString(std::string bytes, std::uint32_t encoding) {
+StringRecord* NewString(Bytes bytes, std::uint32_t encoding) {
   ++TheRuntime().Alive.Strings;
   auto* string = new StringRecord{1, 0, encoding, std::move(bytes)};
   if (!string->Bytes.empty())
@@ -56,6 +57,8 @@ void UnlockString(StringRecord* string) {
   delete string;
   --TheRuntime().Alive.Strings;
 }
+
+std::string TextOf(const StringRecord& string) { return {string.Bytes.begin(), string.Bytes.end()}; }
 
 StringRecord* Converted(const StringRecord& string, std::uint32_t encoding) {
   const bool transcodes = string.Encoding == UTF16 && encoding == UTF8;

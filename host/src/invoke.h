@@ -1,5 +1,7 @@
 #pragma once
+#include <array>
 #include <cstring>
+#include <span>
 #include <string>
 #include <string_view>
 #include <tuple>
@@ -54,16 +56,18 @@ struct Given {
   }
 };
 
-/// A row found for a call: its function, and the defaults of the arguments that weren't given.
-struct Found {
-  const MethodEntry* Entry;
-  std::vector<Parameter> Missing;
-};
+/// The types that C++ types are declared as.
+template <class... A>
+inline constexpr std::array<const char*, sizeof...(A)> TypesOf{Passed<A>::TypeName...};
+using TypeList = std::span<const char* const>;
 
 /// The row with this name that takes arguments of these types, as a compiler would choose it: one that takes
 /// just these first, then one whose further arguments are optional. Throws ModuleError when there is none.
-Found FindMethod(const std::vector<MethodEntry>& rows, std::string_view name,
-                 const std::vector<TypeName>& types);
+Found FindMethod(const std::vector<MethodEntry>& rows, std::string_view name, TypeList types);
+
+/// The same for a method of an object, remembered by its class. `types` is one of `TypesOf`. Throws
+/// ModuleError for nil, too.
+const Found& FindMethod(const Object& self, std::string_view name, TypeList types);
 
 template <class R, class... C>
 R CallPointer(std::uintptr_t function, C... arguments) {
@@ -133,8 +137,7 @@ R Finish(Call&& call) {
 /// Calls a method on an object, every argument given.
 template <class R, class... A>
 R Invoke(const Object& self, std::string_view name, const A&... arguments) {
-  if (!self) throw ModuleError(std::string(name) + ": called on nil");
-  const Found found = FindMethod(HeaderOf(self.Address()).Of->Methods, name, {Passed<A>::TypeName...});
+  const Found& found = FindMethod(self, name, TypesOf<A...>);
   return Finish<R>([&] {
     return CallFound<typename ResultC<R>::Type>(found, self.Address(), Passed<A>::From(arguments)...);
   });
@@ -143,8 +146,7 @@ R Invoke(const Object& self, std::string_view name, const A&... arguments) {
 /// The same with trailing optional arguments left out.
 template <class R, class... A>
 R InvokeShort(const Object& self, std::string_view name, const A&... arguments) {
-  if (!self) throw ModuleError(std::string(name) + ": called on nil");
-  const Found found = FindMethod(HeaderOf(self.Address()).Of->Methods, name, {Passed<A>::TypeName...});
+  const Found& found = FindMethod(self, name, TypesOf<A...>);
   return Finish<R>([&] {
     return CallFoundFilled<typename ResultC<R>::Type>(found, self.Address(), Passed<A>::From(arguments)...);
   });
@@ -153,8 +155,7 @@ R InvokeShort(const Object& self, std::string_view name, const A&... arguments) 
 /// Calls the assignment form of a method; the last argument is the value.
 template <class Value, class... A>
 void Assign(const Object& self, std::string_view name, const Value& value, const A&... arguments) {
-  if (!self) throw ModuleError(std::string(name) + ": called on nil");
-  const Found found = FindMethod(HeaderOf(self.Address()).Of->Methods, name, {Passed<A>::TypeName...});
+  const Found& found = FindMethod(self, name, TypesOf<A...>);
   const std::uintptr_t setter = found.Entry->Record->Setter;
   if (!setter || found.Entry->Of.Result != Passed<Value>::TypeName)
     throw ModuleError(std::string(name) + " takes no such assignment");
@@ -164,7 +165,7 @@ void Assign(const Object& self, std::string_view name, const Value& value, const
 
 template <class R, class... A>
 R InvokeShared(std::string_view className, std::string_view name, const A&... arguments) {
-  const Found found = FindMethod(ClassNamed(className).SharedMethods, name, {Passed<A>::TypeName...});
+  const Found found = FindMethod(ClassNamed(className).SharedMethods, name, TypesOf<A...>);
   return Finish<R>(
       [&] { return CallFound<typename ResultC<R>::Type>(found, Passed<A>::From(arguments)...); });
 }

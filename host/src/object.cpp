@@ -1,24 +1,10 @@
 #include "picturezor/object.h"
 
-#include <algorithm>
-
 #include "object_model.h"
 
 namespace picturezor {
 
 using namespace model;
-
-namespace {
-
-void* NewBlock(std::size_t size) {
-  auto payload = std::make_unique<BlockPayload>();
-  payload->Own.resize(size);
-  payload->Start = payload->Own.data();
-  payload->Size = size;
-  return NewObject(ClassNamed("MemoryBlock"), std::move(payload));
-}
-
-}
 
 Object::Object(const Object& other) : At(other.At) { Lock(At); }
 
@@ -37,11 +23,10 @@ Object Object::Share(void* address) {
 
 int Object::References() const { return At ? HeaderOf(At).References : 0; }
 
-MemoryBlock::MemoryBlock(std::size_t size) : Object(Adopt(NewBlock(size))) {}
+MemoryBlock::MemoryBlock(std::size_t size) : Object(Adopt(NewBlock(Bytes(size)))) {}
 
-MemoryBlock::MemoryBlock(std::span<const std::uint8_t> bytes) : MemoryBlock(bytes.size()) {
-  std::ranges::copy(bytes, Start());
-}
+MemoryBlock::MemoryBlock(std::span<const std::uint8_t> bytes)
+    : Object(Adopt(NewBlock(Bytes(bytes.begin(), bytes.end())))) {}
 
 std::span<std::uint8_t> MemoryBlock::Data() const {
   const auto* payload = HeldBy<BlockPayload>(Address());

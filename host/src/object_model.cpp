@@ -106,11 +106,11 @@ bool MayCreate() {
 }
 
 void* NewObject(const Class& of, std::unique_ptr<Payload> holds) {
-  void* memory = ::operator new (InstanceOffset + of.DataSize, std::align_val_t{InstanceOffset});
+  void* memory = ::operator new(InstanceOffset + of.DataSize);
   std::memset(memory, 0, InstanceOffset + of.DataSize);
   new (memory) ObjectHeader{&of, 1, std::move(holds)};
   ++TheRuntime().Alive.Objects;
-  ++TheRuntime().AliveOf[&of];
+  ++of.Alive;
   return memory;
 }
 
@@ -128,9 +128,9 @@ void Unlock(void* object) {
   }
   ReleaseFields(object);
   HeaderOf(object).~ObjectHeader();
-  ::operator delete (object, std::align_val_t{InstanceOffset});
+  ::operator delete(object);
   --TheRuntime().Alive.Objects;
-  --TheRuntime().AliveOf[of];
+  --of->Alive;
 }
 
 void ThrowPending() {

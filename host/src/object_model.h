@@ -5,13 +5,17 @@
 #include <map>
 #include <memory>
 #include <new>
+#include <span>
 #include <string>
 #include <string_view>
+#include <unordered_map>
+#include <utility>
 #include <vector>
 
 #include "declaration.h"
 #include "frame/records.h"
 #include "picturezor/host.h"
+#include "picturezor/object.h"
 
 namespace picturezor::model {
 
@@ -28,6 +32,25 @@ struct PropertyEntry {
   std::string LowerName, LowerType;
 };
 
+/// A row found for a call, and those of its parameters whose arguments weren't given.
+struct Found {
+  const MethodEntry* Entry;
+  std::span<const Parameter> Missing;
+};
+
+/// Hashes and compares what was asked for: a name, and the address of the list of the arguments' types.
+struct SameQuestion {
+  using is_transparent = void;
+  template <class Name>
+  std::size_t operator()(const std::pair<Name, const void*>& asked) const {
+    return std::hash<std::string_view>()(asked.first) ^ std::hash<const void*>()(asked.second);
+  }
+  template <class Name, class OtherName>
+  bool operator()(const std::pair<Name, const void*>& a, const std::pair<OtherName, const void*>& b) const {
+    return a.second == b.second && a.first == b.first;
+  }
+};
+
 struct Class {
   std::string Name;
   std::size_t DataSize = 0;
@@ -36,6 +59,10 @@ struct Class {
   std::vector<MethodEntry> Methods{}, SharedMethods{};
   std::vector<PropertyEntry> Properties{};
   std::map<std::string, std::int64_t> Constants{};  // by lower-case name
+  mutable int Alive = 0;
+  /// The methods found so far, since some calls work on a row of a picture only.
+  mutable std::unordered_map<std::pair<std::string, const void*>, Found, SameQuestion, SameQuestion>
+      FoundMethods{};
 };
 
 /// What an object of one of the host's own classes holds beside its instance data.
@@ -76,7 +103,6 @@ struct Runtime {
   std::function<void(const char* service)> OnPictureService;
   int CreationsLeft = -1;
   Host::Alive Alive;
-  std::map<const Class*, int> AliveOf;
   /// What comes out of the call in hand once the module returns: an exception that the module raised, or one
   /// that C++ code called by the module threw.
   void* Raised = nullptr;
@@ -100,12 +126,25 @@ void Lock(void* object);
 void Unlock(void* object);
 
 struct BlockPayload : Payload {
-  std::vector<std::uint8_t> Own;
-  std::uint8_t* Start = nullptr;
-  std::size_t Size = 0;
-  BlockPayload() { ++TheRuntime().Alive.MemoryBlocks; }
+  Bytes Own;
+  std::uint8_t* Start;
+  std::size_t Size;
+  explicit BlockPayload(Bytes bytes) : Own(std::move(bytes)), Start(Own.data()), Size(Own.size()) {
+    ++TheRuntime().Alive.MemoryBlocks;
+  }
+  /// Over memory of the module, whose size isn't known.
+  explicit BlockPayload(void* start) : Start(static_cast<std::uint8_t*>(start)), Size(0) {
+    ++TheRuntime().Alive.MemoryBlocks;
+  }
   ~BlockPayload() override { --TheRuntime().Alive.MemoryBlocks; }
 };
+/// A new block, of bytes or over an address.
+template <class Of>
+void* NewBlock(Of&& of) {
+  static const Class& blocks = ClassNamed("MemoryBlock");
+  return NewObject(blocks, std::make_unique<BlockPayload>(std::forward<Of>(of)));
+}
+
 struct FilePayload : Payload {
   std::string Path;
 };

@@ -18,15 +18,16 @@ constexpr const char* ClassName = "PictureZOR";
 
 Object NewPictureObject() { return Object::Adopt(NewObject(ClassNamed(ClassName))); }
 
+/// The bytes of a block that the module has just made, and that nobody else has.
 Bytes BytesOf(const MemoryBlock& block) {
-  const auto data = block.Data();
-  return {data.begin(), data.end()};
+  auto* payload = HeldBy<BlockPayload>(block.Address());
+  return payload ? std::move(payload->Own) : Bytes();
 }
 
 /// Takes the string over.
 Bytes BytesOf(StringRecord* string) {
   if (!string) return {};
-  Bytes bytes(string->Bytes.begin(), string->Bytes.end());
+  Bytes bytes = string->References == 1 ? std::move(string->Bytes) : string->Bytes;
   UnlockString(string);
   return bytes;
 }
@@ -35,7 +36,7 @@ Bytes BytesOf(StringRecord* string) {
 class HostText {
  public:
   explicit HostText(std::span<const std::uint8_t> bytes)
-      : Of(NewString(std::string(bytes.begin(), bytes.end()), 0xFFFF)) {}
+      : Of(NewString(Bytes(bytes.begin(), bytes.end()), 0xFFFF)) {}
   HostText(const HostText&) = delete;
   ~HostText() { UnlockString(Of); }
   operator StringRecord*() const { return Of; }

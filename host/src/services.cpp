@@ -47,8 +47,8 @@ void* GetEventInstancePPC(void* object, std::uintptr_t eventWord) {
 
 void* REALBuildString(const void* bytes, std::int32_t length) {
   if (length < 0) return nullptr;
-  return Created(
-      [&] { return NewString(std::string(static_cast<const char*>(bytes), std::size_t(length)), 0); });
+  const auto* begin = static_cast<const std::uint8_t*>(bytes);
+  return Created([&] { return NewString(Bytes(begin, begin + length), 0); });
 }
 void REALSetStringEncoding(void* string, std::uint32_t encoding) {
   if (string) static_cast<StringRecord*>(string)->Encoding = encoding;
@@ -64,33 +64,20 @@ void RuntimeRaiseException(void* exception) { Unlock(std::exchange(TheRuntime().
 unsigned char REALSetPropValueString(void* object, const char* name, void* string) {
   auto* exception = HeldBy<ExceptionPayload>(object);
   if (!exception || std::strcmp(name, "Message") != 0) return 0;
-  exception->Message = string ? static_cast<StringRecord*>(string)->Bytes : "";
+  exception->Message = string ? TextOf(*static_cast<StringRecord*>(string)) : "";
   return 1;
 }
 
-void* NewBlock(std::unique_ptr<BlockPayload> payload) {
-  return NewObject(*FindClass("MemoryBlock"), std::move(payload));
-}
 void* newMemoryBlock(std::int32_t size) {
   if (size < 0) return nullptr;
-  return Created([&] {
-    auto payload = std::make_unique<BlockPayload>();
-    payload->Own.resize(std::size_t(size));
-    payload->Start = payload->Own.data();
-    payload->Size = std::size_t(size);
-    return NewBlock(std::move(payload));
-  });
+  return Created([&] { return NewBlock(Bytes(std::size_t(size))); });
 }
 void* memoryBlockGetPtr(void* block) {
   const auto* payload = HeldBy<BlockPayload>(block);
   return payload ? payload->Start : nullptr;
 }
 void* PtrToMemoryBlock(void* address) {
-  return Created([&] {
-    auto payload = std::make_unique<BlockPayload>();
-    payload->Start = static_cast<std::uint8_t*>(address);
-    return NewBlock(std::move(payload));
-  });
+  return Created([&] { return NewBlock(address); });
 }
 
 void REALYieldToRB() {

@@ -25,7 +25,7 @@ std::string Built(const void* bytes, std::int32_t length, std::uint32_t encoding
   auto* string = reinterpret_cast<model::StringRecord*>(zor::BuildHostString(bytes, length, encoding));
   if (!string) return "nil";
   tagged = string->Encoding;
-  const std::string text = string->Bytes;
+  const std::string text = model::TextOf(*string);
   model::UnlockString(string);
   return text;
 }

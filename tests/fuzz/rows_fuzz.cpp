@@ -234,7 +234,7 @@ class Program {
   const std::vector<IntegerArray> Arrays = {IntegerArray(std::vector<std::int32_t>(256, 200)),
                                             IntegerArray({1, -2, 2147483647, 4, 5, 6, 7, 8, 9}),
                                             IntegerArray(std::vector<std::int32_t>{})};
-  model::StringRecord* const Text = model::NewString(std::string(BlockSize, 'x'), model::UTF8);
+  model::StringRecord* const Text = model::NewString(Bytes(BlockSize, 'x'), model::UTF8);
   bool Yielding = false;
 };
 

@@ -41,8 +41,8 @@ RowArguments::RowArguments(StoredPicture::Kind kind, Format format)
       Folder(Path.Path().parent_path()),
       Factory([](std::int32_t width, std::int32_t height, Format of) { return Picture(width, height, of); }),
       EmptyFactory(PictureFactory::Handler{}),
-      Text(model::NewString(std::string(BlockSize, 'x'), model::UTF8)),
-      EmptyText(model::NewString("", model::UTF8)) {
+      Text(model::NewString(Bytes(BlockSize, 'x'), model::UTF8)),
+      EmptyText(model::NewString({}, model::UTF8)) {
   for (const PictureForm form : {PictureForm::GWorld32, PictureForm::GWorld24, PictureForm::GWorld16,
                                  PictureForm::Form2, PictureForm::None}) {
     Hosts.emplace_back(Width, Height, form);

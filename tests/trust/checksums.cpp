@@ -175,7 +175,7 @@ void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, i
   if (type == "picturezor") {
     sum.Add(Picture(Object::Adopt(outcome.Result.Address)));
   } else if (type == "string") {
-    if (const auto* text = static_cast<model::StringRecord*>(outcome.Result.Address)) sum.Add(text->Bytes);
+    if (const auto* text = static_cast<model::StringRecord*>(outcome.Result.Address)) sum.Add(model::TextOf(*text));
     GiveBack(type, outcome.Result);
   } else if (type == "picture") {
     sum.Add(HostPicture(Object::Adopt(outcome.Result.Address)));
@@ -194,7 +194,7 @@ void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, i
   if (row.Record->Setter) {
     Bytes bytes = noise.Many(1 << 13);
     if (type == "string") {
-      const Value text{.Address = model::NewString(std::string(bytes.begin(), bytes.end()), model::UTF8)};
+      const Value text{.Address = model::NewString(bytes, model::UTF8)};
       sum.Add(AssignRow(row, self.Address(), arguments, text).Raised);
       GiveBack(type, text);
     } else {
