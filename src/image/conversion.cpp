@@ -1,6 +1,8 @@
 #include "image/conversion.h"
 
 #include <algorithm>
+#include <array>
+#include <bit>
 #include <cstring>
 
 #include "image/targets.h"
@@ -14,26 +16,50 @@ bool InOnePixel(const PlaneList& planes, int count) {
                      [&](std::int32_t offset) { return offset >= left && offset - left < planes.Step; });
 }
 
-/// The shuffle of a step that only moves samples; one of 0 pixels where the planes don't allow it.
-ByteShuffle ShuffleOf(const StepKind& step, int colours, AlphaRule rule, const PlaneList& in,
-                      const PlaneList& out) {
-  ByteShuffle shuffle;
+/// The bytes that this processor shuffles at once.
+std::int32_t BytesOfShuffle() {
+  if (CurrentTarget == Target::Plain) return 0;
+  return CurrentTarget == Target::AVX512VBMI ? ByteShuffle::Most : 16;
+}
+
+/// Makes the shuffle of a step that only moves samples.
+void FillIn(ByteShuffle& shuffle, const StepKind& step, int colours, AlphaRule rule, const PlaneList& in,
+            const PlaneList& out) {
   const int written = colours + (rule != AlphaRule::None);
-  const std::int32_t pixels = 16 / std::max(in.Step, out.Step), inLeft = LeftOf(in), outLeft = LeftOf(out);
-  shuffle.Whole = written == out.Step;
-  shuffle.Full = pixels * out.Step == 16;
-  std::fill_n(shuffle.From, 16, Sample(128));
-  for (std::int32_t x = 0; x < pixels; ++x)
-    for (int o = 0; o < written; ++o) {
-      const auto at = std::size_t(x * out.Step + out.Offset[std::size_t(o)] - outLeft);
-      // Alpha stands behind the colours on either side.
-      const int i = o < colours ? step.From[o] : in.Count - 1;
-      shuffle.Write[at] = 255;
-      if (i != StepKind::Zero) shuffle.From[at] = Sample(x * in.Step + in.Offset[std::size_t(i)] - inLeft);
-      if (o == colours && rule == AlphaRule::Invert) shuffle.Flip[at] = 255;
-    }
+  const std::int32_t size = BytesOfShuffle(), inStep = in.Step, outStep = out.Step,
+                     pixels = size / std::max(inStep, outStep), inLeft = LeftOf(in), outLeft = LeftOf(out);
+  shuffle.Size = size;
+  shuffle.Whole = written == outStep;
+  shuffle.Full = pixels * outStep == size;
   shuffle.Pixels = pixels;
-  return shuffle;
+  std::array<Sample, 8> order, flip{}, write{};
+  order.fill(128);
+  for (int o = 0; o < written; ++o) {
+    const auto at = std::size_t(out.Offset[std::size_t(o)] - outLeft);
+    // Alpha stands behind the colours on either side.
+    const int i = o < colours ? step.From[o] : in.Count - 1;
+    write[at] = 255;
+    if (i != StepKind::Zero) order[at] = Sample(in.Offset[std::size_t(i)] - inLeft);
+    if (o == colours && rule == AlphaRule::Invert) flip[at] = 255;
+  }
+  // Eight bytes at a time, each time over those behind the pixel before. Every byte of the order grows by the
+  // same, and none overflows.
+  for (std::int32_t x = 0; x < pixels; ++x) {
+    const auto pixel = std::uint64_t(x * inStep) * 0x0101010101010101 + std::bit_cast<std::uint64_t>(order);
+    std::memcpy(shuffle.From + x * outStep, &pixel, 8);
+    std::memcpy(shuffle.Flip + x * outStep, flip.data(), 8);
+    std::memcpy(shuffle.Write + x * outStep, write.data(), 8);
+  }
+}
+
+/// Fetches the start of the row that follows in memory, if rows are long. Where they are asked for one by
+/// one, all of a row has been read by then and nothing of the next is on its way.
+void FetchNext(const Sample* row, std::uintptr_t bytes) {
+  constexpr std::uintptr_t page = 4096;
+  if (bytes < page) return;
+  const std::uintptr_t next = reinterpret_cast<std::uintptr_t>(row) + bytes;
+  for (std::uintptr_t at = next; at < next + page; at += 64)
+    __builtin_prefetch(reinterpret_cast<const void*>(at));
 }
 
 }
@@ -48,7 +74,7 @@ RowConversion::RowConversion(const FamilyPair& pair, AlphaRule rule, const Plane
   IsLuma = pair.Step.Is == StepKind::Luma && rule == AlphaRule::None && Out.Step == 1 && In.Step <= 4;
   if (pair.Step.Is != StepKind::Moves) return;
   IsCopy = pair.From == pair.Into && rule != AlphaRule::Invert && SamePixels(In, Out);
-  Shuffle = ShuffleOf(pair.Step, ColoursOf(pair.Into), rule, In, Out);
+  FillIn(Shuffle, pair.Step, ColoursOf(pair.Into), rule, In, Out);
 }
 
 bool RowConversion::Apart(const Sample* from, const Sample* into, std::int32_t width) const {
@@ -66,12 +92,17 @@ std::int32_t RowConversion::FastPart(const Sample* from, Sample* into, std::int3
     std::memcpy(into, from, std::size_t(width) * std::size_t(In.Step));
     return width;
   }
-  if (CurrentTarget == Target::Plain) return 0;
-  if (IsLuma)
+  if (IsLuma && CurrentTarget != Target::Plain)
     return LumaRow(from, In.Step, {In.Offset[0] - left, In.Offset[1] - left, In.Offset[2] - left}, into,
                    width);
   if (Shuffle.Pixels == 0) return 0;
-  if (Shuffle.Whole || rest == Rest::IsZero) return ShuffleRow(Shuffle, from, In.Step, into, Out.Step, width);
+  const bool whole = Shuffle.Whole || rest == Rest::IsZero;
+  if (Shuffle.Size == ByteShuffle::Most) {
+    ShuffleWide(Shuffle, from, In.Step, into, Out.Step, width, whole);
+    if (rest == Rest::IsZero) FetchNext(from, std::uintptr_t(width) * std::uintptr_t(In.Step));
+    return width;
+  }
+  if (whole) return ShuffleRow(Shuffle, from, In.Step, into, Out.Step, width);
   return Shuffle.Full ? ShuffleInto(Shuffle, from, In.Step, into, Out.Step, width) : 0;
 }
 

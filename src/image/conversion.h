@@ -92,17 +92,19 @@ constexpr FamilyPair Pair{From,
                            ConvertRow<ColoursOf(From), ColoursOf(Into), Step, AlphaRule::Invert>},
                           KindOf<ColoursOf(From), ColoursOf(Into), Step>()};
 
-/// A run of pixels whose samples are moved as a shuffle of 16 bytes: byte b of the result is byte From[b], 0
-/// where From[b] is 128, each bit turned that is set in Flip[b].
+/// A run of pixels whose samples are moved as a shuffle of a register's bytes: byte b of the result is byte
+/// From[b], 0 where From[b] is 128 or more, each bit turned that is set in Flip[b].
 struct ByteShuffle {
-  /// Pixels of one shuffle; 0 where there is none for these planes.
-  std::int32_t Pixels = 0;
-  /// Whether the result's pixels are written whole, and whether they fill the 16 bytes.
+  static constexpr std::int32_t Most = 64;
+
+  /// Bytes and pixels of one shuffle; no pixels where there is none for these planes or this processor.
+  std::int32_t Size = 0, Pixels = 0;
+  /// Whether the result's pixels are written whole, and whether they fill the register.
   bool Whole = false, Full = false;
-  alignas(16) Sample From[16]{};
-  alignas(16) Sample Flip[16]{};
+  alignas(Most) Sample From[Most + 8]{};
+  alignas(Most) Sample Flip[Most + 8]{};
   /// 255 for the bytes that get a sample.
-  alignas(16) Sample Write[16]{};
+  alignas(Most) Sample Write[Most + 8]{};
 };
 
 /// Rows of one layout into rows of another: the plain loop of a pair, and faster forms of it where the
@@ -149,10 +151,14 @@ RowConversion Find(std::span<const FamilyPair> pairs, Family from, const PlaneLi
 RowConversion Find(std::span<const FamilyPair> pairs, const PictureData& source, const PictureData& dest,
                    bool invertAlpha = false);
 
-// The faster forms. Each does as many pixels from the left as it can without touching a byte beyond the row,
-// and tells how many; the rows don't overlap.
+// The faster forms, of rows that don't overlap. None touches a byte beyond the row; where one gives a number,
+// that is how many pixels from the left it has done.
 
-/// Writes whole pixels; the bytes that get no sample become 0.
+/// For a shuffle of 64 bytes. With `whole` the bytes that get no sample become 0, else they keep their
+/// values.
+void ShuffleWide(const ByteShuffle& shuffle, const Sample* from, std::int32_t fromStep, Sample* into,
+                 std::int32_t intoStep, std::int32_t width, bool whole);
+/// For one of 16. Writes whole pixels; the bytes that get no sample become 0.
 std::int32_t ShuffleRow(const ByteShuffle& shuffle, const Sample* from, std::int32_t fromStep, Sample* into,
                         std::int32_t intoStep, std::int32_t width);
 /// The other bytes keep their values. For a shuffle that is full: what is kept would otherwise be read behind
