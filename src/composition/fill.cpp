@@ -162,9 +162,16 @@ void ClearRect(PictureZOR* self) {
   if (picture.Parent) return ClearRect(self, 0, 0, picture.Width, picture.Height);
   if (!Usable(picture)) return;
   MayYield(picture);
-  Walk(Yielding(Into(picture))).Rows(picture.Height, [&](std::int32_t, Sample* row) {
-    std::memset(row, 0, std::size_t(picture.RowSize));
-  });
+  // Whole rows follow one another in memory.
+  const std::int32_t most = picture.YieldTicks > 0 ? 1 : std::max(RowsAtOnce(picture), 1);
+  bool reached = true;
+  for (std::int32_t y = 0; reached && y < picture.Height; y += most) {
+    const std::int32_t count = std::min(most, picture.Height - y);
+    reached = WithRows({picture, y, count}, [&](const RowRun& rows) {
+      std::memset(std::min(rows[0], rows[count - 1]), 0, std::size_t(count) * std::size_t(picture.RowSize));
+    });
+    MayYield(picture);
+  }
 }
 
 void ClearRect(PictureZOR* self, Integer x, Integer y, Integer width, Integer height) {
