@@ -73,7 +73,7 @@ RowConversion::RowConversion(const FamilyPair& pair, AlphaRule rule, const Plane
   if (!InOnePixel(In, In.Count) || !InOnePixel(Out, Out.Count)) return;
   IsLuma = pair.Step.Is == StepKind::Luma && rule == AlphaRule::None && Out.Step == 1 && In.Step <= 4;
   if (pair.Step.Is != StepKind::Moves) return;
-  IsCopy = pair.From == pair.Into && rule != AlphaRule::Invert && SamePixels(In, Out);
+  IsCopy = pair.From == pair.Into && rule != AlphaRule::Invert && FillPixelsAlike(In, Out);
   FillIn(Shuffle, pair.Step, ColoursOf(pair.Into), rule, In, Out);
 }
 

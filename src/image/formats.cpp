@@ -2,6 +2,8 @@
 
 #include <cstring>
 
+#include "image/plane_fields.h"
+
 namespace zor {
 namespace {
 
@@ -33,21 +35,20 @@ static_assert(std::size(Formats) == 41);
 /// What a letter of a pixel sets in the record.
 struct Plane {
   char Letter;
-  std::int32_t PictureData::*Offset;
-  bool PictureData::*Has;
+  PlaneFields Of;
   bool PictureData::*Family;
 };
 
 constexpr Plane AllPlanes[] = {
-    {'R', &PictureData::RedOffset, &PictureData::HasRed, &PictureData::IsRGB},
-    {'G', &PictureData::GreenOffset, &PictureData::HasGreen, &PictureData::IsRGB},
-    {'B', &PictureData::BlueOffset, &PictureData::HasBlue, &PictureData::IsRGB},
-    {'g', &PictureData::GrayOffset, &PictureData::HasGray, &PictureData::IsGray},
-    {'A', &PictureData::AlphaOffset, &PictureData::HasAlpha, nullptr},
-    {'C', &PictureData::CyanOffset, &PictureData::HasCyan, &PictureData::IsCMYK},
-    {'M', &PictureData::MagentaOffset, &PictureData::HasMagenta, &PictureData::IsCMYK},
-    {'Y', &PictureData::YellowOffset, &PictureData::HasYellow, &PictureData::IsCMYK},
-    {'K', &PictureData::BlackOffset, &PictureData::HasBlack, &PictureData::IsCMYK},
+    {'R', RedPlane, &PictureData::IsRGB},
+    {'G', GreenPlane, &PictureData::IsRGB},
+    {'B', BluePlane, &PictureData::IsRGB},
+    {'g', GrayPlane, &PictureData::IsGray},
+    {'A', AlphaPlane, nullptr},
+    {'C', CyanPlane, &PictureData::IsCMYK},
+    {'M', MagentaPlane, &PictureData::IsCMYK},
+    {'Y', YellowPlane, &PictureData::IsCMYK},
+    {'K', BlackPlane, &PictureData::IsCMYK},
 };
 
 void ClearLayout(PictureData& data) {
@@ -55,8 +56,8 @@ void ClearLayout(PictureData& data) {
   data.ChannelCount = data.PixelSize = data.RowSize = 0;
   data.IsRGB = data.IsGray = data.IsCMYK = false;
   for (const Plane& plane : AllPlanes) {
-    data.*plane.Offset = 0;
-    data.*plane.Has = false;
+    data.*plane.Of.Offset = 0;
+    data.*plane.Of.Has = false;
   }
 }
 
@@ -74,8 +75,8 @@ bool InitImageLayout(PictureData* data, std::int32_t width, std::int32_t height,
   for (std::int32_t offset = 0; offset < data->PixelSize; ++offset)
     for (const Plane& plane : AllPlanes) {
       if (plane.Letter != pixel[offset]) continue;
-      data->*plane.Offset = offset;
-      data->*plane.Has = true;
+      data->*plane.Of.Offset = offset;
+      data->*plane.Of.Has = true;
       if (plane.Family) data->*plane.Family = true;
       data->ChannelOffsets[std::size_t(data->ChannelCount++)] = offset;
     }

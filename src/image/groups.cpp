@@ -1,19 +1,9 @@
 #include "image/groups.h"
 
+#include "image/plane_fields.h"
+
 namespace zor {
 namespace {
-
-/// A plane's fields in the record.
-struct PlaneFields {
-  bool PictureData::*Has;
-  std::int32_t PictureData::*Offset;
-};
-
-using P = PictureData;
-constexpr PlaneFields Gray{&P::HasGray, &P::GrayOffset}, Alpha{&P::HasAlpha, &P::AlphaOffset},
-    Red{&P::HasRed, &P::RedOffset}, Green{&P::HasGreen, &P::GreenOffset}, Blue{&P::HasBlue, &P::BlueOffset},
-    Cyan{&P::HasCyan, &P::CyanOffset}, Magenta{&P::HasMagenta, &P::MagentaOffset},
-    Yellow{&P::HasYellow, &P::YellowOffset}, Black{&P::HasBlack, &P::BlackOffset};
 
 struct GroupPlanes {
   int Count;
@@ -22,12 +12,12 @@ struct GroupPlanes {
 
 constexpr GroupPlanes PlanesOfGroup[] = {
     {0, {}},
-    {1, {Gray}},
-    {2, {Gray, Alpha}},
-    {3, {Red, Green, Blue}},
-    {4, {Red, Green, Blue, Alpha}},
-    {4, {Cyan, Magenta, Yellow, Black}},
-    {5, {Cyan, Magenta, Yellow, Black, Alpha}},
+    {1, {GrayPlane}},
+    {2, {GrayPlane, AlphaPlane}},
+    {3, {RedPlane, GreenPlane, BluePlane}},
+    {4, {RedPlane, GreenPlane, BluePlane, AlphaPlane}},
+    {4, {CyanPlane, MagentaPlane, YellowPlane, BlackPlane}},
+    {5, {CyanPlane, MagentaPlane, YellowPlane, BlackPlane, AlphaPlane}},
 };
 
 }
@@ -50,7 +40,7 @@ Group GroupOf(const PictureData& picture) {
 bool HasPlanes(Group group, const PictureData& picture, bool withAlpha) {
   const GroupPlanes& row = PlanesOfGroup[int(group)];
   return std::all_of(row.Plane, row.Plane + row.Count, [&](const PlaneFields& plane) {
-    return picture.*plane.Has || (plane.Has == Alpha.Has && !withAlpha);
+    return picture.*plane.Has || (plane.Has == AlphaPlane.Has && !withAlpha);
   });
 }
 
@@ -71,13 +61,6 @@ PlaneList PlanesOf(Group group, const PictureData& picture, std::int32_t x) {
   PlaneList planes{row.Count, picture.PixelSize, {}};
   for (int c = 0; c < row.Count; ++c) planes.Offset[c] = picture.*row.Plane[c].Offset + x * picture.PixelSize;
   return planes;
-}
-
-bool SamePixels(const PlaneList& a, const PlaneList& b) {
-  if (!FillPixels(a) || a.Count != b.Count || a.Step != b.Step) return false;
-  const std::int32_t shift = LeftOf(a) - LeftOf(b);
-  return std::equal(a.Offset.begin(), a.Offset.begin() + a.Count, b.Offset.begin(),
-                    [&](std::int32_t atA, std::int32_t atB) { return atA == atB + shift; });
 }
 
 }

@@ -28,8 +28,8 @@ PlaneList PlanesOf(Group group, const PictureData& picture, std::int32_t x = 0);
 /// The offset of the plane that lies first. Of at least one plane.
 std::int32_t FirstOffset(const PlaneList& planes);
 
-/// Whether the planes lie in a pixel in the same way in both lists; and whether they fill the pixel too, so
-/// that a row is one run of samples. False without planes.
+/// Whether the planes of two lists, as many in each, lie in a pixel in the same way; and whether they fill
+/// the pixel too, so that a row is one run of samples. False without planes.
 bool LieAlike(const PlaneList& a, const PlaneList& b);
 bool FillPixelsAlike(const PlaneList& a, const PlaneList& b);
 
@@ -42,8 +42,6 @@ inline std::int32_t LeftOf(const PlaneList& planes) {
 }
 /// Whether the planes take up every byte of a pixel.
 inline bool FillPixels(const PlaneList& planes) { return planes.Count > 0 && planes.Count == planes.Step; }
-/// Whether the planes take up every byte of a pixel, in one order on both sides.
-bool SamePixels(const PlaneList& a, const PlaneList& b);
 
 /// A row seen as N planes: row(c, x) is the sample of plane c at column x. ConstantStep, where it isn't 0,
 /// is the step that the compiler then knows.

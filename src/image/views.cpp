@@ -6,30 +6,15 @@
 #include "image/groups.h"
 #include "image/image.h"
 #include "image/lifecycle.h"
+#include "image/plane_fields.h"
 
 namespace zor {
 namespace {
 
-using Offset = std::int32_t PictureData::*;
 using Flag = bool PictureData::*;
 
-/// A plane's fields in the record.
-struct PlaneFields {
-  Flag Has;
-  Offset At;
-};
-
-constexpr PlaneFields Red{&PictureData::HasRed, &PictureData::RedOffset},
-    Green{&PictureData::HasGreen, &PictureData::GreenOffset},
-    Blue{&PictureData::HasBlue, &PictureData::BlueOffset},
-    Gray{&PictureData::HasGray, &PictureData::GrayOffset},
-    Alpha{&PictureData::HasAlpha, &PictureData::AlphaOffset},
-    Cyan{&PictureData::HasCyan, &PictureData::CyanOffset},
-    Magenta{&PictureData::HasMagenta, &PictureData::MagentaOffset},
-    Yellow{&PictureData::HasYellow, &PictureData::YellowOffset},
-    Black{&PictureData::HasBlack, &PictureData::BlackOffset};
-
-constexpr PlaneFields AllPlanes[] = {Red, Green, Blue, Gray, Alpha, Cyan, Magenta, Yellow, Black};
+constexpr PlaneFields AllPlanes[] = {RedPlane,  GreenPlane,   BluePlane,   GrayPlane, AlphaPlane,
+                                     CyanPlane, MagentaPlane, YellowPlane, BlackPlane};
 
 std::int32_t Saturated(std::int64_t value) {
   using Limits = std::numeric_limits<std::int32_t>;
@@ -73,7 +58,7 @@ PictureZOR* PlaneView(PictureZOR* self, std::int32_t offset) {
 
 PictureZOR* ChannelView(PictureZOR* self, PlaneFields plane) {
   const PictureData& parent = DataOf(self);
-  return parent.*plane.Has ? PlaneView(self, parent.*plane.At) : nullptr;
+  return parent.*plane.Has ? PlaneView(self, parent.*plane.Offset) : nullptr;
 }
 
 /// The formats of a family whose planes stand in one order, and the format of a view on them.
@@ -97,7 +82,7 @@ PictureZOR* ColoursView(PictureZOR* self, Flag family, int count, const PlaneOrd
     for (int c = 0; c < count; ++c) {
       const PlaneFields plane = order.Planes[std::size_t(c)];
       data.*plane.Has = true;
-      data.*plane.At = data.ChannelOffsets[std::size_t(c)] = parent.*plane.At;
+      data.*plane.Offset = data.ChannelOffsets[std::size_t(c)] = parent.*plane.Offset;
     }
     return OnStoreOf(self, std::move(view));
   }
@@ -124,15 +109,15 @@ Span ClipSpan(std::int64_t first, std::int64_t count, std::int32_t size) {
 
 }
 
-PictureZOR* AlphaChannel(PictureZOR* self) { return ChannelView(self, Alpha); }
-PictureZOR* RedChannel(PictureZOR* self) { return ChannelView(self, Red); }
-PictureZOR* GreenChannel(PictureZOR* self) { return ChannelView(self, Green); }
-PictureZOR* BlueChannel(PictureZOR* self) { return ChannelView(self, Blue); }
-PictureZOR* GrayChannel(PictureZOR* self) { return ChannelView(self, Gray); }
-PictureZOR* CyanChannel(PictureZOR* self) { return ChannelView(self, Cyan); }
-PictureZOR* MagentaChannel(PictureZOR* self) { return ChannelView(self, Magenta); }
-PictureZOR* YellowChannel(PictureZOR* self) { return ChannelView(self, Yellow); }
-PictureZOR* BlackChannel(PictureZOR* self) { return ChannelView(self, Black); }
+PictureZOR* AlphaChannel(PictureZOR* self) { return ChannelView(self, AlphaPlane); }
+PictureZOR* RedChannel(PictureZOR* self) { return ChannelView(self, RedPlane); }
+PictureZOR* GreenChannel(PictureZOR* self) { return ChannelView(self, GreenPlane); }
+PictureZOR* BlueChannel(PictureZOR* self) { return ChannelView(self, BluePlane); }
+PictureZOR* GrayChannel(PictureZOR* self) { return ChannelView(self, GrayPlane); }
+PictureZOR* CyanChannel(PictureZOR* self) { return ChannelView(self, CyanPlane); }
+PictureZOR* MagentaChannel(PictureZOR* self) { return ChannelView(self, MagentaPlane); }
+PictureZOR* YellowChannel(PictureZOR* self) { return ChannelView(self, YellowPlane); }
+PictureZOR* BlackChannel(PictureZOR* self) { return ChannelView(self, BlackPlane); }
 
 PictureZOR* Channel(PictureZOR* self, Integer index) {
   const PictureData& parent = DataOf(self);
@@ -148,14 +133,15 @@ PictureZOR* Channel(PictureZOR* self, Integer index) {
 }
 
 PictureZOR* RGBChannels(PictureZOR* self) {
-  static constexpr PlaneOrder orders[] = {{FormatRGB, FormatXRGB, {Red, Green, Blue, {}}},
-                                          {FormatBGR, FormatXBGR, {Blue, Green, Red, {}}}};
+  static constexpr PlaneOrder orders[] = {{FormatRGB, FormatXRGB, {RedPlane, GreenPlane, BluePlane, {}}},
+                                          {FormatBGR, FormatXBGR, {BluePlane, GreenPlane, RedPlane, {}}}};
   return ColoursView(self, &PictureData::IsRGB, 3, orders);
 }
 
 PictureZOR* CMYKChannels(PictureZOR* self) {
-  static constexpr PlaneOrder orders[] = {{FormatCMYK, FormatXCMYK, {Cyan, Magenta, Yellow, Black}},
-                                          {FormatKYMC, FormatXKYMC, {Black, Yellow, Magenta, Cyan}}};
+  static constexpr PlaneOrder orders[] = {
+      {FormatCMYK, FormatXCMYK, {CyanPlane, MagentaPlane, YellowPlane, BlackPlane}},
+      {FormatKYMC, FormatXKYMC, {BlackPlane, YellowPlane, MagentaPlane, CyanPlane}}};
   return ColoursView(self, &PictureData::IsCMYK, 4, orders);
 }
 
@@ -181,7 +167,7 @@ PictureZOR* ClipImage(PictureZOR* self, Integer x, Integer y, Integer width, Int
   for (const PlaneFields& plane : AllPlanes)
     if (parent.*plane.Has) {
       data.*plane.Has = true;
-      data.*plane.At = Saturated(parent.*plane.At + shift);
+      data.*plane.Offset = Saturated(parent.*plane.Offset + shift);
     }
   return OnStoreOf(self, std::move(view));
 }

@@ -147,8 +147,13 @@ TEST(Close, LeavesViewsTheirSamples) {
     stored.Get().Close();
     view.Close();
     EXPECT_EQ(Packed(ofView), pixels);
-    SetPacked(ofView, Samples(pixels.size(), 9));
-    EXPECT_EQ(Packed(copy), Samples(pixels.size(), 9));
+    ofView.FillRect(9);
+    const Samples filled(pixels.size(), 9);
+    EXPECT_EQ(Packed(copy), filled);
+    const Picture source(4, 6, Format::G);
+    SetPacked(source, pixels);
+    EXPECT_TRUE(ofView.CopyPixels(source));
+    EXPECT_EQ(Packed(copy), pixels);
   }
 }
 
