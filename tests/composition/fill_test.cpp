@@ -110,6 +110,7 @@ TEST(ClearRect, ClearsTheBytesOfItsPixels) {
   });
 }
 
+// Catches rows left out between the windows of a mapped picture, which are cleared together.
 TEST(ClearRect, TakesThePaddingOfAPictureOfItsOwn) {
   const MemoryBlock block(Samples(40, 5));
   const Picture picture(block, 4, 4, Format::G, 10);
@@ -118,6 +119,12 @@ TEST(ClearRect, TakesThePaddingOfAPictureOfItsOwn) {
   EXPECT_EQ(block.Data()[4], 5);
   picture.ClearRect();
   EXPECT_EQ(Samples(block.Data().begin(), block.Data().end()), Samples(40, 0));
+
+  const TemporaryFile file;
+  const Picture mapped = Picture::Mapped(file.Path(), 5, 23, Format::RGB, 1);
+  for (int y = 0; y < 23; ++y) mapped.SetRow(y, Samples(std::size_t(mapped.RowSize()), 5));
+  mapped.ClearRect();
+  for (int y = 0; y < 23; ++y) EXPECT_EQ(mapped.Row(y), Samples(std::size_t(mapped.RowSize()), 0)) << y;
 }
 
 TEST(ClearRect, ClearsOnlyThePlanesOfAViewOfChannels) {
