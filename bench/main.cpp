@@ -200,7 +200,7 @@ Contender Memcpy(std::size_t bytes) {
 int main(int count, char** arguments) {
   // Repetitions in random order, so that a machine that slows down slows all contenders.
   std::vector<char*> all{arguments[0]};
-  for (const char* given : {"--benchmark_enable_random_interleaving=true", "--benchmark_repetitions=9",
+  for (const char* given : {"--benchmark_enable_random_interleaving=true", "--benchmark_repetitions=5",
                             "--benchmark_min_time=0.05"})
     all.push_back(const_cast<char*>(given));
   all.insert(all.end(), arguments + 1, arguments + count);
