@@ -1,6 +1,7 @@
 #include <CLI/CLI.hpp>
 #include <charconv>
 #include <cmath>
+#include <cstdlib>
 #include <fstream>
 #include <iterator>
 #include <map>
@@ -71,7 +72,7 @@ IntegerArray TableOf(const std::string& option, const std::string& text) {
 CLI::Validator Between(double least, double most) {
   return CLI::Validator(
       [=](std::string& text) {
-        const double value = std::atof(text.c_str());
+        const double value = std::strtod(text.c_str(), nullptr);
         // Not a number is nowhere.
         return value >= least && value <= most ? std::string() : text + " isn't a number that it takes";
       },
