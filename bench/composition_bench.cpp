@@ -1,14 +1,8 @@
 #include <benchmark/benchmark.h>
 
 #include <cstring>
-#include <memory>
 
-#include "race.h"
-
-#ifdef PICTUREZOR_OPENCV
-#include <opencv2/core.hpp>
-#include <opencv2/imgproc.hpp>
-#endif
+#include "peers.h"
 
 // Filling, copying, combining and comparing.
 
@@ -35,12 +29,6 @@ Contender Copy(Format from, Format into) {
           }};
 }
 
-Contender RowInFormat(Format from, Format into) {
-  return Ours(from, [=](const Picture& picture) {
-    for (int y = 0; y < Height; ++y) picture.RowInFormat(y, into);
-  });
-}
-
 Contender Combine(Format dest, Format image, Format mask) {
   return {"PictureZOR", [=] {
             return [dest = TestPicture(dest), image = TestPicture(image), mask = TestPicture(mask)] {
@@ -54,56 +42,14 @@ Contender Compare(Format a, Format b) {
           [=] { return [one = TestPicture(a), other = TestPicture(b)] { one.CompareImages(other); }; }};
 }
 
+std::vector<Contender> BesideNorm(Contender ours, [[maybe_unused]] Format format) {
+  std::vector<Contender> contenders{std::move(ours)};
 #ifdef PICTUREZOR_OPENCV
-
-constexpr int RGB2BGRA = cv::COLOR_RGB2BGRA, RGB2GRAY = cv::COLOR_RGB2GRAY, GRAY2RGB = cv::COLOR_GRAY2RGB;
-
-cv::Mat Matrix(int channels, double shade) {
-  static const bool oneThread = (cv::setNumThreads(1), NamePeer("OpenCV", CV_VERSION));
-  cv::Mat matrix(oneThread ? Height : 0, Width, CV_8UC(channels));
-  cv::randu(matrix, cv::Scalar::all(shade), cv::Scalar::all(255));
-  return matrix;
-}
-
-std::vector<Contender> CvtColor(std::vector<Contender> contenders, int from, int into, int code) {
-  contenders.push_back({"OpenCV", [=] {
-                          return [source = Matrix(from, 0), dest = Matrix(into, 0), code]() mutable {
-                            cv::cvtColor(source, dest, code);
-                          };
-                        }});
-  return contenders;
-}
-
-/// Each row by itself into a matrix of its own, as rows of a picture are asked for.
-std::vector<Contender> CvtColorByRows(std::vector<Contender> contenders, int from, int code) {
-  contenders.push_back({"OpenCV by rows", [=] {
-                          return [source = Matrix(from, 0), code] {
-                            for (int y = 0; y < Height; ++y) {
-                              cv::Mat row;
-                              cv::cvtColor(source.row(y), row, code);
-                            }
-                          };
-                        }});
-  return contenders;
-}
-
-std::vector<Contender> Norm(std::vector<Contender> contenders, int channels) {
-  contenders.push_back({"OpenCV", [=] {
-                          return [a = Matrix(channels, 0), b = Matrix(channels, 9)] {
-                            benchmark::DoNotOptimize(cv::norm(a, b, cv::NORM_L1));
-                          };
-                        }});
-  return contenders;
-}
-
-#else
-
-enum { RGB2BGRA, RGB2GRAY, GRAY2RGB };
-std::vector<Contender> CvtColor(std::vector<Contender> contenders, int, int, int) { return contenders; }
-std::vector<Contender> CvtColorByRows(std::vector<Contender> contenders, int, int) { return contenders; }
-std::vector<Contender> Norm(std::vector<Contender> contenders, int) { return contenders; }
-
+  contenders.push_back(
+      OpenCV(format, [](cv::Mat& a, cv::Mat& b) { benchmark::DoNotOptimize(cv::norm(a, b, cv::NORM_L1)); }));
 #endif
+  return contenders;
+}
 
 const auto registered = [] {
   const auto race = [](const char* work, std::vector<Contender> contenders) {
@@ -116,26 +62,17 @@ const auto registered = [] {
   race("CopyPixels RGB", {Copy(Format::RGB, Format::RGB), Memcpy(BytesOf(3))});
   race("CopyPixels RGBA", {Copy(Format::RGBA, Format::RGBA), Memcpy(BytesOf(4))});
 
-  const struct {
-    const char* Name;
-    Format From, Into;
-    int FromBytes, IntoBytes, Code;
-  } pairs[] = {{"RGB to BGRA", Format::RGB, Format::BGRA, 3, 4, RGB2BGRA},
-               {"RGB to gray", Format::RGB, Format::G, 3, 1, RGB2GRAY},
-               {"gray to RGB", Format::G, Format::RGB, 1, 3, GRAY2RGB}};
-  for (const auto& [name, from, into, fromBytes, intoBytes, code] : pairs) {
-    const std::string pair = name;
-    AddRace("composition", "CopyPixels " + pair, CvtColor({Copy(from, into)}, fromBytes, intoBytes, code));
-    AddRace("composition", "RowInFormat " + pair,
-            CvtColorByRows(CvtColor({RowInFormat(from, into)}, fromBytes, intoBytes, code), fromBytes, code));
+  for (const auto& [name, from, into] : ConversionsOfCvtColor) {
+    std::vector<Contender> contenders = CvtColor(from, into);
+    contenders.insert(contenders.begin(), Copy(from, into));
+    AddRace("composition", std::string("CopyPixels ") + name, std::move(contenders));
   }
-
   race("Combine RGB, gray mask", {Combine(Format::RGB, Format::RGB, Format::G), Memcpy(BytesOf(3))});
   race("Combine RGB, RGB mask", {Combine(Format::RGB, Format::RGB, Format::RGB), Memcpy(BytesOf(3))});
   race("Combine RGBA, gray mask", {Combine(Format::RGBA, Format::RGBA, Format::G), Memcpy(BytesOf(4))});
-  race("CompareImages RGB", Norm({Compare(Format::RGB, Format::RGB)}, 3));
+  race("CompareImages RGB", BesideNorm(Compare(Format::RGB, Format::RGB), Format::RGB));
   race("CompareImages RGB with BGRX", {Compare(Format::RGB, Format::BGRX)});
-  race("CompareImages gray", Norm({Compare(Format::G, Format::G)}, 1));
+  race("CompareImages gray", BesideNorm(Compare(Format::G, Format::G), Format::G));
   return true;
 }();
 

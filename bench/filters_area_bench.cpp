@@ -1,12 +1,4 @@
-#include "race.h"
-#include "vips_peer.h"
-
-#ifdef PICTUREZOR_OPENCV
-#include <opencv2/imgproc.hpp>
-#endif
-#ifdef PICTUREZOR_GRAPHICSMAGICK
-#include <magick/api.h>
-#endif
+#include "peers.h"
 
 // Filters that look at the surroundings of a pixel; RGB, one thread each.
 
@@ -26,50 +18,15 @@ void Race(const std::string& work, std::vector<Contender> contenders) {
   AddRace("filters", work, std::move(contenders));
 }
 
-#ifdef PICTUREZOR_OPENCV
-Contender OpenCV(const std::function<void(const cv::Mat& source, cv::Mat& dest)>& filter) {
-  NamePeer("OpenCV", CV_VERSION);
-  return {"OpenCV", [=] {
-            cv::setNumThreads(1);
-            const Picture picture = TestPicture(Format::RGB);
-            cv::Mat source(Height, Width, CV_8UC3);
-            for (int y = 0; y < Height; ++y) std::copy_n(picture.Row(y).begin(), Width * 3, source.ptr(y));
-            return
-                [filter, source, dest = cv::Mat(Height, Width, CV_8UC3)]() mutable { filter(source, dest); };
-          }};
-}
-#endif
-
-#ifdef PICTUREZOR_GRAPHICSMAGICK
-/// A call that makes a new image, as `gm` does it.
-Contender GraphicsMagick(const std::function<Image*(const Image* source, ExceptionInfo* exception)>& filter) {
-  NamePeer("GraphicsMagick", MagickLibVersionText);
-  return {"GraphicsMagick", [=] {
-            InitializeMagick(nullptr);
-            SetMagickResourceLimit(ThreadsResource, 1);
-            const Bytes pixels = TestPicture(Format::RGB).DataStringInFormat(Format::RGB);
-            ExceptionInfo exception;
-            GetExceptionInfo(&exception);
-            const std::shared_ptr<Image> source(
-                ConstituteImage(Width, Height, "RGB", CharPixel, pixels.data(), &exception), DestroyImage);
-            return [filter, source] {
-              ExceptionInfo failure;
-              GetExceptionInfo(&failure);
-              DestroyImage(filter(source.get(), &failure));
-              DestroyExceptionInfo(&failure);
-            };
-          }};
-}
-#endif
-
 void RaceBlur(int radius) {
   Race("box blur, radius " + std::to_string(radius),
        {Ours([=](const Picture& source, const Picture& dest) { source.BoxBlurFilter(dest, radius); }),
 #ifdef PICTUREZOR_OPENCV
-        OpenCV([=](const cv::Mat& source, cv::Mat& dest) {
-          cv::blur(source, dest, cv::Size(2 * radius + 1, 2 * radius + 1), cv::Point(-1, -1),
-                   cv::BORDER_REPLICATE);
-        })
+        OpenCV(Format::RGB,
+               [=](cv::Mat& source, cv::Mat& dest) {
+                 cv::blur(source, dest, cv::Size(2 * radius + 1, 2 * radius + 1), cv::Point(-1, -1),
+                          cv::BORDER_REPLICATE);
+               })
 #endif
        });
 }
@@ -81,12 +38,13 @@ void RaceMatrix(const std::string& name, int dimension, const std::vector<std::i
                    source.ApplyMatrix(dest, dimension, IntegerArray(weights), 0, scale);
                  }),
 #ifdef PICTUREZOR_OPENCV
-                 OpenCV([=](const cv::Mat& source, cv::Mat& dest) {
-                   cv::Mat kernel(dimension, dimension, CV_32F);
-                   for (std::size_t i = 0; i < weights.size(); ++i)
-                     kernel.ptr<float>()[i] = float(weights[i] * scale);
-                   cv::filter2D(source, dest, -1, kernel, cv::Point(-1, -1), 0, cv::BORDER_REPLICATE);
-                 }),
+                 OpenCV(Format::RGB,
+                        [=](cv::Mat& source, cv::Mat& dest) {
+                          cv::Mat kernel(dimension, dimension, CV_32F);
+                          for (std::size_t i = 0; i < weights.size(); ++i)
+                            kernel.ptr<float>()[i] = float(weights[i] * scale);
+                          cv::filter2D(source, dest, -1, kernel, cv::Point(-1, -1), 0, cv::BORDER_REPLICATE);
+                        }),
 #endif
 #ifdef PICTUREZOR_VIPS
                  Vips(Format::RGB,
@@ -108,9 +66,9 @@ void RaceOil(int levels, int range) {
   Race("oil, range " + std::to_string(range) + ", " + std::to_string(levels) + " levels",
        {Ours([=](const Picture& source, const Picture& dest) { source.OilFilter(dest, levels, range); }),
 #ifdef PICTUREZOR_GRAPHICSMAGICK
-        GraphicsMagick([=](const Image* source, ExceptionInfo* exception) {
-          return OilPaintImage(source, range, exception);
-        })
+        GraphicsMagick(
+            Format::RGB,
+            [=](Image* source, ExceptionInfo* exception) { return OilPaintImage(source, range, exception); })
 #endif
        });
 }

@@ -1,16 +1,4 @@
-#include <algorithm>
-#include <memory>
-
-#include "race.h"
-#include "vips_peer.h"
-
-#ifdef PICTUREZOR_OPENCV
-#include <opencv2/core.hpp>
-#include <opencv2/core/version.hpp>
-#endif
-#ifdef PICTUREZOR_GRAPHICSMAGICK
-#include <magick/api.h>
-#endif
+#include "peers.h"
 
 // Pixels that change places, and the free rotation.
 
@@ -35,47 +23,11 @@ Contender OursInto(Format format, bool swaps, void (*work)(const Picture&, const
 }
 
 #ifdef PICTUREZOR_OPENCV
-/// The bytes of a picture as OpenCV's own; the picture's rows have no padding at this width.
-cv::Mat MatOf(Format format) {
-  const Picture picture = TestPicture(format);
-  cv::Mat mat(Height, Width, CV_8UC(BytesPerPixel(format)));
-  for (int y = 0; y < Height; ++y) {
-    const Bytes row = picture.Row(y);
-    std::copy_n(row.begin(), mat.cols * mat.channels(), mat.ptr(y));
-  }
-  return mat;
-}
 Contender Flip(Format format, int code) {
-  return {"OpenCV", [=] {
-            cv::setNumThreads(1);
-            return [=, mat = MatOf(format)]() mutable { cv::flip(mat, mat, code); };
-          }};
+  return OpenCV(format, [=](cv::Mat& source, cv::Mat&) { cv::flip(source, source, code); });
 }
 Contender Turn(Format format, int code) {
-  return {"OpenCV", [=] {
-            cv::setNumThreads(1);
-            return [=, mat = MatOf(format), into = cv::Mat()]() mutable { cv::rotate(mat, into, code); };
-          }};
-}
-#endif
-
-#ifdef PICTUREZOR_GRAPHICSMAGICK
-/// A rotation on one thread.
-Contender Magick(Format format, const char* map, double degrees) {
-  return {"GraphicsMagick", [=] {
-            SetMagickResourceLimit(ThreadsResource, 1);
-            const Bytes pixels = TestPicture(format).DataStringInFormat(format);
-            ExceptionInfo exception;
-            GetExceptionInfo(&exception);
-            const std::shared_ptr<Image> image(
-                ConstituteImage(Width, Height, map, CharPixel, pixels.data(), &exception), DestroyImage);
-            return [=] {
-              ExceptionInfo failed;
-              GetExceptionInfo(&failed);
-              if (Image* turned = RotateImage(image.get(), degrees, &failed)) DestroyImage(turned);
-              DestroyExceptionInfo(&failed);
-            };
-          }};
+  return OpenCV(format, [=](cv::Mat& source, cv::Mat& dest) { cv::rotate(source, dest, code); });
 }
 #endif
 
@@ -103,8 +55,8 @@ void AddFormat(const std::string& name, Format format) {
       Vips(format, [](VipsImage* in, VipsImage** out) { return vips_rotate(in, out, 12.0, nullptr); }));
 #endif
 #ifdef PICTUREZOR_GRAPHICSMAGICK
-  const char* map = format == Format::G ? "I" : format == Format::RGB ? "RGB" : "RGBA";
-  free.push_back(Magick(format, map, 12));
+  free.push_back(GraphicsMagick(
+      format, [](Image* image, ExceptionInfo* exception) { return RotateImage(image, 12, exception); }));
 #endif
   race("HMirror in place", Ours(format, [](const Picture& p) { p.HMirror(); }), mirror);
   race("VMirror in place", Ours(format, [](const Picture& p) { p.VMirror(); }), flip);
@@ -117,13 +69,6 @@ void AddFormat(const std::string& name, Format format) {
 }
 
 const auto registered = [] {
-#ifdef PICTUREZOR_OPENCV
-  NamePeer("OpenCV", CV_VERSION);
-#endif
-#ifdef PICTUREZOR_GRAPHICSMAGICK
-  InitializeMagick(nullptr);
-  NamePeer("GraphicsMagick", MagickLibVersionText);
-#endif
   for (const auto& [name, format] : Formats) AddFormat(name, format);
   return true;
 }();

@@ -1,4 +1,6 @@
-#include "race.h"
+#include <algorithm>
+
+#include "peers.h"
 
 // Rows and whole pictures as bytes.
 
@@ -14,15 +16,12 @@ Contender RowInFormat(Format from, Format into) {
 }
 
 const auto registered = [] {
-  const struct {
-    const char* Work;
-    Format From, Into;
-    int Bytes;
-  } pairs[] = {{"RowInFormat RGB to BGRA", Format::RGB, Format::BGRA, 4},
-               {"RowInFormat RGB to gray", Format::RGB, Format::G, 3},
-               {"RowInFormat gray to RGB", Format::G, Format::RGB, 3}};
-  for (const auto& pair : pairs)
-    AddRace("image", pair.Work, {RowInFormat(pair.From, pair.Into), Memcpy(BytesOf(pair.Bytes))});
+  for (const auto& [name, from, into] : ConversionsOfCvtColor) {
+    std::vector<Contender> contenders = CvtColor(from, into);
+    contenders.insert(contenders.begin(), RowInFormat(from, into));
+    contenders.push_back(Memcpy(BytesOf(std::max(BytesPerPixel(from), BytesPerPixel(into)))));
+    AddRace("image", std::string("RowInFormat ") + name, std::move(contenders));
+  }
   return AddRace(
       "image", "DataStringInFormat RGB to BGRA",
       {{"PictureZOR",

@@ -1,15 +1,4 @@
-#include <array>
-#include <memory>
-
-#include "race.h"
-#include "vips_peer.h"
-
-#ifdef PICTUREZOR_OPENCV
-#include <opencv2/core.hpp>
-#endif
-#ifdef PICTUREZOR_GRAPHICSMAGICK
-#include <magick/api.h>
-#endif
+#include "peers.h"
 
 // Filters that look at one sample at a time, from one picture into another one; Invert, AutoLevel and
 // UnsharpFilter in place.
@@ -25,27 +14,7 @@ Contender Ours(Format format, Work work) {
           }};
 }
 
-/// All samples of the test picture, packed.
-std::shared_ptr<Bytes> PackedSamples(Format format) {
-  return std::make_shared<Bytes>(TestPicture(format).DataStringInFormat(format));
-}
-
 #ifdef PICTUREZOR_OPENCV
-using CVWork = std::function<void(const cv::Mat& source, cv::Mat& dest)>;
-
-Contender OpenCV(int channels, CVWork work) {
-  return {"OpenCV", [=] {
-            cv::setNumThreads(1);
-            const auto samples = PackedSamples(channels == 1   ? Format::G
-                                               : channels == 3 ? Format::RGB
-                                                               : Format::RGBA);
-            const cv::Mat source(Height, Width, CV_8UC(channels), samples->data());
-            return [samples, source, dest = std::make_shared<cv::Mat>(source.clone()), work] {
-              work(source, *dest);
-            };
-          }};
-}
-
 /// A table of so many channels, other values in each.
 cv::Mat LookUpTable(int channels) {
   cv::Mat table(1, 256, CV_8UC(channels));
@@ -53,28 +22,8 @@ cv::Mat LookUpTable(int channels) {
   return table;
 }
 
-CVWork LookUp(int tables) {
-  return
-      [table = LookUpTable(tables)](const cv::Mat& source, cv::Mat& dest) { cv::LUT(source, table, dest); };
-}
-#endif
-
-#ifdef PICTUREZOR_GRAPHICSMAGICK
-Contender GraphicsMagick(std::function<void(Image*)> work) {
-  return {"GraphicsMagick", [=] {
-            [[maybe_unused]] static const bool initialized = [] {
-              InitializeMagick(nullptr);
-              SetMagickResourceLimit(ThreadsResource, 1);
-              return true;
-            }();
-            const auto samples = PackedSamples(Format::RGB);
-            ExceptionInfo exception;
-            GetExceptionInfo(&exception);
-            const std::shared_ptr<Image> image(
-                ConstituteImage(Width, Height, "RGB", CharPixel, samples->data(), &exception), DestroyImage);
-            DestroyExceptionInfo(&exception);
-            return [image, work] { work(image.get()); };
-          }};
+OpenCVWork LookUp(int tables) {
+  return [table = LookUpTable(tables)](cv::Mat& source, cv::Mat& dest) { cv::LUT(source, table, dest); };
 }
 #endif
 
@@ -82,7 +31,7 @@ Contender GraphicsMagick(std::function<void(Image*)> work) {
 void AddTableRace(const std::string& name, Format format, [[maybe_unused]] int tables, Work work) {
   std::vector<Contender> contenders{Ours(format, work)};
 #ifdef PICTUREZOR_OPENCV
-  contenders.push_back(OpenCV(BytesPerPixel(format), LookUp(tables)));
+  contenders.push_back(OpenCV(format, LookUp(tables)));
 #endif
 #ifdef PICTUREZOR_VIPS
   contenders.push_back(Vips(format, [tables](VipsImage* in, VipsImage** out) {
@@ -105,8 +54,7 @@ const auto registered = [] {
     std::vector<Contender> contenders{
         Ours(format, [](const Picture& source, const Picture&) { source.Invert(); })};
 #ifdef PICTUREZOR_OPENCV
-    contenders.push_back(OpenCV(BytesPerPixel(format),
-                                [](const cv::Mat& source, cv::Mat&) { cv::bitwise_not(source, source); }));
+    contenders.push_back(OpenCV(format, [](cv::Mat& source, cv::Mat&) { cv::bitwise_not(source, source); }));
 #endif
 #ifdef PICTUREZOR_VIPS
     contenders.push_back(
@@ -145,7 +93,7 @@ const auto registered = [] {
                                     }}};
 #ifdef PICTUREZOR_OPENCV
     // Without a threshold.
-    unsharp.push_back(OpenCV(3, [=](const cv::Mat& source, cv::Mat& dest) {
+    unsharp.push_back(OpenCV(Format::RGB, [=](cv::Mat& source, cv::Mat& dest) {
       cv::addWeighted(dest, 1 + 4 * amount, source, -4 * amount, 0, dest);
     }));
 #endif
@@ -159,19 +107,16 @@ const auto registered = [] {
   std::vector<Contender> dither{Ours(Format::RGB, [](const Picture& source, const Picture& dest) {
     source.DitherFilter(dest, DitherMatrix::Ordered4x4, 2);
   })};
-#ifdef PICTUREZOR_OPENCV
-  NamePeer("OpenCV", CV_VERSION);
-#endif
 #ifdef PICTUREZOR_GRAPHICSMAGICK
-  NamePeer("GraphicsMagick", MagickLibVersionText);
-  level.push_back(GraphicsMagick([](Image* image) { NormalizeImage(image); }));
-  dither.push_back(GraphicsMagick([](Image* image) {
+  level.push_back(GraphicsMagick(Format::RGB, [](Image* image, ExceptionInfo*) -> Image* {
+    NormalizeImage(image);
+    return nullptr;
+  }));
+  dither.push_back(GraphicsMagick(Format::RGB, [](Image* image, ExceptionInfo* exception) -> Image* {
     // Or else it does nothing the second time.
     image->is_monochrome = image->is_grayscale = MagickFalse;
-    ExceptionInfo exception;
-    GetExceptionInfo(&exception);
-    RandomChannelThresholdImage(image, "all", "4x4", &exception);
-    DestroyExceptionInfo(&exception);
+    RandomChannelThresholdImage(image, "all", "4x4", exception);
+    return nullptr;
   }));
 #endif
   level.push_back(Memcpy(BytesOf(3)));

@@ -25,8 +25,8 @@ bool AddRace(const std::string& room, const std::string& work, std::vector<Conte
 /// Tells which version of a peer is in the race.
 bool NamePeer(const std::string& name, const std::string& version);
 
-/// Which instruction sets the contenders may use that can be told: 0 for what every processor has, 1 for AVX2,
-/// 2 for AVX-512, 3 for all that there are.
+/// Which instruction sets the contenders may use that can be told: 0 for what every processor has, 1 for
+/// AVX2, 2 for AVX-512, 3 for all that there are.
 int InstructionSets();
 
 /// A picture of soft shapes and some noise, every plane its own; the same each time.

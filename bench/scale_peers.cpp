@@ -7,15 +7,8 @@
 #include <optional>
 #include <stdexcept>
 
-#ifdef PICTUREZOR_OPENCV
-#include <opencv2/imgproc.hpp>
-#endif
-#ifdef PICTUREZOR_GRAPHICSMAGICK
-#include <magick/api.h>
-#endif
-#ifdef PICTUREZOR_VIPS
-#include <vips/vips.h>
-#endif
+#include "peers.h"
+
 #ifdef PICTUREZOR_ZIMG
 #include <zimg.h>
 #endif
@@ -124,58 +117,35 @@ const bool zimgNamed = [] {
 #endif
 
 #ifdef PICTUREZOR_VIPS
-std::optional<Contender> Vips(Format format, Kernel kernel, const Sizes& sizes) {
+std::optional<Contender> VipsScale(Format format, Kernel kernel, const Sizes& sizes) {
   const bool enlarges = sizes.IntoWidth > sizes.FromWidth;
   // Its kernels serve to reduce; it enlarges by interpolation, of which linear is the same work.
   if (kernel != Kernel::Triangle && (kernel != Kernel::Lanczos3 || enlarges)) return {};
-  return Contender{"libvips", [=] {
-                     [[maybe_unused]] static const bool initialized = [] {
-                       Require(VIPS_INIT("picturezor_bench") == 0, "libvips");
-                       vips_concurrency_set(1);
-                       vips_cache_set_max(0);
-                       return true;
-                     }();
-                     const auto packed = PackedSource(format, sizes);
-                     const VipsKernel of =
-                         kernel == Kernel::Triangle ? VIPS_KERNEL_LINEAR : VIPS_KERNEL_LANCZOS3;
-                     return Prepared([=] {
-                       VipsImage *source = vips_image_new_from_memory(packed->data(), packed->size(),
-                                                                      sizes.FromWidth, sizes.FromHeight,
-                                                                      ChannelsOf(format), VIPS_FORMAT_UCHAR),
-                                 *scaled = nullptr;
-                       // No shrinking by whole numbers before the kernel, which is coarser.
-                       Require(vips_resize(source, &scaled, double(sizes.IntoWidth) / sizes.FromWidth,
-                                           "kernel", of, "gap", 0.0, nullptr) == 0,
-                               vips_error_buffer());
-                       std::size_t bytes = 0;
-                       void* samples = vips_image_write_to_memory(scaled, &bytes);
-                       g_free(samples);
-                       g_object_unref(scaled);
-                       g_object_unref(source);
-                     });
-                   }};
+  const VipsKernel of = kernel == Kernel::Triangle ? VIPS_KERNEL_LINEAR : VIPS_KERNEL_LANCZOS3;
+  const double factor = double(sizes.IntoWidth) / sizes.FromWidth;
+  return Vips(
+      format,
+      [=](VipsImage* in, VipsImage** out) {
+        // No shrinking by whole numbers before the kernel, which is coarser.
+        return vips_resize(in, out, factor, "kernel", of, "gap", 0.0, nullptr);
+      },
+      sizes.FromWidth, sizes.FromHeight);
 }
-const bool vipsNamed = NamePeer("libvips", VIPS_VERSION);
 #endif
 
 #ifdef PICTUREZOR_OPENCV
-std::optional<Contender> OpenCV(Format format, Kernel kernel, const Sizes& sizes) {
+std::optional<Contender> OpenCVScale(Format format, Kernel kernel, const Sizes& sizes) {
   const bool enlarges = sizes.IntoWidth > sizes.FromWidth;
   // Its other methods don't look at all pixels when they reduce.
   if (!(kernel == Kernel::Box && !enlarges) && !(kernel == Kernel::Triangle && enlarges)) return {};
-  return Contender{
-      "OpenCV", [=] {
-        cv::setNumThreads(1);
-        const auto packed = PackedSource(format, sizes);
-        const cv::Mat source(sizes.FromHeight, sizes.FromWidth, CV_8UC(ChannelsOf(format)), packed->data());
-        const auto dest = std::make_shared<cv::Mat>(sizes.IntoHeight, sizes.IntoWidth, source.type());
-        return Prepared([=] {
-          cv::resize(source, *dest, dest->size(), 0, 0, enlarges ? cv::INTER_LINEAR : cv::INTER_AREA);
-          Require(packed->size() > 0, "OpenCV");
-        });
-      }};
+  const cv::Size size(sizes.IntoWidth, sizes.IntoHeight);
+  return OpenCV(
+      format,
+      [=](cv::Mat& source, cv::Mat& dest) {
+        cv::resize(source, dest, size, 0, 0, enlarges ? cv::INTER_LINEAR : cv::INTER_AREA);
+      },
+      sizes.FromWidth, sizes.FromHeight);
 }
-const bool openCVNamed = NamePeer("OpenCV", CV_VERSION);
 #endif
 
 #ifdef PICTUREZOR_PILLOW
@@ -220,38 +190,21 @@ const bool pillowNamed = [] {
 #endif
 
 #ifdef PICTUREZOR_GRAPHICSMAGICK
-std::optional<Contender> GraphicsMagick(Format format, Kernel kernel, const Sizes& sizes) {
+std::optional<Contender> GraphicsMagickScale(Format format, Kernel kernel, const Sizes& sizes) {
   // Tens of times slower than the others; one format tells as much as three.
   if (format != Format::RGB) return {};
   if (kernel != Kernel::Triangle && kernel != Kernel::Box && kernel != Kernel::Lanczos3) return {};
-  return Contender{"GraphicsMagick", [=] {
-                     [[maybe_unused]] static const bool initialized = [] {
-                       InitializeMagick(nullptr);
-                       SetMagickResourceLimit(ThreadsResource, 1);
-                       return true;
-                     }();
-                     const auto packed = PackedSource(format, sizes);
-                     ExceptionInfo exception;
-                     GetExceptionInfo(&exception);
-                     const std::shared_ptr<Image> image(
-                         ConstituteImage(unsigned(sizes.FromWidth), unsigned(sizes.FromHeight), "RGB",
-                                         CharPixel, packed->data(), &exception),
-                         DestroyImage);
-                     const FilterTypes filter = kernel == Kernel::Triangle ? TriangleFilter
-                                                : kernel == Kernel::Box    ? BoxFilter
-                                                                           : LanczosFilter;
-                     return Prepared([=] {
-                       ExceptionInfo problem;
-                       GetExceptionInfo(&problem);
-                       Image* scaled = ResizeImage(image.get(), unsigned(sizes.IntoWidth),
-                                                   unsigned(sizes.IntoHeight), filter, 1.0, &problem);
-                       Require(scaled, "GraphicsMagick");
-                       DestroyImage(scaled);
-                       DestroyExceptionInfo(&problem);
-                     });
-                   }};
+  const FilterTypes filter = kernel == Kernel::Triangle ? TriangleFilter
+                             : kernel == Kernel::Box    ? BoxFilter
+                                                        : LanczosFilter;
+  const auto width = unsigned(sizes.IntoWidth), height = unsigned(sizes.IntoHeight);
+  return GraphicsMagick(
+      format,
+      [=](Image* image, ExceptionInfo* exception) {
+        return ResizeImage(image, width, height, filter, 1.0, exception);
+      },
+      sizes.FromWidth, sizes.FromHeight);
 }
-const bool graphicsMagickNamed = NamePeer("GraphicsMagick", MagickLibVersionText);
 #endif
 
 }
@@ -266,16 +219,16 @@ std::vector<Contender> ScalePeers([[maybe_unused]] Format format, [[maybe_unused
   add(Zimg(format, kernel, sizes));
 #endif
 #ifdef PICTUREZOR_VIPS
-  add(Vips(format, kernel, sizes));
+  add(VipsScale(format, kernel, sizes));
 #endif
 #ifdef PICTUREZOR_OPENCV
-  add(OpenCV(format, kernel, sizes));
+  add(OpenCVScale(format, kernel, sizes));
 #endif
 #ifdef PICTUREZOR_PILLOW
   add(Pillow(format, kernel, sizes));
 #endif
 #ifdef PICTUREZOR_GRAPHICSMAGICK
-  add(GraphicsMagick(format, kernel, sizes));
+  add(GraphicsMagickScale(format, kernel, sizes));
 #endif
   return peers;
 }
