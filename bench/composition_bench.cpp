@@ -63,8 +63,8 @@ const auto registered = [] {
   race("CopyPixels RGBA", {Copy(Format::RGBA, Format::RGBA), Memcpy(BytesOf(4))});
 
   for (const auto& [name, from, into] : ConversionsOfCvtColor) {
-    std::vector<Contender> contenders = CvtColor(from, into);
-    contenders.insert(contenders.begin(), Copy(from, into));
+    std::vector<Contender> contenders{Copy(from, into)};
+    AddCvtColor(contenders, from, into);
     AddRace("composition", std::string("CopyPixels ") + name, std::move(contenders));
   }
   race("Combine RGB, gray mask", {Combine(Format::RGB, Format::RGB, Format::G), Memcpy(BytesOf(3))});

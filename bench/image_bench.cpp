@@ -17,8 +17,8 @@ Contender RowInFormat(Format from, Format into) {
 
 const auto registered = [] {
   for (const auto& [name, from, into] : ConversionsOfCvtColor) {
-    std::vector<Contender> contenders = CvtColor(from, into);
-    contenders.insert(contenders.begin(), RowInFormat(from, into));
+    std::vector<Contender> contenders{RowInFormat(from, into)};
+    for (const bool byRows : {false, true}) AddCvtColor(contenders, from, into, byRows);
     contenders.push_back(Memcpy(BytesOf(std::max(BytesPerPixel(from), BytesPerPixel(into)))));
     AddRace("image", std::string("RowInFormat ") + name, std::move(contenders));
   }

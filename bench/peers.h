@@ -42,22 +42,22 @@ inline constexpr struct {
                              {"RGB to gray", Format::RGB, Format::G},
                              {"gray to RGB", Format::G, Format::RGB}};
 
-/// OpenCV at such a change, of the whole picture and of each row into a matrix of its own; nobody without it.
-inline std::vector<Contender> CvtColor([[maybe_unused]] Format from, [[maybe_unused]] Format into) {
+/// Adds OpenCV at such a change, if it is there: of the whole picture, or of each row into a matrix of its
+/// own.
+inline void AddCvtColor([[maybe_unused]] std::vector<Contender>& contenders, [[maybe_unused]] Format from,
+                        [[maybe_unused]] Format into, [[maybe_unused]] bool byRows = false) {
 #ifdef PICTUREZOR_OPENCV
   const int code = from == Format::G   ? cv::COLOR_GRAY2RGB
                    : into == Format::G ? cv::COLOR_RGB2GRAY
                                        : cv::COLOR_RGB2BGRA;
-  Contender byRows = OpenCV(from, [=](cv::Mat& source, cv::Mat&) {
+  contenders.push_back(OpenCV(from, [=](cv::Mat& source, cv::Mat& dest) {
+    if (!byRows) return cv::cvtColor(source, dest, code);
     for (int y = 0; y < source.rows; ++y) {
       cv::Mat row;
       cv::cvtColor(source.row(y), row, code);
     }
-  });
-  byRows.Name = "OpenCV by rows";
-  return {OpenCV(from, [=](cv::Mat& source, cv::Mat& dest) { cv::cvtColor(source, dest, code); }), byRows};
-#else
-  return {};
+  }));
+  if (byRows) contenders.back().Name = "OpenCV by rows";
 #endif
 }
 
