@@ -76,7 +76,7 @@ bool ForStretches(const CombineCall& call, InLayout& source, InLayout& mask, Run
   const Rectangle& rectangle = call.Of.Dest;
   const std::int32_t sourceX = call.Of.SourceX, sourceY = call.Of.SourceY;
   const bool shares = SharePixels(call.Image, call.Dest) || SharePixels(call.Mask, call.Dest);
-  const std::int32_t step = call.Dest.PixelSize, left = LeftOf(PlanesOf(GroupOf(call.Dest), call.Dest));
+  const std::int32_t step = call.Dest.PixelSize, left = call.Dest.LeftEdge;
   return Walk(From(call.Image, sourceY), From(call.Mask, sourceY), Yielding(Into(call.Dest, rectangle.Y)))
       .Rows(rectangle.Height,
             [&](std::int32_t y, const Sample* imageRow, const Sample* maskRow, Sample* row) {

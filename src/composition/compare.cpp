@@ -47,7 +47,8 @@ Int64 CompareImages(PictureZOR* self, PictureZOR* other) {
   if (group == Group::None) return -1;
 
   const PlaneList planesOfA = PlanesOf(group, a), planesOfB = PlanesOf(group, b);
-  const PlaneList packed = FillPixelsAlike(planesOfA, planesOfB) ? InPixel(planesOfA) : Packed(planesOfA.Count);
+  const PlaneList packed =
+      FillPixelsAlike(planesOfA, planesOfB) ? InPixel(planesOfA) : Packed(planesOfA.Count);
   const AlphaRule rule = a.HasAlpha ? AlphaRule::Copy : AlphaRule::None;
   static constexpr Sample Pixel[8] = {};  // written whole
   const auto pixelsOf = [&](const PictureData& picture, const PlaneList& planes) {

@@ -50,7 +50,7 @@ void FillPlanes(Sample* row, const PlaneList& planes, const Values& values, std:
 void Fill(PictureData& picture, const Rectangle& asked, Group group, const Values& values) {
   const PlaneList planes = PlanesOf(group, picture);
   const auto pixel = std::size_t(planes.Step);
-  const std::int32_t left = LeftOf(planes);
+  const std::int32_t left = picture.LeftEdge;
   const bool alike = std::all_of(values.begin(), values.begin() + planes.Count,
                                  [&](Sample value) { return value == values[0]; });
   if (FillPixels(planes) && alike)
@@ -86,7 +86,7 @@ PlaneList NoiseOrder(const PictureData& picture) {
   if (picture.IsCMYK && picture.HasAlpha)
     std::rotate(begin, end - 1, end);
   else if (!picture.IsCMYK && FillPixels(planes))
-    std::iota(begin, end, LeftOf(planes));
+    std::iota(begin, end, picture.LeftEdge);
   return planes;
 }
 
@@ -177,9 +177,8 @@ void ClearRect(PictureZOR* self) {
 void ClearRect(PictureZOR* self, Integer x, Integer y, Integer width, Integer height) {
   PictureData& picture = DataOf(self);
   if (!ShowsWholePixels(picture)) return FillRect(self, x, y, width, height, 0);
-  const std::int32_t left = LeftOf(PlanesOf(GroupOf(picture), picture));
   ForRectangle(picture, {x, y, width, height}, [&](Sample* row, std::int32_t count) {
-    std::memset(row + left, 0, std::size_t(count) * std::size_t(picture.PixelSize));
+    std::memset(row + picture.LeftEdge, 0, std::size_t(count) * std::size_t(picture.PixelSize));
   });
 }
 

@@ -36,11 +36,9 @@ inline std::int64_t PackedRowBytes(const PictureData& picture) {
 }
 
 /// Bytes of a stored row to the end of its last pixel, and `RowSize` at least. In a caller's block the pixels
-/// may reach further than the way from row to row; on a clip view the left edge counts.
+/// may reach further than the way from row to row.
 inline std::int64_t StoredRowBytes(const PictureData& picture) {
-  const std::int32_t lastOffset =
-      picture.ChannelCount > 0 ? picture.ChannelOffsets[std::size_t(picture.ChannelCount) - 1] : 0;
-  const std::int64_t extent = PackedRowBytes(picture) + lastOffset / picture.PixelSize * picture.PixelSize;
+  const std::int64_t extent = picture.LeftEdge + PackedRowBytes(picture);
   return extent > picture.RowSize ? extent : picture.RowSize;
 }
 

@@ -19,7 +19,7 @@ struct Store;
 /// that its size, format and layout never change.
 ///
 /// Sample P of pixel x in a row is the byte at row + x * PixelSize + POffset. On a clip view the offsets hold
-/// the left edge too.
+/// `LeftEdge` too.
 struct PictureData {
   using RowFunction = Sample* (*)(PictureData*, std::int32_t row);
 
@@ -81,6 +81,8 @@ struct PictureData {
   std::int32_t WindowFirstRow, WindowLastRow;
   /// Rows of a window.
   std::int32_t RowsPerBlock;
+  /// Bytes of a row before the first pixel that a clip view, or a view of one, shows.
+  std::int32_t LeftEdge;
 };
 
 /// The host allocates 256 bytes of instance data where the record fits, as it does with 32-bit words.

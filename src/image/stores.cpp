@@ -14,7 +14,6 @@
 
 #include "frame/host_services.h"
 #include "image/formats.h"
-#include "image/groups.h"
 
 namespace zor {
 
@@ -312,7 +311,7 @@ std::int32_t ReadAhead(const PictureData& read, Place from, const PictureData& w
   if (read.Samples != written.Samples || !RowsAreApart(read) || !RowsAreApart(written)) return 1;
   if (StoreRowOf(read, from.Y) != StoreRowOf(written, into.Y)) return any;
   const auto column = [](const PictureData& picture, std::int32_t x) {
-    return LeftOf(PlanesOf(GroupOf(picture), picture)) / picture.PixelSize + x;
+    return picture.LeftEdge / picture.PixelSize + x;
   };
   const std::int32_t ahead = column(written, into.X) - column(read, from.X);
   return ahead > 0 ? ahead : any;

@@ -34,6 +34,7 @@ Held NewView(PictureZOR* self) {
   data.Width = parent.Width;
   data.Height = parent.Height;
   data.RowOffset = parent.RowOffset;
+  data.LeftEdge = parent.LeftEdge;
   data.TotalSize = parent.TotalSize;
   data.Parent = Locked(self);
   data.Target = Locked(parent.Target);
@@ -161,6 +162,7 @@ PictureZOR* ClipImage(PictureZOR* self, Integer x, Integer y, Integer width, Int
   data.MemoryTarget = Locked(parent.MemoryTarget);
 
   const std::int64_t shift = columns.First * parent.PixelSize;
+  data.LeftEdge = Saturated(parent.LeftEdge + shift);
   data.ChannelCount = parent.ChannelCount;
   for (std::size_t c = 0; c < std::size_t(parent.ChannelCount); ++c)
     data.ChannelOffsets[c] = Saturated(parent.ChannelOffsets[c] + shift);

@@ -151,6 +151,11 @@ TEST(ClearRect, ClearsOnlyThePlanesOfAViewOfChannels) {
                       p.AlphaChannel().ClipImage({2, 0, 9, 9}).ClearRect();
                     }),
             (Samples{9, 9, 9, 9, 9, 0}));
+  EXPECT_EQ(cleared(Format::Scaling2,
+                    [](const Picture& p) {
+                      p.ClipImage({1, 0, 2, 1}).ClipImage({1, 0, 1, 1}).ClearRect();
+                    }),
+            (Samples{9, 9, 9, 9, 0, 0}));
   EXPECT_EQ(cleared(Format::TwoOf3, [](const Picture& p) { p.GrayChannel().MirroredView().ClearRect(); }),
             (Samples{9, 0, 9, 9, 0, 9, 9, 0, 9}));
 }
