@@ -8,6 +8,7 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <typeinfo>
 #include <unordered_map>
 #include <utility>
 #include <vector>
@@ -84,9 +85,11 @@ static_assert(sizeof(ObjectHeader) <= InstanceOffset);
 inline ObjectHeader& HeaderOf(void* object) { return *static_cast<ObjectHeader*>(object); }
 inline std::uint8_t* InstanceOf(void* object) { return static_cast<std::uint8_t*>(object) + InstanceOffset; }
 
+/// What an object holds if that is just a T.
 template <class T>
 T* HeldBy(void* object) {
-  return object ? dynamic_cast<T*>(HeaderOf(object).Holds.get()) : nullptr;
+  Payload* const held = object ? HeaderOf(object).Holds.get() : nullptr;
+  return held && typeid(*held) == typeid(T) ? static_cast<T*>(held) : nullptr;
 }
 
 /// All that lives behind the services.

@@ -1,10 +1,11 @@
+#include "image/stores.h"
+
 #include <gmock/gmock.h>
 #include <unistd.h>
 
 #include <algorithm>
 
 #include "image/picture_data.h"
-#include "image/stores.h"
 #include "invoke.h"
 #include "support/every_store.h"
 #include "support/row_arguments.h"

@@ -175,7 +175,8 @@ void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, i
   if (type == "picturezor") {
     sum.Add(Picture(Object::Adopt(outcome.Result.Address)));
   } else if (type == "string") {
-    if (const auto* text = static_cast<model::StringRecord*>(outcome.Result.Address)) sum.Add(model::TextOf(*text));
+    if (const auto* text = static_cast<model::StringRecord*>(outcome.Result.Address))
+      sum.Add(model::TextOf(*text));
     GiveBack(type, outcome.Result);
   } else if (type == "picture") {
     sum.Add(HostPicture(Object::Adopt(outcome.Result.Address)));
