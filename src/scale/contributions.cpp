@@ -4,6 +4,7 @@
 #include <bit>
 #include <cmath>
 #include <cstdlib>
+#include <numeric>
 
 #include "image/arithmetic.h"
 
@@ -40,38 +41,12 @@ class KnownValues {
   Known Values[1 << SizeBits];
 };
 
-/// Distances in whole numbers of 2^-20 source lines.
-using ExactDistance = std::int64_t;
-constexpr double ExactUnits = 0x1p20;
-
-/// Whether a distance is such a number. Then so are the differences of these, exactly, and the weights of a
-/// line depend only on where its centre lies between two source lines.
-bool IsExact(double lines, ExactDistance& exact) {
-  exact = ExactDistance(lines * ExactUnits);
-  return double(exact) == lines * ExactUnits;
+/// Whether a position is a whole number of 2^-20 source lines. The differences of such positions are too, and
+/// none of them is rounded.
+bool IsExact(double lines) {
+  constexpr double units = 0x1p20;
+  return double(std::int64_t(lines * units)) == lines * units;
 }
-
-/// The lines that came first with some fractions of their centres.
-class FirstLines {
- public:
-  struct Line {
-    std::int32_t Number;
-    ExactDistance Centre;
-  };
-  FirstLines() { std::fill_n(Lines, 1 << SizeBits, Line{0, -1}); }
-  /// The line that came first with the same fraction, as far as that is known, or else this one.
-  Line Like(const Line& line) {
-    const ExactDistance fraction = Fraction(line.Centre);
-    Line& first = Lines[std::uint32_t(fraction) * 0x9E3779B1U >> (32 - SizeBits)];
-    if (first.Centre < 0 || Fraction(first.Centre) != fraction) first = line;
-    return first;
-  }
-
- private:
-  static ExactDistance Fraction(ExactDistance centre) { return centre & (ExactDistance(ExactUnits) - 1); }
-  static constexpr int SizeBits = 8;
-  Line Lines[1 << SizeBits];
-};
 
 }
 
@@ -91,25 +66,28 @@ class ContributionTable::Filler {
         Width(scale < 1.0 ? SearchRadius(kernel) / scale : SearchRadius(kernel)),
         Shrinks(scale < 1.0),
         Values(kernel) {
-    ExactDistance width;
-    HasExactWidth = IsExact(Width, width);
+    const std::int32_t common = std::gcd(table.LineCount, sourceCount);
+    Period = table.LineCount / common;
+    SourcePeriod = sourceCount / common;
   }
   void Fill(std::int32_t d) {
     Contribution& line = Table.Lines[d];
     line.Alike = d;
-    const double centre = (d + 0.5) / Scale;
+    const double centre = Centre(d);
     const std::int32_t farLeft = Truncate(centre - Width), farRight = Truncate(centre + Width);
     const std::int32_t left = std::max(farLeft, 0), right = std::min(farRight, SourceCount - 1);
     // Each candidate gives one entry at most.
     if (left > right || !HasRoom(std::size_t(right - left) + 1)) return;
     line.Entries = Free;
-    FirstLines::Line own{d, 0}, first = own;
-    const bool whole = HasExactWidth && centre >= Width && farRight < SourceCount;
-    if (whole && IsExact(centre, own.Centre)) first = Firsts.Like(own);
-    if (first.Number != d)
-      Copy(line, first.Number, std::int32_t((own.Centre - first.Centre) / ExactDistance(ExactUnits)));
+    const bool whole = centre >= Width && farRight < SourceCount;
+    if (whole && FirstWhole < 0) FirstWhole = d;
+    const Contribution* before =
+        whole && d - Period >= FirstWhole && Table.Lines[d - Period].Entries ? &line - Period : nullptr;
+    if (before && IsExactlyLike(d - Period, centre))
+      Copy(line, *before);
     else
       Compute(line, centre, left, right);
+    if (before && AreAlike(line, *before)) line.Alike = before->Alike;
     Free += line.Count;
     Room -= std::size_t(line.Count);
   }
@@ -126,13 +104,24 @@ class ContributionTable::Filler {
     }
     line.Sum = float(sum);
   }
-  void Copy(Contribution& line, std::int32_t alike, std::int32_t further) const {
-    const Contribution& from = Table.Lines[alike];
+  double Centre(std::int32_t d) const { return (d + 0.5) / Scale; }
+  /// Whether all that a line is computed from differs from another line by whole numbers only.
+  bool IsExactlyLike(std::int32_t d, double centre) const {
+    return IsExact(Width) && IsExact(centre) && centre - Centre(d) == SourcePeriod && IsExact(Centre(d));
+  }
+  void Copy(Contribution& line, const Contribution& from) const {
     for (std::int32_t i = 0; i < from.Count; ++i)
-      line.Entries[i] = {from.Entries[i].Weight, from.Entries[i].Pixel + further};
+      line.Entries[i] = {from.Entries[i].Weight, from.Entries[i].Pixel + SourcePeriod};
     line.Count = from.Count;
     line.Sum = from.Sum;
-    line.Alike = alike;
+  }
+  /// Rounding may have made a difference, and then it may not.
+  bool AreAlike(const Contribution& a, const Contribution& b) const {
+    return a.Count == b.Count && a.Sum == b.Sum &&
+           std::equal(a.Entries, a.Entries + a.Count, b.Entries,
+                      [&](const ContributionEntry& one, const ContributionEntry& other) {
+                        return one.Weight == other.Weight && one.Pixel == other.Pixel + SourcePeriod;
+                      });
   }
   bool HasRoom(std::size_t entries) {
     if (entries <= Room) return true;
@@ -149,9 +138,11 @@ class ContributionTable::Filler {
   ContributionTable& Table;
   std::int32_t SourceCount;
   double Scale, Width;
-  bool Shrinks, HasExactWidth;
+  bool Shrinks;
   KnownValues Values;
-  FirstLines Firsts;
+  /// After so many lines, and so many of the source, the centres lie in the same way again. And the first
+  /// line that no edge cuts short.
+  std::int32_t Period, SourcePeriod, FirstWhole = -1;
   ContributionEntry* Free = nullptr;
   std::size_t Room = 0;
 };

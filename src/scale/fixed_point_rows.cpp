@@ -86,12 +86,14 @@ struct FixedPointRows::Shares {
 /// Lays out the groups.
 struct GroupMaker {
   using Line = FixedPointRows::Shares::Line;
+  using ColumnGroup = FixedPointRows::ColumnGroup;
+  using GroupPattern = FixedPointRows::GroupPattern;
 
   FixedPointRows& Rows;
   const FixedPointRows::Shares& Lines;
   const int Channels = Rows.Pair.Channels;
   const int Step = Rows.Pair.Source.Step;
-  std::uint32_t Pattern[Lanes][Lanes] = {};
+  std::uint32_t LaneIndex[Lanes][Lanes] = {};
 
   /// What a group takes in: its leftmost source pixel, how far right of that a line begins, and the most that
   /// one takes in. A line may begin left of the one before it, since weights of 0 have no entries.
@@ -118,22 +120,32 @@ struct GroupMaker {
   bool IsInReach(std::int64_t farthest, int parts) const {
     return (farthest + Taps * parts - 1) * Step + Rows.Spread < VectorBytes;
   }
+  std::int32_t GroupCount() const { return (Rows.ResultWidth + Rows.Pixels - 1) / Rows.Pixels; }
+  std::int32_t FarthestOfAll() const {
+    std::int32_t farthest = 0;
+    for (std::int32_t g = 0; g < GroupCount(); ++g)
+      farthest = std::max(farthest, ExtentFrom(g * Rows.Pixels).Farthest);
+    return farthest;
+  }
+  /// Takes the cheapest layout in reach. What one costs is told by some groups, as most are alike.
   bool ChooseLayout() {
-    std::int64_t best = std::numeric_limits<std::int64_t>::max();
+    constexpr std::int32_t some = 32;
+    double best = std::numeric_limits<double>::max();
     int bestPixels = 0;
     for (Rows.Pixels = Lanes / Channels; Rows.Pixels >= 1; --Rows.Pixels) {
-      const int mostParts = Lanes / (Channels * Rows.Pixels);
-      std::int64_t cost[Lanes + 1] = {};
-      std::int32_t farthest = 0;
-      for (std::int32_t x = 0; x < Rows.ResultWidth; x += Rows.Pixels) {
-        const Extent extent = ExtentFrom(x);
-        farthest = std::max(farthest, extent.Farthest);
-        for (int parts = mostParts; parts >= 1; --parts)
-          cost[parts] += 4 * StepsFor(extent.Reach, parts) + 10;
-      }
-      for (int parts = mostParts; parts >= 1; --parts) {
-        if (!IsInReach(farthest, parts) || cost[parts] >= best) continue;
-        best = cost[parts];
+      const std::int32_t groups = GroupCount(), looked = std::min(groups, some);
+      std::int32_t reaches[some];
+      for (std::int32_t i = 0; i < looked; ++i)
+        reaches[i] = ExtentFrom(std::int32_t(std::int64_t{groups} * i / looked) * Rows.Pixels).Reach;
+      std::int32_t farthest = -1;
+      for (int parts = Lanes / (Channels * Rows.Pixels); parts >= 1; --parts) {
+        std::int64_t cost = 0;
+        for (std::int32_t i = 0; i < looked; ++i) cost += 4 * StepsFor(reaches[i], parts) + 10;
+        const double ofAll = double(cost) * groups / looked;
+        if (ofAll >= best) continue;
+        if (farthest < 0) farthest = FarthestOfAll();
+        if (!IsInReach(farthest, parts)) continue;
+        best = ofAll;
         bestPixels = Rows.Pixels;
         Rows.Parts = parts;
       }
@@ -146,28 +158,16 @@ struct GroupMaker {
   }
   /// The index of a lane whose line begins with the group's first source pixel; the four bytes of a lane
   /// are below VectorBytes, also when the same is added to each.
-  void MakePattern() {
+  void MakeLaneIndex() {
     for (int part = 0; part < Rows.Parts; ++part)
       for (int c = 0; c < Channels; ++c) {
         std::uint8_t bytes[Taps];
         for (int t = 0; t < Taps; ++t)
           bytes[t] = std::uint8_t((part * Taps + t) * Step + Rows.Pair.Source.Offset[c] - Rows.Lead);
-        std::memcpy(&Pattern[part][c], bytes, Taps);
+        std::memcpy(&LaneIndex[part][c], bytes, Taps);
       }
   }
-  void FillIndex(FixedPointRows::ColumnGroup& group, std::int32_t start) const {
-    for (std::int32_t p = 0; p < group.Columns; ++p) {
-      const Line& line = Lines[group.FirstColumn + p];
-      const auto further = line.Reach > 0 ? std::uint32_t((line.First - start) * Step) * 0x01010101U : 0;
-      for (int part = 0; part < Rows.Parts; ++part)
-        for (int c = 0; c < Channels; ++c) {
-          const std::uint32_t bytes = Pattern[part][c] + further;
-          std::memcpy(group.Index + Lane(part, p, c) * Taps, &bytes, Taps);
-        }
-    }
-  }
-  /// Fills all of a group but what comes of the shares; gives its steps.
-  std::int32_t PlaceGroup(FixedPointRows::ColumnGroup& group, std::int32_t number) const {
+  void Place(ColumnGroup& group, std::int32_t number) const {
     group.FirstColumn = number * Rows.Pixels;
     group.Columns = ColumnsFrom(group.FirstColumn);
     const Extent extent = ExtentFrom(group.FirstColumn);
@@ -176,8 +176,45 @@ struct GroupMaker {
     const std::int64_t room = Rows.RowBytes - group.Base - VectorBytes;
     const std::int64_t whole = room < 0 ? 0 : room / (Taps * Rows.Parts * Step) + 1;
     group.WholeSteps = std::int32_t(std::min<std::int64_t>(group.Steps, whole));
-    FillIndex(group, extent.Start);
-    return group.Steps;
+  }
+  /// Where a line begins, from its group's first source pixel on.
+  std::int32_t FurtherBy(const ColumnGroup& group, std::int32_t pixel) const {
+    const Line& line = Lines[group.FirstColumn + pixel];
+    return line.Reach > 0 ? line.First - std::int32_t(group.Base / Step) : 0;
+  }
+  bool ArePatternsAlike(const ColumnGroup& a, const ColumnGroup& b) const {
+    bool alike = a.Columns == b.Columns;
+    for (std::int32_t p = 0; alike && p < a.Columns; ++p)
+      alike = Rows.Table[a.FirstColumn + p].Alike == Rows.Table[b.FirstColumn + p].Alike &&
+              FurtherBy(a, p) == FurtherBy(b, p);
+    return alike;
+  }
+  /// A group not far before this one that has the same pattern, or else this one.
+  std::int32_t WithPatternOf(std::int32_t number) const {
+    constexpr std::int32_t far = 16;
+    for (std::int32_t g = number - 1; g >= std::max(number - far, 0); --g)
+      if (ArePatternsAlike(Rows.Groups[g], Rows.Groups[number])) return g;
+    return number;
+  }
+  std::size_t PatternBytes(const ColumnGroup& group) const {
+    return sizeof(GroupPattern) + std::size_t(group.Steps) * std::size_t(Rows.Digits) * VectorBytes;
+  }
+  void Fill(GroupPattern& pattern, const ColumnGroup& group) const {
+    for (std::int32_t p = 0; p < group.Columns; ++p) {
+      const auto further = std::uint32_t(FurtherBy(group, p) * Step) * 0x01010101U;
+      for (int part = 0; part < Rows.Parts; ++part)
+        for (int c = 0; c < Channels; ++c) {
+          const std::uint32_t bytes = LaneIndex[part][c] + further;
+          std::memcpy(pattern.Index + Lane(part, p, c) * Taps, &bytes, Taps);
+        }
+      FillWeights(pattern.Weights(), p, group.FirstColumn + p);
+      const Line& line = Lines[group.FirstColumn + p];
+      // Without shares all of the sum is the bias: one half, which is in doubt.
+      const std::int32_t bias = line.Fits ? line.Of.Bias : 1 << (FixedPointLine::Bits - 1);
+      const std::uint32_t doubtful = line.Fits ? line.Of.Doubtful : 1U << FixedPointLine::Bits;
+      std::fill_n(pattern.Bias + p * Channels, Channels, bias);
+      std::fill_n(pattern.Doubtful + p * Channels, Channels, doubtful);
+    }
   }
   /// Writes the digits of one line's shares into the weights of its group, four taps at a time.
   void FillWeights(std::int8_t* weights, int pixel, std::int32_t x) const {
@@ -227,29 +264,29 @@ bool FixedPointRows::Build() {
   const bool all = lines.Doubtful || (lines.Used & 0xFF) != 0;
   Digits = all ? 3 : (lines.Used & 0xFF00) != 0 ? 2 : 1;
 
-  const std::int32_t groups = (ResultWidth + Pixels - 1) / Pixels;
-  GroupMemory = NewBuffer(std::size_t(groups + 1) * sizeof(ColumnGroup));
+  const std::int32_t groups = maker.GroupCount();
+  GroupMemory = NewBuffer(std::size_t(groups) * sizeof(ColumnGroup));
   if (!GroupMemory) return false;
-  Groups = reinterpret_cast<ColumnGroup*>(Aligned(GroupMemory));
-  maker.MakePattern();
-  std::size_t steps = 0;
-  for (std::int32_t g = 0; g < groups; ++g) steps += std::size_t(maker.PlaceGroup(Groups[g], g));
-  WeightMemory = NewBuffer((steps + 1) * std::size_t(Digits) * VectorBytes);
-  if (!WeightMemory) return false;
-  auto* weights = reinterpret_cast<std::int8_t*>(Aligned(WeightMemory));
+  Groups = reinterpret_cast<ColumnGroup*>(GroupMemory.get());
+  maker.MakeLaneIndex();
+  std::size_t bytes = 0;
+  for (std::int32_t g = 0; g < groups; ++g) {
+    maker.Place(Groups[g], g);
+    if (maker.WithPatternOf(g) == g) bytes += maker.PatternBytes(Groups[g]);
+  }
+  PatternMemory = NewBuffer(bytes + VectorBytes);
+  if (!PatternMemory) return false;
+  Sample* free = Aligned(PatternMemory);
   for (std::int32_t g = 0; g < groups; ++g) {
     ColumnGroup& group = Groups[g];
-    group.Weights = weights;
-    for (std::int32_t p = 0; p < group.Columns; ++p) {
-      const Shares::Line& line = lines[group.FirstColumn + p];
-      maker.FillWeights(weights, p, group.FirstColumn + p);
-      // Without shares all of the sum is the bias: one half, which is in doubt.
-      const std::int32_t bias = line.Fits ? line.Of.Bias : 1 << (FixedPointLine::Bits - 1);
-      const std::uint32_t doubtful = line.Fits ? line.Of.Doubtful : 1U << FixedPointLine::Bits;
-      std::fill_n(group.Bias + p * Pair.Channels, Pair.Channels, bias);
-      std::fill_n(group.Doubtful + p * Pair.Channels, Pair.Channels, doubtful);
+    if (const std::int32_t other = maker.WithPatternOf(g); other != g) {
+      group.Pattern = Groups[other].Pattern;
+      continue;
     }
-    weights += std::ptrdiff_t{group.Steps} * Digits * VectorBytes;
+    auto* pattern = reinterpret_cast<GroupPattern*>(free);
+    maker.Fill(*pattern, group);
+    group.Pattern = pattern;
+    free += maker.PatternBytes(group);
   }
   return true;
 }

@@ -32,6 +32,7 @@ class FixedPointRows {
  private:
   friend struct GroupMaker;
   friend struct GroupRunner;
+  struct GroupPattern;
   struct ColumnGroup;
   struct Shares;
 
@@ -46,7 +47,7 @@ class FixedPointRows {
   /// Output pixels of a group, lanes that share a sample, digits of a share.
   int Pixels = 0, Parts = 0, Digits = 0;
   bool Built = false;
-  Buffer GroupMemory, WeightMemory;
+  Buffer GroupMemory, PatternMemory;
   ColumnGroup* Groups = nullptr;
 };
 

@@ -101,16 +101,17 @@ struct GroupRunner {
 
     const auto *group = plan.Groups + columns.First / plan.Pixels, *end = group;
     for (end += (columns.Count() + plan.Pixels - 1) / plan.Pixels; group != end; ++group) {
-      const __m512i take = _mm512_load_si512(group->Index);
+      const FixedPointRows::GroupPattern& pattern = *group->Pattern;
+      const __m512i take = _mm512_load_si512(pattern.Index);
       __m512i sums[Rows][Digits];
       const Sample* source[Rows];
       for (int r = 0; r < Rows; ++r) {
         source[r] = from[r] + plan.Lead + group->Base;
         for (int d = 0; d < Digits; ++d) sums[r][d] = zero;
         // Only lines of three digits have a bias.
-        if constexpr (Digits == 3) sums[r][2] = _mm512_load_si512(group->Bias);
+        if constexpr (Digits == 3) sums[r][2] = _mm512_load_si512(pattern.Bias);
       }
-      const std::int8_t* weights = group->Weights;
+      const std::int8_t* weights = pattern.Weights();
       std::int32_t s = 0;
       for (; s < group->WholeSteps; ++s, weights += Digits * VectorBytes) {
         __m512i weight[Digits];
@@ -140,7 +141,7 @@ struct GroupRunner {
                      group->Columns * writer.Count, room);
         if constexpr (Digits == 3) {
           __mmask16 doubt =
-              _mm512_cmplt_epu32_mask(_mm512_and_si512(sum, fraction), _mm512_load_si512(group->Doubtful));
+              _mm512_cmplt_epu32_mask(_mm512_and_si512(sum, fraction), _mm512_load_si512(pattern.Doubtful));
           if (doubt) [[unlikely]] {
             // Near 0 both sides give the same byte.
             doubt = _mm512_mask_cmpge_epi32_mask(doubt, sum, half);
