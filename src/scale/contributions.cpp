@@ -76,18 +76,16 @@ class ContributionTable::Filler {
     const double centre = Centre(d);
     const std::int32_t farLeft = Truncate(centre - Width), farRight = Truncate(centre + Width);
     const std::int32_t left = std::max(farLeft, 0), right = std::min(farRight, SourceCount - 1);
-    // Each candidate gives one entry at most.
-    if (left > right || !HasRoom(std::size_t(right - left) + 1)) return;
-    line.Entries = Free;
+    if (left > right) return;
     const bool whole = centre >= Width && farRight < SourceCount;
     if (whole && FirstWhole < 0) FirstWhole = d;
-    const Contribution* before =
-        whole && d - Period >= FirstWhole && Table.Lines[d - Period].Entries ? &line - Period : nullptr;
-    if (before && IsExactlyLike(d - Period, centre))
-      Copy(line, *before);
-    else
-      Compute(line, centre, left, right);
-    if (before && AreAlike(line, *before)) line.Alike = before->Alike;
+    const bool repeats = whole && d - Period >= FirstWhole && Table.Lines[d - Period].Entries;
+    const Contribution& before = repeats ? Table.Lines[d - Period] : line;
+    if (repeats && IsExactlyLike(d - Period, centre)) return Repeat(line, before);
+    // Each candidate gives one entry at most.
+    if (!HasRoom(std::size_t(right - left) + 1)) return;
+    Compute(line, centre, left, right);
+    if (repeats && AreAlike(line, before)) return Repeat(line, before);
     Free += line.Count;
     Room -= std::size_t(line.Count);
   }
@@ -95,11 +93,13 @@ class ContributionTable::Filler {
  private:
   void Compute(Contribution& line, double centre, std::int32_t left, std::int32_t right) {
     double sum = 0.0;
+    line.Entries = Free;
     for (std::int32_t i = left; i <= right; ++i) {
       double x = (centre - i) - 0.5, value = 0.0;
       if (Shrinks) x *= Scale;
       if (!Values.At(std::fabs(x), value) || value == 0.0) continue;
-      line.Entries[line.Count++] = {float(value), i};
+      if (line.Count == 0) line.First = i;
+      Free[line.Count++] = {float(value), i - line.First};
       sum += value;
     }
     line.Sum = float(sum);
@@ -109,18 +109,16 @@ class ContributionTable::Filler {
   bool IsExactlyLike(std::int32_t d, double centre) const {
     return IsExact(Width) && IsExact(centre) && centre - Centre(d) == SourcePeriod && IsExact(Centre(d));
   }
-  void Copy(Contribution& line, const Contribution& from) const {
-    for (std::int32_t i = 0; i < from.Count; ++i)
-      line.Entries[i] = {from.Entries[i].Weight, from.Entries[i].Pixel + SourcePeriod};
-    line.Count = from.Count;
-    line.Sum = from.Sum;
+  void Repeat(Contribution& line, const Contribution& before) const {
+    line = before;
+    line.First += SourcePeriod;
   }
   /// Rounding may have made a difference, and then it may not.
   bool AreAlike(const Contribution& a, const Contribution& b) const {
-    return a.Count == b.Count && a.Sum == b.Sum &&
+    return a.Count == b.Count && a.Sum == b.Sum && a.First == b.First + SourcePeriod &&
            std::equal(a.Entries, a.Entries + a.Count, b.Entries,
-                      [&](const ContributionEntry& one, const ContributionEntry& other) {
-                        return one.Weight == other.Weight && one.Pixel == other.Pixel + SourcePeriod;
+                      [](const ContributionEntry& one, const ContributionEntry& other) {
+                        return one.Weight == other.Weight && one.Pixel == other.Pixel;
                       });
   }
   bool HasRoom(std::size_t entries) {

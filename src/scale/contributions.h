@@ -6,21 +6,29 @@
 
 namespace zor {
 
-/// One source line's share in an output line.
+/// One source line's share in an output line. The line is counted from the first one that the output line
+/// looks at.
 struct ContributionEntry {
   float Weight;
   std::int32_t Pixel;
 };
 
 /// What goes into one output line: `Count` source lines in rising order, all within the picture, and what to
-/// divide by. Beyond an edge there are no lines; the division makes up for them.
+/// divide by. Beyond an edge there are no lines; the division makes up for them. Lines with the same weights
+/// share their entries.
 struct Contribution {
-  ContributionEntry* Entries;
+  const ContributionEntry* Entries;
   std::int32_t Count;
+  /// The first source line.
+  std::int32_t First;
   /// The sum of the weights before they were rounded, rounded once.
   float Sum;
   /// A line with the same weights that comes first, if it is known, otherwise this one.
   std::int32_t Alike;
+
+  std::int32_t PixelAt(std::int32_t entry) const { return First + Entries[entry].Pixel; }
+  /// The last source line, of at least one.
+  std::int32_t Last() const { return PixelAt(Count - 1); }
 };
 
 /// The contributions of one axis, freed with the table.

@@ -98,17 +98,16 @@ template <int Terms>
 void SumRows(const RowsInHand* rows) {
   std::int32_t end = 0;
   for (std::int32_t x = rows->Of.First; x < rows->Of.End; ++x)
-    if (const Contribution& line = rows->Table[x]; line.Count > 0)
-      end = std::max(end, line.Entries[line.Count - 1].Pixel + 1);
+    if (const Contribution& line = rows->Table[x]; line.Count > 0) end = std::max(end, line.Last() + 1);
   WidePixels<Terms> wide(*rows, end);
   for (std::int32_t x = rows->Of.First; x < rows->Of.End; ++x) {
     const Contribution& line = rows->Table[x];
     DoubleLanes sums;
     for (std::int32_t i = 0; i < line.Count;) {
-      wide.Need(line.Entries[i].Pixel, line.Entries[line.Count - 1].Pixel);
-      for (; i < line.Count && wide.Has(line.Entries[i].Pixel); ++i) {
+      wide.Need(line.PixelAt(i), line.Last());
+      for (; i < line.Count && wide.Has(line.PixelAt(i)); ++i) {
         const double weight = line.Entries[i].Weight;
-        const DoubleLanes* terms = wide.At(line.Entries[i].Pixel);
+        const DoubleLanes* terms = wide.At(line.PixelAt(i));
         for (int t = 0; t < Terms; ++t) sums.Add(terms[t], weight);
       }
     }

@@ -47,7 +47,8 @@ struct FixedPointRows::Shares {
 
   explicit Shares(const ContributionTable& table) {
     std::size_t entries = 0;
-    for (std::int32_t x = 0; x < table.Count(); ++x) entries += std::size_t(table[x].Count);
+    for (std::int32_t x = 0; x < table.Count(); ++x)
+      if (table[x].Alike == x) entries += std::size_t(table[x].Count);
     ShareMemory = NewBuffer((entries + 1) * sizeof(std::int32_t));
     LineMemory = NewBuffer(std::size_t(table.Count()) * sizeof(Line));
     if (*this) Fill(table);
@@ -61,18 +62,18 @@ struct FixedPointRows::Shares {
     for (std::int32_t x = 0; x < table.Count(); ++x) {
       const Contribution& from = table[x];
       Line& line = (*this)[x];
-      line.Shares = shares;
-      shares += from.Count;
       if (from.Count > 0) {
-        line.First = from.Entries[0].Pixel;
-        line.Reach = from.Entries[from.Count - 1].Pixel - line.First + 1;
+        line.First = from.First;
+        line.Reach = from.Last() - from.First + 1;
       }
       if (from.Alike != x) {
         const Line& alike = (*this)[from.Alike];
         line.Of = alike.Of;
         line.Fits = alike.Fits;
-        std::copy_n(alike.Shares, from.Count, line.Shares);
+        line.Shares = alike.Shares;
       } else {
+        line.Shares = shares;
+        shares += from.Count;
         line.Fits = MakeFixedPoint(from, line.Shares, line.Of);
         if (!line.Fits) std::fill_n(line.Shares, from.Count, 0);
         Doubtful |= !line.Fits || line.Of.Doubtful > 0;
@@ -229,7 +230,7 @@ struct GroupMaker {
         for (int c = 0; c < Channels; ++c) std::memcpy(lanes + d * VectorBytes + c * Taps, four[d], Taps);
     };
     for (std::int32_t i = 0; i < line.Count; ++i) {
-      const std::int32_t tap = line.Entries[i].Pixel - Lines[x].First;
+      const std::int32_t tap = line.Entries[i].Pixel;
       if (tap / Taps != place) {
         write();
         std::memset(four, 0, sizeof four);

@@ -167,7 +167,7 @@ struct GroupRunner {
       const Sample* plane = from + planes.Offset[channel];
       double sum = 0.0;
       for (std::int32_t i = 0; i < line.Count; ++i)
-        sum += double(line.Entries[i].Weight) * plane[std::ptrdiff_t{line.Entries[i].Pixel} * planes.Step];
+        sum += double(line.Entries[i].Weight) * plane[std::ptrdiff_t{line.PixelAt(i)} * planes.Step];
       const Sample sample = ExactQuotient(sum, line.Sum);
       for (int b = 0; b < order.Count; ++b)
         if (order.Channel[b] == channel) into[pixel * order.Count + b] = sample;

@@ -62,8 +62,8 @@ ColumnPlan::RowRange ColumnPlan::RowsOf(std::int32_t y, int count) const {
   for (std::int32_t i = y; i < y + count; ++i) {
     const Contribution& line = Table[i];
     if (line.Count == 0) continue;
-    range.First = std::min(range.First, line.Entries[0].Pixel);
-    range.Last = std::max(range.Last, line.Entries[line.Count - 1].Pixel);
+    range.First = std::min(range.First, line.First);
+    range.Last = std::max(range.Last, line.Last());
   }
   return range.Last < 0 ? RowRange{0, -1} : range;
 }

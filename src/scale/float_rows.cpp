@@ -120,8 +120,8 @@ bool FloatRows::Build() {
     const Contribution& from = (*Table)[x];
     Line& line = Lines[x];
     if (from.Count > 0) {
-      line.First = from.Entries[0].Pixel;
-      line.Reach = from.Entries[from.Count - 1].Pixel - line.First + 1;
+      line.First = from.First;
+      line.Reach = from.Last() - from.First + 1;
       least = std::min(least, line.First);
       widest = std::max(widest, line.First + line.Reach - least);
     }

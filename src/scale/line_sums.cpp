@@ -55,7 +55,7 @@ Sample PlainSample(const LineSums& sums, int line, std::ptrdiff_t at) {
   const Contribution& of = *sums.Of[line];
   double sum = 0.0;
   for (std::int32_t t = 0; t < of.Count; ++t)
-    sum += double(of.Entries[t].Weight) * double(sums.Rows[of.Entries[t].Pixel - sums.FirstRow][at]);
+    sum += double(of.Entries[t].Weight) * double(sums.Rows[of.PixelAt(t) - sums.FirstRow][at]);
   return ExactQuotient(sum, of.Sum);
 }
 
@@ -64,7 +64,7 @@ void SumPlainLine(const LineSums& sums, int line) {
   for (std::ptrdiff_t i = 0; i < sums.Samples; i += ExactTile) {
     ExactSums exact(int(std::min<std::ptrdiff_t>(ExactTile, sums.Samples - i)));
     for (std::int32_t t = 0; t < of.Count; ++t)
-      exact.Add(sums.Rows[of.Entries[t].Pixel - sums.FirstRow] + i, of.Entries[t].Weight);
+      exact.Add(sums.Rows[of.PixelAt(t) - sums.FirstRow] + i, of.Entries[t].Weight);
     exact.Store(of.Sum, sums.Into[line] + i);
   }
 }

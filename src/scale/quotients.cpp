@@ -124,7 +124,7 @@ bool MakeFloat(const Contribution& line, float* shares, std::int32_t firstRow, i
   made = {0.0F, 0.0F};
   if (line.Count == 0) return true;
   if (CopiesOneLine(line)) {
-    shares[std::ptrdiff_t{line.Entries[0].Pixel - firstRow} * stride] = 1.0F;
+    shares[std::ptrdiff_t{line.First - firstRow} * stride] = 1.0F;
     return true;
   }
   if (!(line.Sum > 0.0F)) return false;
@@ -132,7 +132,7 @@ bool MakeFloat(const Contribution& line, float* shares, std::int32_t firstRow, i
   for (std::int32_t i = 0; i < line.Count; ++i) {
     const double exact = double(line.Entries[i].Weight) / line.Sum;
     const auto share = float(exact);
-    shares[std::ptrdiff_t{line.Entries[i].Pixel - firstRow} * stride] = share;
+    shares[std::ptrdiff_t{line.PixelAt(i) - firstRow} * stride] = share;
     sizes.Add(share, exact);
   }
   // A product and a sum an entry round by 2^-24 of what they give at most; N. J. Higham, "Accuracy and

@@ -16,7 +16,7 @@ void PlainLine(const ScaleContext& context, const Contribution& line, std::int32
                count = std::int32_t(std::min<std::int64_t>(tile, left));
     ExactSums sums(count * bytes);
     for (std::int32_t t = 0; t < line.Count; ++t)
-      WithRow(*context.Temp, line.Entries[t].Pixel,
+      WithRow(*context.Temp, line.PixelAt(t),
               [&](const Sample* row) { sums.Add(row + std::ptrdiff_t{x} * bytes, line.Entries[t].Weight); });
     Sample samples[ExactTile];
     sums.Store(line.Sum, samples);
