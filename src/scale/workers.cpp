@@ -86,8 +86,8 @@ int SlotCount(std::int32_t threads) {
 void Release(WorkerSlot& slot) {
   pthread_mutex_lock(&slot.Mutex);
   slot.Pending = true;
-  pthread_cond_signal(&slot.Wake);
   pthread_mutex_unlock(&slot.Mutex);
+  pthread_cond_signal(&slot.Wake);
 }
 
 /// Waits a millisecond for a slice, at the most. True when it is done.
