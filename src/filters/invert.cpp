@@ -11,6 +11,13 @@ namespace {
 void Flip(Sample* bytes, const Sample* bits, std::ptrdiff_t count) {
   for (std::ptrdiff_t i = 0; i < count; ++i) bytes[i] = Sample(bytes[i] ^ bits[i]);
 }
+/// From the start of a cache line on, so that no vector lies in two.
+void FlipAll(Sample* bytes, std::ptrdiff_t count) {
+  constexpr Word line = 64;
+  const std::ptrdiff_t before = std::min(std::ptrdiff_t(-reinterpret_cast<Word>(bytes) % line), count);
+  for (std::ptrdiff_t i = 0; i < before; ++i) bytes[i] = Sample(~bytes[i]);
+  for (std::ptrdiff_t i = before; i < count; ++i) bytes[i] = Sample(~bytes[i]);
+}
 
 }
 
@@ -23,6 +30,12 @@ void Invert(PictureZOR* self, Integer x, Integer y, Integer w, Integer h) {
   const PlaneList planes = PlanesOf(GroupOf(picture), picture, part.X);
   if (planes.Count == 0) return;
   const RowBytes bytes(planes, part.Width);
+  if (FillPixels(planes)) {
+    Walk(Yielding(Into(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
+      OnBestTarget<FlipAll>(row + bytes.First, bytes.Count);
+    });
+    return;
+  }
   // 255 - v is v with all bits flipped; the bytes between the planes have none flipped.
   const BytePattern bits = bytes.Mask();
   Walk(Yielding(Into(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
