@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <cstring>
 #include <limits>
 
@@ -26,6 +27,7 @@ class BlockCopy {
 
   /// Between pictures that share no samples.
   bool Straight() {
+    if (const std::int32_t most = RowsWithoutGaps(); most > 1) return InRuns(most);
     return Walk(From(Source, Of.SourceY), Yielding(Into(Dest, Of.Dest.Y)))
         .Rows(Of.Dest.Height,
               [&](std::int32_t, const Sample* from, Sample* into) { ConvertRow(from, into); });
@@ -61,6 +63,26 @@ class BlockCopy {
   }
 
  private:
+  /// How many rows are one long row in either picture; 1 where they aren't, or somebody waits for each row.
+  std::int32_t RowsWithoutGaps() const {
+    const auto isWhole = [&](const PictureData& picture) {
+      return std::int64_t{Of.Dest.Width} * picture.PixelSize == picture.RowSize && !IsMirrored(picture);
+    };
+    if (!isWhole(Source) || !isWhole(Dest) || Dest.YieldTicks > 0) return 1;
+    constexpr std::int32_t mostPixels = 1 << 28;
+    return std::min({RowsAtOnce(Source), RowsAtOnce(Dest), mostPixels / Of.Dest.Width});
+  }
+  bool InRuns(std::int32_t most) {
+    bool reached = true;
+    for (std::int32_t y = 0, rows = 0; reached && y < Of.Dest.Height; y += rows) {
+      rows = std::min(most, Of.Dest.Height - y);
+      reached = WithRows({Source, Of.SourceY + y, rows}, {Dest, Of.Dest.Y + y, rows},
+                         [&](const RowRun& from, const RowRun& into) {
+                           Convert(from.First, into.First, Of.Dest.Width * rows);
+                         });
+    }
+    return reached;
+  }
   void ConvertRow(const Sample* from, Sample* into) const {
     Convert(from + std::ptrdiff_t(Of.SourceX) * Source.PixelSize,
             into + std::ptrdiff_t(Of.Dest.X) * Dest.PixelSize, Of.Dest.Width);

@@ -69,6 +69,22 @@ TEST(CopyPixels, IsTheSameWithEveryInstructionSet) {
     }
 }
 
+// As wide as a page, so that rows of mapped pictures have no gaps either.
+TEST(CopyPixels, TakesRowsWithoutGapsTogether) {
+  constexpr int Width = 4096, Height = 12;
+  const Picture source(Width, Height, Format::G);
+  FillWithNoise(source, 53);
+  for (const Picture& from : {source, source.MirroredView()})
+    for (const Format into : {Format::G, Format::RGBX})
+      ForEveryStore(Width, Height, into, [&](const Picture& dest) {
+        SetPacked(dest, Noise(54).Many(std::size_t(Width * Height * dest.PixelSize())));
+        PlainPicture wanted(dest);
+        CopyPlain(wanted, PlainPicture(from), {0, 3, Width, 8}, 0, 1);
+        EXPECT_TRUE(dest.CopyPixels(from, {0, 3, Width, 8}, 0, 1));
+        EXPECT_TRUE(Packed(dest) == wanted.Pixels);
+      });
+}
+
 /// A view of a picture, or the picture.
 Picture AnyView(Noise& noise, const Picture& picture) {
   Picture view = picture;
