@@ -30,17 +30,14 @@ void Invert(PictureZOR* self, Integer x, Integer y, Integer w, Integer h) {
   const PlaneList planes = PlanesOf(GroupOf(picture), picture, part.X);
   if (planes.Count == 0) return;
   const RowBytes bytes(planes, part.Width);
-  if (FillPixels(planes)) {
-    Walk(Yielding(Into(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
-      OnBestTarget<FlipAll>(row + bytes.First, bytes.Count);
-    });
-    return;
-  }
+  const bool all = FillPixels(planes);
   // 255 - v is v with all bits flipped; the bytes between the planes have none flipped.
   const BytePattern bits = bytes.Mask();
   Walk(Yielding(Into(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
+    Sample* const first = row + bytes.First;
+    if (all) return OnBestTarget<FlipAll>(first, bytes.Count);
     bits.Along(bytes.Count, [&](std::ptrdiff_t at, std::ptrdiff_t count, const Sample* flipped) {
-      OnBestTarget<Flip>(row + bytes.First + at, flipped, count);
+      OnBestTarget<Flip>(first + at, flipped, count);
     });
   });
 }
