@@ -105,7 +105,7 @@ class PlainStrips : public PlaneSource {
       if (got == 0) throw Failure(Path, "the TIFF file is cut off");
       done += std::size_t(got);
     }
-    if (Reversed && Of.Bits < 16) TIFFReverseBits(Line.data(), tmsize_t(Line.size()));
+    if (Reversed) TIFFReverseBits(Line.data(), tmsize_t(Line.size()));
     if (Of.Bits == 16 && TIFFIsByteSwapped(Header))
       TIFFSwabArrayOfShort(reinterpret_cast<std::uint16_t*>(Line.data()), tmsize_t(Line.size() / 2));
     return Line.data();

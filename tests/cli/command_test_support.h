@@ -50,8 +50,9 @@ struct TIFFExtras {
   /// Tiles of this edge, instead of strips.
   int Tile = 0;
   bool Planar = false, CMYK = false, Premultiplied = false;
-  /// 16 bits: each sample v stands as v * 257 + shift.
+  /// 16 bits: each sample v stands as v * 257 + shift. Below 8, its upper bits.
   int Bits = 8, Shift = 0;
+  int FillOrder = 1;
   /// libtiff's: "w", "wb" big-endian, "wl" little-endian, "w8" BigTIFF.
   std::string Mode = "w";
   float DensityPerInch = 0;

@@ -105,6 +105,7 @@ void WriteTIFF(const std::filesystem::path& file, const Raster& raster, const TI
   TIFFSetField(tiff, TIFFTAG_PLANARCONFIG, extras.Planar ? PLANARCONFIG_SEPARATE : PLANARCONFIG_CONTIG);
   TIFFSetField(tiff, TIFFTAG_ORIENTATION, extras.Orientation);
   TIFFSetField(tiff, TIFFTAG_COMPRESSION, extras.Compression);
+  TIFFSetField(tiff, TIFFTAG_FILLORDER, extras.FillOrder);
   if (extras.Tile) {
     TIFFSetField(tiff, TIFFTAG_TILEWIDTH, extras.Tile);
     TIFFSetField(tiff, TIFFTAG_TILELENGTH, extras.Tile);
@@ -122,26 +123,28 @@ void WriteTIFF(const std::filesystem::path& file, const Raster& raster, const TI
   }
   if (!extras.Profile.empty())
     TIFFSetField(tiff, TIFFTAG_ICCPROFILE, unsigned(extras.Profile.size()), extras.Profile.data());
-  const int planes = extras.Planar ? channels : 1, together = channels / planes, size = extras.Bits / 8;
+  const int planes = extras.Planar ? channels : 1, together = channels / planes, bits = extras.Bits;
+  const int edge = extras.Tile ? extras.Tile : raster.Width, rows = extras.Tile ? extras.Tile : 1;
+  const auto rowBytes = std::size_t(edge * together * bits + 7) / 8;
+  Bytes block(rowBytes * std::size_t(rows));
   // A run of samples of one plane, as the file holds it.
-  const auto put = [&](std::uint8_t* out, int x, int y, int c) {
+  const auto put = [&](std::uint8_t* row, int at, int x, int y, int c) {
     if (x >= raster.Width || y >= raster.Height) return;
     const int v = raster.Samples[std::size_t((y * raster.Width + x) * channels + c)];
     const auto wide = std::uint16_t(v * 257 + extras.Shift);
-    if (size == 2)
-      std::memcpy(out, &wide, 2);
+    if (bits == 16)
+      std::memcpy(row + 2 * at, &wide, 2);
     else
-      *out = std::uint8_t(v);
+      row[at * bits / 8] |= std::uint8_t(v >> (8 - bits) << (8 - bits - at * bits % 8));
   };
-  const int edge = extras.Tile ? extras.Tile : raster.Width, rows = extras.Tile ? extras.Tile : 1;
-  Bytes block(std::size_t(edge * rows * together * size));
   for (int plane = 0; plane < planes; ++plane)
     for (int top = 0; top < raster.Height; top += rows)
       for (int left = 0; left < raster.Width; left += edge) {
+        std::ranges::fill(block, 0);
         for (int y = 0; y < rows; ++y)
           for (int x = 0; x < edge; ++x)
             for (int c = 0; c < together; ++c)
-              put(&block[std::size_t(((y * edge + x) * together + c) * size)], left + x, top + y, plane + c);
+              put(&block[std::size_t(y) * rowBytes], x * together + c, left + x, top + y, plane + c);
         if (extras.Tile)
           TIFFWriteTile(tiff, block.data(), std::uint32_t(left), std::uint32_t(top), 0, std::uint16_t(plane));
         else
