@@ -6,10 +6,8 @@
 #include <cstdlib>
 #include <new>
 
-#include "failure.h"
 #include "picturezor/host.h"
 #include "session.h"
-#include "temporary_files.h"
 
 namespace picturezor::cli {
 
@@ -63,7 +61,7 @@ int Run(int count, char** arguments) {
   }
   try {
     if (!session.Quiet) session.Bar.Enable();
-    CatchSignals();
+    CatchSignals(Failed);
     Host::Load(ModulePath());
     const int code = session.Work();
     session.Bar.Clear();

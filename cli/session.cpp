@@ -6,9 +6,6 @@
 #include <cstdio>
 #include <map>
 
-#include "failure.h"
-#include "temporary_files.h"
-
 namespace picturezor::cli {
 
 void Session::Note(const std::filesystem::path& file, const std::string& text) {
@@ -49,7 +46,9 @@ void AddQualityOption(CLI::App& command, Session& session) {
 }
 
 OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
-    : File(file), Reader(OpenImage(file, session.Stores.MemoryLimit)), Upright(cli::Upright(Reader->Info())) {
+    : File(file),
+      Reader(OpenImage(file, {session.Stores.MemoryLimit})),
+      Upright(files::Upright(Reader->Info())) {
   for (const std::string& note : Upright.Notes) session.Note(file, note);
 }
 
@@ -58,7 +57,7 @@ Target::~Target() = default;
 
 Format Target::Storable(Session& session, Format pixels) const {
   const Format format = StorableFormat(File, Type, pixels);
-  if (format != pixels) session.Note(File, NameOf(Type) + " has no alpha, it is left out");
+  if (format != pixels) session.Note(File, std::string(Type.Name) + " has no alpha, it is left out");
   return format;
 }
 
@@ -72,7 +71,7 @@ void Target::Write(Session& session, const Picture& picture, Format format, Imag
   info.Height = picture.Height();
   info.Pixels = format;
   if (!ProfileFits(info.Profile, format)) info.Profile.clear();
-  const auto writer = CreateImage(Output->Descriptor(), File, Type, info, session.Writing);
+  const auto writer = Type.Create(Output->Descriptor(), File, info, session.Writing);
   WriteFrom(picture, *writer, format, session.Bar);
   writer->Finish();
 }

@@ -5,9 +5,11 @@
 #include <string>
 #include <vector>
 
-#include "codecs/image_file.h"
+#include "failure.h"
+#include "image_file.h"
 #include "pictures.h"
-#include "progress.h"
+#include "progress_bar.h"
+#include "temporary_files.h"
 
 namespace CLI {
 class App;
@@ -15,13 +17,18 @@ class App;
 
 namespace picturezor::cli {
 
+using namespace files;
+
+/// What a script reads off; after a signal the shell gives 128 and its number.
+enum ExitCode : int { Done = 0, Different = 1, Failed = 2, WrongUsage = 3 };
+
 /// What all commands share: the options that several of them have, and the ways to the person at the other
 /// end.
 struct Session {
   bool Quiet = false;
   StoreOptions Stores;
   WriteOptions Writing;
-  Progress Bar;
+  ProgressBar Bar;
   /// What the chosen command does; gives its exit code.
   std::function<int()> Work;
 
@@ -44,7 +51,7 @@ struct OpenedImage {
   OpenedImage(Session& session, const std::filesystem::path& file);
   PictureSize Size() const { return {Upright.Width, Upright.Height, Upright.Pixels}; }
   /// Reads all of it, once.
-  void ReadInto(Session& session, const Picture& picture) { cli::ReadInto(picture, *Reader, session.Bar); }
+  void ReadInto(Session& session, const Picture& picture) { files::ReadInto(picture, *Reader, session.Bar); }
 };
 
 /// The file that a command writes. Made before the work, so that one that can't be written shows early.
@@ -64,8 +71,8 @@ class Target {
 
  private:
   std::filesystem::path File;
-  FileType Type;
-  std::unique_ptr<class OutputFile> Output;
+  const FileType& Type;
+  std::unique_ptr<OutputFile> Output;
 };
 
 /// "256M", "1.5G" or a plain number of bytes. Throws UsageFailure.

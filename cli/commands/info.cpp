@@ -16,11 +16,11 @@ std::string ProfileText(const Bytes& profile) {
 }
 
 int Info(Session& session, const std::filesystem::path& file) {
-  const auto reader = OpenImage(file, session.Stores.MemoryLimit);
+  const auto reader = OpenImage(file, {session.Stores.MemoryLimit});
   const ImageInfo& stored = reader->Info();
   const ImageInfo upright = Upright(stored);
   std::printf("file:        %s\n", file.c_str());
-  std::printf("type:        %s\n", NameOf(reader->Type()).c_str());
+  std::printf("type:        %s\n", reader->Type().Name);
   std::printf("size:        %d x %d\n", upright.Width, upright.Height);
   std::printf("pixels:      %s\n", Describe(stored.Pixels).c_str());
   std::printf("bits:        %d a sample\n", stored.Bits);

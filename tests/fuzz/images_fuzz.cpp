@@ -4,18 +4,18 @@
 #include <cstdlib>
 #include <string>
 
-#include "codecs/image_file.h"
 #include "failure.h"
+#include "image_file.h"
 
 // The readers of the command: any file is read to its end or refused with one line.
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  using namespace picturezor::cli;
+  using namespace picturezor::files;
   constexpr std::int64_t memoryLimit = 16 << 20, mostRows = 512;
   static const int file = memfd_create("image", 0);
   if (ftruncate(file, 0) != 0 || pwrite(file, data, size, 0) != ssize_t(size)) std::abort();
   try {
-    const auto reader = OpenImage("/proc/self/fd/" + std::to_string(file), memoryLimit);
+    const auto reader = OpenImage("/proc/self/fd/" + std::to_string(file), {memoryLimit});
     const ImageInfo& info = reader->Info();
     const std::int64_t bytes = std::int64_t{info.Width} * ChannelsOf(info.Pixels);
     if (info.Width < 1 || info.Height < 1 || ChannelsOf(info.Pixels) < 1) std::abort();

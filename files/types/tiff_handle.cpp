@@ -1,4 +1,4 @@
-#include "codecs/tiff_handle.h"
+#include "tiff_handle.h"
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -10,7 +10,7 @@
 
 #include "failure.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 namespace {
 

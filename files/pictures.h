@@ -3,11 +3,11 @@
 #include <filesystem>
 #include <vector>
 
-#include "codecs/image_file.h"
+#include "image_file.h"
 #include "picturezor/picture.h"
 #include "progress.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 enum class Store { Auto, Memory, Mapped };
 

@@ -1,4 +1,4 @@
-#include "progress.h"
+#include "progress_bar.h"
 
 #include <unistd.h>
 
@@ -10,16 +10,16 @@ namespace picturezor::cli {
 
 using namespace std::chrono_literals;
 
-void Progress::Enable() { Enabled = isatty(STDERR_FILENO); }
+void ProgressBar::Enable() { Enabled = isatty(STDERR_FILENO); }
 
-void Progress::Begin(std::string stage, std::int64_t steps) {
-  Stage = std::move(stage);
+void ProgressBar::Begin(const std::string& stage, std::int64_t steps) {
+  Stage = stage;
   Whole = steps;
   Steps = 0;
   StageStarted = Clock::now();
 }
 
-void Progress::Tick() {
+void ProgressBar::Tick() {
   if (!Enabled) return;
   const auto now = Clock::now();
   if (now - Started < 1s || now - LastDrawn < 100ms) return;
@@ -41,7 +41,7 @@ void Progress::Tick() {
   std::fflush(stderr);
 }
 
-void Progress::Clear() {
+void ProgressBar::Clear() {
   if (!std::exchange(Drawn, false)) return;
   std::fputs("\r\x1b[K", stderr);
   std::fflush(stderr);

@@ -4,12 +4,12 @@
 #include <cmath>
 #include <cstring>
 
-#include "codecs/exif.h"
-#include "codecs/image_file.h"
-#include "codecs/stream.h"
+#include "exif.h"
 #include "failure.h"
+#include "file_types.h"
+#include "stream.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 namespace {
 
@@ -69,7 +69,7 @@ class PNGReader : public ImageReader, PNGFile {
   }
   ~PNGReader() override { png_destroy_read_struct(&Png, &Header, nullptr); }
 
-  FileType Type() const override { return FileType::PNG; }
+  const FileType& Type() const override { return PNGType; }
 
   void ReadRow(std::uint8_t* row) override {
     const std::size_t size = std::size_t(About.Width) * ChannelsOf(About.Pixels);
@@ -209,13 +209,18 @@ class PNGWriter : public ImageWriter, PNGFile {
 
 }
 
-std::unique_ptr<ImageReader> OpenPNG(const std::filesystem::path& file, std::int64_t memoryLimit) {
-  return std::make_unique<PNGReader>(file, memoryLimit);
-}
-
-std::unique_ptr<ImageWriter> CreatePNG(int descriptor, const std::filesystem::path& target,
-                                       const ImageInfo& info) {
-  return std::make_unique<PNGWriter>(descriptor, target, info);
-}
+const FileType PNGType{
+    .Name = "PNG",
+    .Extensions = {".png"},
+    .Holds = {Format::G, Format::GA, Format::RGB, Format::RGBA},
+    .MostEdge = INT32_MAX,
+    .Begins = [](std::span<const std::uint8_t> start) { return StartsWith(start, "\x89PNG"); },
+    .Open = [](const std::filesystem::path& file, const ReadOptions& options)
+        -> std::unique_ptr<ImageReader> { return std::make_unique<PNGReader>(file, options.MemoryLimit); },
+    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
+                 const WriteOptions&) -> std::unique_ptr<ImageWriter> {
+      return std::make_unique<PNGWriter>(descriptor, target, info);
+    },
+};
 
 }

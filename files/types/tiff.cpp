@@ -4,13 +4,13 @@
 #include <cerrno>
 #include <cstring>
 
-#include "codecs/exif.h"
-#include "codecs/image_file.h"
-#include "codecs/stream.h"
-#include "codecs/tiff_handle.h"
+#include "exif.h"
 #include "failure.h"
+#include "file_types.h"
+#include "stream.h"
+#include "tiff_handle.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 namespace {
 
@@ -200,7 +200,7 @@ class TIFFReader : public ImageReader {
     Lines.resize(Sources.size());
   }
 
-  FileType Type() const override { return FileType::TIFF; }
+  const FileType& Type() const override { return TIFFType; }
 
   void ReadRow(std::uint8_t* row) override {
     for (std::size_t i = 0; i < Sources.size(); ++i)
@@ -431,13 +431,24 @@ class TIFFWriter : public ImageWriter {
 
 }
 
-std::unique_ptr<ImageReader> OpenTIFF(const std::filesystem::path& file, std::int64_t memoryLimit) {
-  return std::make_unique<TIFFReader>(file, memoryLimit);
-}
-
-std::unique_ptr<ImageWriter> CreateTIFF(int descriptor, const std::filesystem::path& target,
-                                        const ImageInfo& info) {
-  return std::make_unique<TIFFWriter>(descriptor, target, info);
-}
+const FileType TIFFType{
+    .Name = "TIFF",
+    .Extensions = {".tif", ".tiff"},
+    .Holds = {Format::G, Format::GA, Format::RGB, Format::RGBA, Format::CMYK, Format::CMYKA},
+    .MostEdge = INT32_MAX,
+    .Begins =
+        [](std::span<const std::uint8_t> start) {
+          using namespace std::string_view_literals;
+          for (const auto magic : {"II*\0"sv, "MM\0*"sv, "II+\0"sv, "MM\0+"sv})
+            if (StartsWith(start, magic)) return true;
+          return false;
+        },
+    .Open = [](const std::filesystem::path& file, const ReadOptions& options)
+        -> std::unique_ptr<ImageReader> { return std::make_unique<TIFFReader>(file, options.MemoryLimit); },
+    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
+                 const WriteOptions&) -> std::unique_ptr<ImageWriter> {
+      return std::make_unique<TIFFWriter>(descriptor, target, info);
+    },
+};
 
 }

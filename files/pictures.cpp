@@ -14,7 +14,7 @@
 #include "failure.h"
 #include "temporary_files.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 namespace {
 

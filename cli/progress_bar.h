@@ -1,28 +1,27 @@
 #pragma once
 #include <chrono>
-#include <cstdint>
 #include <string>
+
+#include "progress.h"
 
 namespace picturezor::cli {
 
 /// A bar on the terminal's standard error, for work that takes more than a second; nothing elsewhere.
-class Progress {
+class ProgressBar final : public files::Progress {
  public:
-  Progress() = default;
-  Progress(const Progress&) = delete;
-  ~Progress() { Clear(); }
+  ProgressBar() = default;
+  ProgressBar(const ProgressBar&) = delete;
+  ~ProgressBar() override { Clear(); }
 
   /// Shows bars from now on, if standard error is a terminal.
   void Enable();
   bool Shown() const { return Enabled; }
-  /// Starts a stage of so many steps; 0 where nobody can tell.
-  void Begin(std::string stage, std::int64_t steps = 0);
-  void Step() {
-    ++Steps;
+  void Begin(const std::string& stage, std::int64_t steps = 0) override;
+  void Step(std::int64_t steps = 1) override {
+    Steps += steps;
     if (Enabled) Tick();
   }
-  /// The work goes on.
-  void Tick();
+  void Tick() override;
   /// Takes the bar off the line, for other text.
   void Clear();
 

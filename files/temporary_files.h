@@ -2,12 +2,12 @@
 #include <filesystem>
 #include <string>
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 /// From now on a signal that ends the program takes along the files named to RemoveOnDeath; the program then
-/// dies by that signal. A full disk under a mapped file, which comes as a signal, ends it with ExitCode
-/// Failed and a line on stderr.
-void CatchSignals();
+/// dies by that signal. A full disk under a mapped file, which comes as a signal too, ends it with `exitCode`
+/// and a line on stderr.
+void CatchSignals(int exitCode);
 void RemoveOnDeath(const std::filesystem::path& file, bool directory = false);
 void KeepOnDeath(const std::filesystem::path& file);
 

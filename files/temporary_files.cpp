@@ -15,7 +15,7 @@
 
 #include "failure.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 namespace {
 
@@ -45,11 +45,13 @@ void DieBySignal(int signal) {
   raise(signal);
 }
 
+int CodeOfFullDisk = 1;
+
 void DieOfFullDisk(int) {
   RemoveDoomed();
   constexpr char line[] = "picturezor: no space left for the temporary file, or an input file was cut off\n";
-  if (write(STDERR_FILENO, line, sizeof line - 1) < 0) _exit(Failed);
-  _exit(Failed);
+  if (write(STDERR_FILENO, line, sizeof line - 1) < 0) _exit(CodeOfFullDisk);
+  _exit(CodeOfFullDisk);
 }
 
 /// No signal comes between making a file and naming it.
@@ -69,7 +71,8 @@ class SignalsHeldBack {
 
 }
 
-void CatchSignals() {
+void CatchSignals(int exitCode) {
+  CodeOfFullDisk = exitCode;
   struct sigaction action {};
   action.sa_handler = DieBySignal;
   action.sa_flags = SA_RESETHAND;

@@ -1,83 +1,74 @@
-#include "codecs/image_file.h"
+#include "image_file.h"
 
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
 
-#include "codecs/stream.h"
 #include "failure.h"
+#include "stream.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 namespace {
 
 /// Beyond this a row of five samples a pixel would pass 2 GB.
 constexpr std::int64_t MaxEdge = 400'000'000;
 
+std::string Listed(const std::vector<std::string>& words) {
+  std::string text;
+  for (std::size_t i = 0; i < words.size(); ++i)
+    text += (i == 0 ? "" : i + 1 == words.size() ? " or " : ", ") + words[i];
+  return text;
+}
+
+}
+
 bool StartsWith(std::span<const std::uint8_t> bytes, std::string_view magic) {
   return bytes.size() >= magic.size() && std::memcmp(bytes.data(), magic.data(), magic.size()) == 0;
 }
 
-}
-
-std::string NameOf(FileType type) {
-  switch (type) {
-    case FileType::PNG: return "PNG";
-    case FileType::JPEG: return "JPEG";
-    case FileType::TIFF: return "TIFF";
-  }
-  return {};
-}
-
-std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, std::int64_t memoryLimit) {
-  Bytes start(8);
+std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, const ReadOptions& options) {
+  Bytes start(64);
   {
     const Stream stream = OpenForReading(file);
     start.resize(std::fread(start.data(), 1, start.size(), stream.get()));
     if (std::ferror(stream.get())) throw Failure(file, std::strerror(errno));
   }
   if (start.empty()) throw Failure(file, "the file is empty");
-  using namespace std::string_view_literals;
-  if (StartsWith(start, "\x89PNG"sv)) return OpenPNG(file, memoryLimit);
-  if (StartsWith(start, "\xFF\xD8"sv)) return OpenJPEG(file, memoryLimit);
-  for (const auto magic : {"II*\0"sv, "MM\0*"sv, "II+\0"sv, "MM\0+"sv})
-    if (StartsWith(start, magic)) return OpenTIFF(file, memoryLimit);
-  throw Failure(file, "not a PNG, JPEG or TIFF image");
+  std::vector<std::string> names;
+  for (const FileType* type : FileTypes()) {
+    if (type->Begins(start)) return type->Open(file, options);
+    names.emplace_back(type->Name);
+  }
+  throw Failure(file, "not a " + Listed(names) + " image");
 }
 
-FileType TypeByExtension(const std::filesystem::path& file) {
+const FileType& TypeByExtension(const std::filesystem::path& file) {
   std::string extension = file.extension().string();
   std::ranges::transform(extension, extension.begin(),
                          [](unsigned char c) { return c >= 'A' && c <= 'Z' ? c + 32 : c; });
-  if (extension == ".png") return FileType::PNG;
-  if (extension == ".jpg" || extension == ".jpeg" || extension == ".jpe") return FileType::JPEG;
-  if (extension == ".tif" || extension == ".tiff") return FileType::TIFF;
-  throw UsageFailure(file, "the name must end in .png, .jpg, .jpeg, .tif or .tiff");
+  std::vector<std::string> endings;
+  for (const FileType* type : FileTypes())
+    for (const std::string_view ending : type->Extensions) {
+      if (extension == ending) return *type;
+      endings.emplace_back(ending);
+    }
+  throw UsageFailure(file, "the name must end in " + Listed(endings));
 }
 
-Format StorableFormat(const std::filesystem::path& file, FileType type, Format pixels) {
-  const bool cmyk = WithoutAlpha(pixels) == Format::CMYK;
-  if (type == FileType::PNG && cmyk) throw Failure(file, "PNG can't hold CMYK; write a .tif or .jpg");
-  return type == FileType::JPEG ? WithoutAlpha(pixels) : pixels;
+Format StorableFormat(const std::filesystem::path& file, const FileType& type, Format pixels) {
+  for (const Format format : {pixels, WithoutAlpha(pixels)})
+    if (std::ranges::find(type.Holds, format) != type.Holds.end()) return format;
+  throw Failure(file, std::string(type.Name) + " can't hold " + Describe(pixels) + "; write a .tif or .jpg");
 }
 
-void RequireStorableSize(const std::filesystem::path& file, FileType type, std::int64_t width,
+void RequireStorableSize(const std::filesystem::path& file, const FileType& type, std::int64_t width,
                          std::int64_t height) {
-  const std::int64_t edge = type == FileType::JPEG ? 65500 : MaxEdge;
+  const std::int64_t edge = std::min(type.MostEdge, MaxEdge);
   if (width > edge || height > edge)
     throw Failure(file, std::to_string(width) + " x " + std::to_string(height) + " pixels are too many: " +
-                            NameOf(type) + " goes up to " + std::to_string(edge) + " in each direction");
-}
-
-std::unique_ptr<ImageWriter> CreateImage(int descriptor, const std::filesystem::path& target, FileType type,
-                                         const ImageInfo& info, const WriteOptions& options) {
-  switch (type) {
-    case FileType::PNG: return CreatePNG(descriptor, target, info);
-    case FileType::JPEG: return CreateJPEG(descriptor, target, info, options);
-    case FileType::TIFF: return CreateTIFF(descriptor, target, info);
-  }
-  return nullptr;
+                            type.Name + " goes up to " + std::to_string(edge) + " in each direction");
 }
 
 int ChannelsOf(Format format) { return BytesPerPixel(format); }

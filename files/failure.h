@@ -3,9 +3,9 @@
 #include <stdexcept>
 #include <string>
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
-/// What keeps the command from doing its work, in one line for a person.
+/// What keeps some work from being done, in one line for a person.
 class Failure : public std::runtime_error {
  public:
   using std::runtime_error::runtime_error;
@@ -13,13 +13,10 @@ class Failure : public std::runtime_error {
       : std::runtime_error(file.string() + ": " + reason) {}
 };
 
-/// The command line by itself is wrong.
+/// What was asked for is wrong by itself, whatever the image.
 class UsageFailure : public Failure {
  public:
   using Failure::Failure;
 };
-
-/// What a script reads off; after a signal the shell gives 128 and its number.
-enum ExitCode : int { Done = 0, Different = 1, Failed = 2, WrongUsage = 3 };
 
 }

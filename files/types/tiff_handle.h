@@ -6,7 +6,7 @@
 #include <memory>
 #include <string>
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 /// An open TIFF with what libtiff has to say of it, which becomes Failures.
 class TIFFHandle {

@@ -2,9 +2,9 @@
 #include <optional>
 #include <span>
 
-#include "codecs/image_file.h"
+#include "image_file.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 /// What of a camera's notes matters here.
 struct Exif {

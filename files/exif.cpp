@@ -1,6 +1,6 @@
-#include "codecs/exif.h"
+#include "exif.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 namespace {
 

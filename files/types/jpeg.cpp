@@ -11,12 +11,12 @@
 #include <csetjmp>
 #include <cstring>
 
-#include "codecs/exif.h"
-#include "codecs/image_file.h"
-#include "codecs/stream.h"
+#include "exif.h"
 #include "failure.h"
+#include "file_types.h"
+#include "stream.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 namespace {
 
@@ -83,7 +83,7 @@ class JPEGReader : public ImageReader {
   }
   ~JPEGReader() override { jpeg_destroy_decompress(&Jpeg); }
 
-  FileType Type() const override { return FileType::JPEG; }
+  const FileType& Type() const override { return JPEGType; }
 
   void ReadRow(std::uint8_t* row) override {
     Try([&] { jpeg_read_scanlines(&Jpeg, &row, 1); });
@@ -259,13 +259,18 @@ class JPEGWriter : public ImageWriter {
 
 }
 
-std::unique_ptr<ImageReader> OpenJPEG(const std::filesystem::path& file, std::int64_t memoryLimit) {
-  return std::make_unique<JPEGReader>(file, memoryLimit);
-}
-
-std::unique_ptr<ImageWriter> CreateJPEG(int descriptor, const std::filesystem::path& target,
-                                        const ImageInfo& info, const WriteOptions& options) {
-  return std::make_unique<JPEGWriter>(descriptor, target, info, options);
-}
+const FileType JPEGType{
+    .Name = "JPEG",
+    .Extensions = {".jpg", ".jpeg", ".jpe"},
+    .Holds = {Format::G, Format::RGB, Format::CMYK},
+    .MostEdge = 65500,
+    .Begins = [](std::span<const std::uint8_t> start) { return StartsWith(start, "\xFF\xD8"); },
+    .Open = [](const std::filesystem::path& file, const ReadOptions& options)
+        -> std::unique_ptr<ImageReader> { return std::make_unique<JPEGReader>(file, options.MemoryLimit); },
+    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
+                 const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
+      return std::make_unique<JPEGWriter>(descriptor, target, info, options);
+    },
+};
 
 }

@@ -1,4 +1,4 @@
-#include "codecs/stream.h"
+#include "stream.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -9,7 +9,7 @@
 
 #include "failure.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 Stream OpenForReading(const std::filesystem::path& file) {
   // Without O_NONBLOCK a pipe would wait for its writer.

@@ -5,14 +5,14 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "picturezor/picture.h"
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
-enum class FileType { PNG, JPEG, TIFF };
-std::string NameOf(FileType type);
+struct FileType;
 
 /// Pixels per inch.
 struct Resolution {
@@ -41,7 +41,7 @@ class ImageReader {
  public:
   virtual ~ImageReader() = default;
   const ImageInfo& Info() const { return About; }
-  virtual FileType Type() const = 0;
+  virtual const FileType& Type() const = 0;
   /// The next row, packed pixels of Info().Pixels. To be called Info().Height times.
   virtual void ReadRow(std::uint8_t* row) = 0;
   /// To be called after the last row: reads what stands behind the pixels, so that a file which is cut off
@@ -61,29 +61,47 @@ class ImageWriter {
   virtual void Finish() = 0;
 };
 
+struct ReadOptions {
+  /// Bytes that a file may need for itself beside one row (interlaced PNG, progressive JPEG, large tiles).
+  std::int64_t MemoryLimit = 0;
+};
+
 struct WriteOptions {
   /// 1 to 100, for JPEG. From 90 on colours are kept at full resolution.
   int Quality = 90;
 };
 
+/// A type of image files: a row of the list in file_types.cpp, standing in the file of its reader and writer.
+struct FileType {
+  const char* Name;
+  /// Endings of names, in small letters, the usual one first.
+  std::vector<std::string_view> Extensions;
+  /// The pixel formats that its files hold, and the most pixels in each direction.
+  std::vector<Format> Holds;
+  std::int64_t MostEdge;
+  /// Told by the first bytes of a file, as many of them as there are, 64 at most.
+  bool (*Begins)(std::span<const std::uint8_t> start);
+  std::unique_ptr<ImageReader> (*Open)(const std::filesystem::path& file, const ReadOptions& options);
+  /// Starts a file at the beginning of `descriptor`, which stays the caller's. Of `info` the size, pixels,
+  /// profile and density count; the orientation is written as upright. `target` names it in failures.
+  std::unique_ptr<ImageWriter> (*Create)(int descriptor, const std::filesystem::path& target,
+                                         const ImageInfo& info, const WriteOptions& options);
+};
+
+/// All types. What they begin with is tried in this order.
+std::span<const FileType* const> FileTypes();
+
 /// Opens an image file of any of the types, told by its first bytes. A file whose size can't hold the pixels
-/// that it claims is refused before anything of their size is allocated; what a file needs for itself
-/// beside one row (interlaced PNG, progressive JPEG, large tiles) may take up to `memoryLimit` bytes.
-std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, std::int64_t memoryLimit);
+/// that it claims is refused before anything of their size is allocated.
+std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, const ReadOptions& options);
 
 /// The type that the file's extension stands for. Throws UsageFailure.
-FileType TypeByExtension(const std::filesystem::path& file);
+const FileType& TypeByExtension(const std::filesystem::path& file);
 /// The format nearest to `pixels` that a file of the type holds: JPEG has no alpha. Throws Failure where
 /// there is none, as for CMYK in PNG, or where the type can't hold a picture of that size.
-Format StorableFormat(const std::filesystem::path& file, FileType type, Format pixels);
-void RequireStorableSize(const std::filesystem::path& file, FileType type, std::int64_t width,
+Format StorableFormat(const std::filesystem::path& file, const FileType& type, Format pixels);
+void RequireStorableSize(const std::filesystem::path& file, const FileType& type, std::int64_t width,
                          std::int64_t height);
-
-/// Starts an image file at the beginning of `descriptor`, which stays the caller's. Of `info` the size,
-/// pixels, profile and density count; the orientation is written as upright. `target` names it in failures.
-/// A TIFF is compressed by LZW with a predictor, and is a BigTIFF where it might pass 4 GB.
-std::unique_ptr<ImageWriter> CreateImage(int descriptor, const std::filesystem::path& target, FileType type,
-                                         const ImageInfo& info, const WriteOptions& options);
 
 /// The channels of one of the six formats of files, alpha included, and whether alpha is among them.
 int ChannelsOf(Format format);
@@ -102,15 +120,6 @@ void RequirePlausible(const std::filesystem::path& file, std::int64_t width, std
                       std::int64_t fileSize, double pixelsPerByte);
 void RequireWithinLimit(const std::filesystem::path& file, std::int64_t bytes, std::int64_t memoryLimit,
                         const std::string& what);
-
-std::unique_ptr<ImageReader> OpenPNG(const std::filesystem::path& file, std::int64_t memoryLimit);
-std::unique_ptr<ImageReader> OpenJPEG(const std::filesystem::path& file, std::int64_t memoryLimit);
-std::unique_ptr<ImageReader> OpenTIFF(const std::filesystem::path& file, std::int64_t memoryLimit);
-std::unique_ptr<ImageWriter> CreatePNG(int descriptor, const std::filesystem::path& target,
-                                       const ImageInfo& info);
-std::unique_ptr<ImageWriter> CreateJPEG(int descriptor, const std::filesystem::path& target,
-                                        const ImageInfo& info, const WriteOptions& options);
-std::unique_ptr<ImageWriter> CreateTIFF(int descriptor, const std::filesystem::path& target,
-                                        const ImageInfo& info);
+bool StartsWith(std::span<const std::uint8_t> bytes, std::string_view magic);
 
 }

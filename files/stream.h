@@ -4,7 +4,7 @@
 #include <filesystem>
 #include <memory>
 
-namespace picturezor::cli {
+namespace picturezor::files {
 
 struct CloseStream {
   void operator()(std::FILE* stream) const { std::fclose(stream); }

@@ -1,13 +1,13 @@
 #include "picturezor/image_files.h"
 
-#include "codecs/image_file.h"
 #include "failure.h"
+#include "image_file.h"
 #include "pictures.h"
 #include "temporary_files.h"
 
 namespace picturezor {
 
-using namespace cli;
+using namespace files;
 
 namespace {
 
@@ -23,10 +23,10 @@ Format FileFormatOf(const std::filesystem::path& file, const Picture& picture) {
 
 Picture LoadImage(const std::filesystem::path& file) {
   const StoreOptions stores{Store::Auto, DefaultMemoryLimit(), DefaultTempDirectory()};
-  const auto reader = OpenImage(file, stores.MemoryLimit);
+  const auto reader = OpenImage(file, {stores.MemoryLimit});
   const ImageInfo upright = Upright(reader->Info());
   Picture picture = MakePictures(stores, {{upright.Width, upright.Height, upright.Pixels}})[0];
-  Progress silent;
+  Silence silent;
   ReadInto(picture, *reader, silent);
   return picture;
 }
@@ -39,14 +39,14 @@ HostPicture LoadHostPicture(const std::filesystem::path& file) {
 
 void SaveImage(const std::filesystem::path& file, const Picture& picture) {
   if (!picture.Valid()) throw Failure(file, "there is no picture to write");
-  const FileType type = TypeByExtension(file);
+  const FileType& type = TypeByExtension(file);
   ImageInfo info;
   info.Width = picture.Width();
   info.Height = picture.Height();
   info.Pixels = StorableFormat(file, type, FileFormatOf(file, picture));
   RequireStorableSize(file, type, info.Width, info.Height);
   OutputFile output(file);
-  const auto writer = CreateImage(output.Descriptor(), file, type, info, {});
+  const auto writer = type.Create(output.Descriptor(), file, info, {});
   for (std::int32_t y = 0; y < info.Height; ++y) {
     const Bytes row = picture.RowInFormat(y, info.Pixels);
     if (row.empty()) throw Failure(file, "a row of the picture can't be reached");

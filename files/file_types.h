@@ -1,0 +1,9 @@
+#pragma once
+#include "image_file.h"
+
+namespace picturezor::files {
+
+// Each stands in the file of its name under types/.
+extern const FileType PNGType, JPEGType, TIFFType;
+
+}

@@ -1,0 +1,52 @@
+#pragma once
+#include <cstdint>
+#include <optional>
+
+#include "image_file.h"
+#include "pictures.h"
+#include "picturezor/picture.h"
+
+namespace picturezor::flow {
+
+/// What is known of a picture before its samples.
+struct Shape {
+  std::int32_t Width = 0, Height = 0;
+  Format Of = Format::Unknown;
+  std::optional<files::Resolution> Density;
+};
+
+/// How the rows of a result come from those of the source.
+struct Dependence {
+  enum class Kind {
+    /// From anywhere: the source stands whole before the work begins.
+    Whole,
+    /// Row y of the result from the rows First + y - Reach to First + y + Reach of the source, as far as
+    /// there are
+    /// such, and from nothing else. Any band of rows can be worked on by itself then.
+    Bands,
+    /// The work reads the rows from top to bottom, once, but has to see the whole size: they may arrive while
+    /// it runs.
+    InOrder
+  };
+  Kind Of = Kind::Whole;
+  std::int32_t First = 0, Reach = 0;
+  /// The first row of a band is a multiple of this, where the work repeats itself from row to row.
+  std::int32_t Period = 1;
+};
+
+/// What a step does to a picture, its options known. It keeps nothing from call to call, so it may work on
+/// several threads at once, each with pictures of its own.
+class Operation {
+ public:
+  virtual ~Operation() = default;
+  /// What comes out of a picture. Throws files::Failure where the step isn't there for such a one.
+  virtual Shape Result(const Shape& source) const = 0;
+  virtual Dependence DependsOn(const Shape&) const { return {}; }
+  /// The pictures of the source's size that the work takes at a time, source and result included.
+  virtual int Pictures() const { return 2; }
+  /// The result of a whole picture, or of a band of rows with those in reach. In place where that can be: the
+  /// source may come back changed, and is lost otherwise. New pictures live where `stores` says.
+  virtual Picture Apply(Picture source, const files::StoreOptions& stores) const = 0;
+};
+
+}
