@@ -43,18 +43,28 @@ ColumnPlan::ColumnPlan(const ScaleContext& context, const ContributionTable& tab
     Reach = std::max(Reach, range.Last - range.First + 1);
   }
   Slots = Reach + (pass ? pass->RowsTogether() : 1) - 1;
+}
 
+std::optional<ColumnPlan> ColumnPlan::Make(const ScaleContext& context, const ContributionTable& table,
+                                           const HorizontalPass* pass) {
+  ColumnPlan plan(context, table, pass);
+  if (!plan.ChooseStripe()) return {};
+  return plan;
+}
+
+bool ColumnPlan::ChooseStripe() {
   const auto fits = [&](std::size_t room) { return room / sizeof(float) / std::size_t(Slots); };
   // Every stripe walks the whole source again, which a mapped one has to be read for.
-  std::size_t samples = fits(pass && context.Source->IsMapping ? MostRoom : CacheRoom);
+  std::size_t samples = fits(Pass && Context.Source->IsMapping ? MostRoom : CacheRoom);
   if (samples < NarrowStripe) samples = std::min(NarrowStripe, fits(MostRoom));
-  if (samples < NarrowestStripe) return;
-  const std::int32_t unit = pass ? pass->ColumnUnit() : 1;
+  if (samples < NarrowestStripe) return false;
+  const std::int32_t unit = Pass ? Pass->ColumnUnit() : 1;
   // A row that fits is one stripe, its last group of columns included.
-  const std::int64_t units = (std::int64_t{context.ResultWidth} + unit - 1) / unit;
+  const std::int64_t units = (std::int64_t{Context.ResultWidth} + unit - 1) / unit;
   const auto unitsThatFit = std::max<std::int64_t>(std::int64_t(samples) / Samples.Order.Count / unit, 1);
   Stripe = std::int32_t(std::min(units, unitsThatFit)) * unit;
   Room = WholeBlocks(std::ptrdiff_t{Stripe} * Samples.Order.Count) + Block;
+  return true;
 }
 
 ColumnPlan::RowRange ColumnPlan::RowsOf(std::int32_t y, int count) const {

@@ -1,4 +1,6 @@
 #pragma once
+#include <optional>
+
 #include "image/walk.h"
 #include "scale/horizontal_pass.h"
 #include "scale/line_sums.h"
@@ -8,9 +10,9 @@ namespace zor {
 /// How the second pass goes over a table in single precision: a stripe of columns at a time, whose rows
 /// between the passes are kept as floats while lines look at them. The same for all threads.
 struct ColumnPlan {
-  ColumnPlan(const ScaleContext& context, const ContributionTable& table, const HorizontalPass* pass);
-  /// False where a line looks at so many rows that stripes become too narrow.
-  explicit operator bool() const { return Stripe > 0; }
+  /// None where a line looks at so many rows that stripes become too narrow.
+  static std::optional<ColumnPlan> Make(const ScaleContext& context, const ContributionTable& table,
+                                        const HorizontalPass* pass);
 
   /// The rows that some lines look at, first to last; empty where they look at none.
   struct RowRange {
@@ -28,6 +30,10 @@ struct ColumnPlan {
   /// Rows that are there at a time, pixels of a stripe at most, and floats of a row's room.
   std::int32_t Slots = 1, Stripe = 0;
   std::ptrdiff_t Room = 0;
+
+ private:
+  ColumnPlan(const ScaleContext& context, const ContributionTable& table, const HorizontalPass* pass);
+  bool ChooseStripe();
 };
 
 /// The rows of a plan's stripes, and the lines that are sums of a few of them.

@@ -27,7 +27,7 @@ void PlainLine(const ScaleContext& context, const Contribution& line, std::int32
 }
 
 bool VerticalPass::MakeLines(std::int32_t y, int count, Columns stripe, FloatColumns& columns) const {
-  const PixelScatter& scatter = Plan.Samples;
+  const PixelScatter& scatter = Plan->Samples;
   Sample* into[LineSums::Most] = {};
   bool direct[LineSums::Most];
   for (int i = 0; i < count; ++i) {
@@ -44,23 +44,28 @@ bool VerticalPass::MakeLines(std::int32_t y, int count, Columns stripe, FloatCol
   return true;
 }
 
+void VerticalPass::MakePlainLines(std::int32_t first, std::int32_t last, PictureData* yields) const {
+  for (std::int32_t y = first; y <= last; ++y) {
+    PlainLine(Context, Table[y], y);
+    if (yields) MayYield(*yields);
+  }
+}
+
 bool VerticalPass::Run(std::int32_t first, std::int32_t last, PictureData* yields) const {
-  FloatColumns columns(Plan);
-  if (!columns && !Context.Temp) return false;
-  if (!columns) {
-    for (std::int32_t y = first; y <= last; ++y) {
-      PlainLine(Context, Table[y], y);
-      if (yields) MayYield(*yields);
-    }
+  std::optional<FloatColumns> columns;
+  if (Plan) columns.emplace(*Plan);
+  if (!columns || !*columns) {
+    if (!Context.Temp) return false;
+    MakePlainLines(first, last, yields);
     return true;
   }
-  for (std::int64_t x = 0; x < Context.ResultWidth; x += Plan.Stripe) {
+  for (std::int64_t x = 0; x < Context.ResultWidth; x += Plan->Stripe) {
     const Columns stripe{std::int32_t(x),
-                         std::int32_t(std::min<std::int64_t>(x + Plan.Stripe, Context.ResultWidth))};
-    columns.Begin(stripe);
+                         std::int32_t(std::min<std::int64_t>(x + Plan->Stripe, Context.ResultWidth))};
+    columns->Begin(stripe);
     for (std::int32_t y = first; y <= last;) {
-      const int count = std::min(Plan.Together, last - y + 1);
-      if (!MakeLines(y, count, stripe, columns)) return false;
+      const int count = std::min(Plan->Together, last - y + 1);
+      if (!MakeLines(y, count, stripe, *columns)) return false;
       for (int i = 0; yields && i < count; ++i) MayYield(*yields);
       y += count;
     }

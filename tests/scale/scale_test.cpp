@@ -235,6 +235,43 @@ TEST(Scale, IsTheSameOnEveryTarget) {
       }
 }
 
+// Lines that look at more rows than any cache holds; with a temporary picture and without.
+TEST(Scale, LooksAtAnyNumberOfRows) {
+  const std::vector<Kernel> wide(std::begin(AllKernels) + 2, std::end(AllKernels));
+  const struct {
+    Size From, Into;
+    Format Of, Temp;
+    std::vector<Kernel> Kernels;
+  } cases[] = {
+      {{1, 3073}, {1, 1}, Format::G, Format::Scaling1, {Kernel::Triangle}},
+      {{30, 3300}, {3, 17}, Format::RGB, Format::Scaling4, {Kernel::Lanczos8}},
+      {{6, 4000}, {6, 4}, Format::CMYKA, Format::Scaling5, wide},
+      {{1, 32000}, {1, 10}, Format::GA, Format::Scaling2, {Kernel::Box}},
+  };
+  unsigned seed = 700;
+  for (const auto& [from, into, format, between, kernels] : cases)
+    for (const Kernel kernel : kernels) {
+      SCOPED_TRACE(testing::Message() << "from height " << from.Height << " kernel " << int(kernel));
+      const Picture source = NoisePicture(from.Width, from.Height, format, ++seed);
+      const Picture wanted(into.Width, into.Height, format);
+      ASSERT_TRUE(wanted.Scale(source, {}, kernel, into.Width, into.Height));
+      ExpectScaled(wanted, source, kernel, FeedsOf(source, wanted));
+      const Picture memory(from.Width, from.Height, between);
+      const auto expectSame = [&](const Picture& temp, int threads) {
+        const Picture dest(into.Width, into.Height, format);
+        ASSERT_TRUE(dest.ScaleMT(threads, source, temp, kernel, into.Width, into.Height));
+        EXPECT_EQ(Packed(dest), Packed(wanted)) << threads;
+      };
+      ForEveryTarget([&] {
+        for (const Picture& temp : {Picture{}, memory})
+          for (const int threads : {-1, 1, 4}) expectSame(temp, threads);
+      });
+      // Its window moves with every few rows, which takes long.
+      if (into.Height == 1)
+        expectSame(StoredPicture(StoredPicture::Mapped, from.Width, from.Height, between).Get(), 4);
+    }
+}
+
 // Every way between families, with and without alpha on either side, fillers and odd orders included.
 TEST(Scale, KnowsFourteenPairs) {
   const Format formats[] = {Format::G,    Format::AG,    Format::TwoOf4, Format::RGB,
