@@ -21,16 +21,18 @@ struct Dependence {
     /// From anywhere: the source stands whole before the work begins.
     Whole,
     /// Row y of the result from the rows First + y - Reach to First + y + Reach of the source, as far as
-    /// there are
-    /// such, and from nothing else. Any band of rows can be worked on by itself then.
+    /// there are such, and from nothing else. Any band of rows can be worked on by itself then: `Apply`
+    /// gives as many rows as it gets, row i out of those around row i; which rows it gets, and which of the
+    /// result count, is the caller's business. So to cut rows off takes no more than to tell it here.
     Bands,
-    /// The work reads the rows from top to bottom, once, but has to see the whole size: they may arrive while
-    /// it runs.
+    /// The work reads the rows from top to bottom, but has to see the whole size: they may arrive while it
+    /// runs, and go some megabytes later.
     InOrder
   };
   Kind Of = Kind::Whole;
   std::int32_t First = 0, Reach = 0;
-  /// The first row of a band is a multiple of this, where the work repeats itself from row to row.
+  /// The first row that `Apply` gives of a band is a multiple of this in the whole result, where the work
+  /// repeats itself from row to row.
   std::int32_t Period = 1;
 };
 
@@ -45,7 +47,8 @@ class Operation {
   /// The pictures of the source's size that the work takes at a time, source and result included.
   virtual int Pictures() const { return 2; }
   /// The result of a whole picture, or of a band of rows with those in reach. In place where that can be: the
-  /// source may come back changed, and is lost otherwise. New pictures live where `stores` says.
+  /// source may come back changed, and is lost otherwise. The source may be a view. New pictures live where
+  /// `stores` says. Throws files::Failure where it can't be done.
   virtual Picture Apply(Picture source, const files::StoreOptions& stores) const = 0;
 };
 
