@@ -20,17 +20,20 @@ struct ByteTables {
   /// The different tables, at most one each for red, green, blue and alpha.
   int Count = 0;
   std::array<const SampleTable*, 4> Table{};
+  /// Which table each place of a pixel has, from the first mapped one on; -1 for none.
+  std::array<int, 8> At;
   /// Of 64 bytes that start at some place in a pixel: which have a table, and which have table t.
   std::array<std::uint64_t, 8> Mapped{};
   std::array<std::array<std::uint64_t, 4>, 8> Of{};
 };
 
-/// Sends the bytes of a row through the one table of all of them; `tables` is Uniform. The rows are one and
-/// the same or don't overlap.
-void MapBytes(const ByteTables& tables, const Sample* in, Sample* out);
+/// Sends the bytes of a row through their tables, as far as there is a fast form for them: gives how many
+/// pixels from the left are done. The rows are one and the same or don't overlap.
+std::ptrdiff_t MapBytes(const ByteTables& tables, const Sample* in, Sample* out);
 
-/// Sends the bytes of a row through their tables, looked up in registers. For Target::AVX512VBMI only; the
-/// rows are one and the same or don't overlap.
+// The forms that look bytes up in registers, each for its instruction set; that for AVX2 gives how many bytes
+// are done, whole pixels unless the tables are Uniform.
+std::ptrdiff_t MapBytesAVX2(const ByteTables& tables, const Sample* in, Sample* out);
 void MapBytesVBMI(const ByteTables& tables, const Sample* in, Sample* out);
 
 }

@@ -1,6 +1,7 @@
 #include "filters/plane_tables.h"
 
-#include "image/targets.h"
+#include <optional>
+
 #include "image/walk.h"
 
 namespace zor {
@@ -45,7 +46,12 @@ struct MappedRows {
   bool ManyAtOnce;
 };
 
-bool MapSamples(const MappedRows& rows, const MappedPlanes& planes) {
+bool MapRows(const MappedRows& rows, const MappedPlanes& planes) {
+  if (rows.Width < 1 || planes.In.Count < 1) return true;
+  const bool alike = rows.ManyAtOnce && LieAlike(planes.In, planes.Out);
+  const std::int32_t firstIn = FirstOffset(planes.In), firstOut = FirstOffset(planes.Out);
+  std::optional<ByteTables> tables;
+  if (alike) tables.emplace(planes.In, planes.Table, rows.Width);
   bool done = true;
   ForPlaneCount(planes.In.Count, [&](auto n) {
     done = Walk(rows.From, rows.Into).Rows(rows.Height, [&](std::int32_t, Sample* source, Sample* dest) {
@@ -53,23 +59,12 @@ bool MapSamples(const MappedRows& rows, const MappedPlanes& planes) {
       const PlaneRow<n> in(source, planes.In), out(dest, planes.Out);
       const auto table = planes.Table;
       const std::ptrdiff_t width = rows.Width;
-      for (std::ptrdiff_t x = 0; x < width; ++x)
+      for (std::ptrdiff_t x = tables ? MapBytes(*tables, source + firstIn, dest + firstOut) : 0; x < width;
+           ++x)
         for (int c = 0; c < n; ++c) out(c, x) = (*table[c])[in(c, x)];
     });
   });
   return done;
-}
-
-bool MapRows(const MappedRows& rows, const MappedPlanes& planes) {
-  if (!rows.ManyAtOnce || !LieAlike(planes.In, planes.Out) || rows.Width < 1) return MapSamples(rows, planes);
-  const ByteTables tables(planes.In, planes.Table, rows.Width);
-  const bool inRegisters = CurrentTarget == Target::AVX512VBMI;
-  if (!inRegisters && !tables.Uniform) return MapSamples(rows, planes);
-  const auto map = inRegisters ? MapBytesVBMI : MapBytes;
-  const std::int32_t in = FirstOffset(planes.In), out = FirstOffset(planes.Out);
-  return Walk(rows.From, rows.Into).Rows(rows.Height, [&](std::int32_t, Sample* source, Sample* dest) {
-    map(tables, source + in, dest + out);
-  });
 }
 
 }
