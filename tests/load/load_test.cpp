@@ -1,8 +1,10 @@
 #include <dlfcn.h>
 #include <gmock/gmock.h>
 
+#include <fstream>
 #include <functional>
 #include <map>
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -99,8 +101,6 @@ TEST(Load, ShowsItsRecordsToAnyHost) {
     EXPECT_TRUE(sizeof(void*) > 4 || picture.DataSize == least);
     EXPECT_EQ(picture.ConstructorFunction, 0u);
     EXPECT_NE(picture.DestructorFunction, 0u);
-    EXPECT_EQ(picture.ConstantCount, 79u);
-    EXPECT_EQ(picture.SharedMethodCount, 3u);
     EXPECT_EQ(picture.ClassFlags, 4u);
     EXPECT_EQ(picture.EventCount, 0u);
 
@@ -115,6 +115,52 @@ TEST(Load, ShowsItsRecordsToAnyHost) {
     EXPECT_STREQ(factory.Events[0].Declaration,
                  "NewPictureZOR(Width as integer, Height as integer, ImageFormat as integer) as PictureZOR");
     EXPECT_EQ(factory.ClassFlags, 4u);
+  });
+}
+
+/// The rows of a class as a host is shown them, a line each.
+std::string LinesOf(const zor::ClassRecord& record) {
+  std::ostringstream lines;
+  const auto method = [&](const char* kind, std::size_t number, const zor::MethodRecord& row) {
+    lines << kind << ' ' << number << " 0x" << std::hex << row.Flags << std::dec
+          << (row.Setter ? " assigned " : " ") << row.Declaration << '\n';
+  };
+  for (std::size_t i = 0; i < record.MethodCount; ++i) method("method", i + 1, record.Methods[i]);
+  for (std::size_t i = 0; i < record.PropertyCount; ++i) {
+    const zor::PropertyRecord& row = record.Properties[i];
+    const zor::Word others[] = {row.Group, row.Reserved[0], row.Reserved[1], row.Reserved[2]};
+    EXPECT_THAT(others, testing::Each(0u));
+    lines << "property " << i + 1 << " 0x" << std::hex << row.Flags << std::dec << ' ' << row.Name << " as "
+          << row.Type << (row.Getter == zor::DirectField ? ", read in the record" : ", read by a function")
+          << (row.Setter == 0                  ? ", read-only"
+              : row.Setter == zor::DirectField ? ", written in the record"
+                                               : ", written by a function")
+          << '\n';
+  }
+  for (std::size_t i = 0; i < record.ConstantCount; ++i) {
+    EXPECT_EQ(record.Constants[i].Reserved | record.Constants[i].Value, 0u);
+    lines << "constant " << record.Constants[i].Declaration << '\n';
+  }
+  for (std::size_t i = 0; i < record.SharedMethodCount; ++i) method("shared", i + 1, record.SharedMethods[i]);
+  return lines.str();
+}
+
+// Catches a row, a flag, a setter or a constant that isn't what programs were written for. The file is kept
+// by hand; nothing prints it.
+TEST(Load, HandsOverTheClassThatProgramsKnow) {
+  InChild([] {
+    KnowEverything();
+    Small().Version = 0;
+    Entry()(AskFirst);
+    ASSERT_EQ(Small().Classes.size(), 2u);
+    const zor::ClassRecord& picture = *Small().Classes[0];
+    std::ifstream file(PICTUREZOR_SOURCE_DIR "/tests/load/picture_class.txt");
+    std::ostringstream known;
+    known << file.rdbuf();
+    EXPECT_EQ(LinesOf(picture), known.str());
+    // A colour arrives as an integer does.
+    for (const auto& [ofIntegers, ofColours] : {std::pair{0, 3}, {1, 4}, {5, 8}, {6, 9}})
+      EXPECT_EQ(picture.Methods[ofIntegers].Function, picture.Methods[ofColours].Function);
   });
 }
 
@@ -183,7 +229,6 @@ TEST(Load, SetsFlagsByTheVersionOfTheHost) {
       const std::vector<std::string> none, noVersion = {"REALGetRBVersion"};
       Host::Load(PICTUREZOR_MODULE, {.Version = version, .Hidden = known ? none : noVersion});
       auto flags = PropertyFlags();
-      EXPECT_EQ(flags.size(), 41u);
       for (const char* name : {"DebugPictureEnabled", "DebugPicture", "Target"}) {
         EXPECT_EQ(flags[name], changed ? 0x40006u : 0x40002u) << name;
         flags.erase(name);
@@ -191,7 +236,8 @@ TEST(Load, SetsFlagsByTheVersionOfTheHost) {
       for (const auto& [name, value] : flags) EXPECT_EQ(value, 6u) << name;
       for (const auto& row : Host::Methods("PictureZOR")) {
         const bool hostPictures = row.Flags & 0x40000;
-        EXPECT_EQ(row.Flags, !hostPictures ? 4u : changed ? 0x40004u : 0x40000u) << row.Declaration;
+        const std::uintptr_t others = row.Declaration.starts_with("Combine(") ? 0 : 4;
+        EXPECT_EQ(row.Flags, !hostPictures ? others : changed ? 0x40004u : 0x40000u) << row.Declaration;
       }
     });
 }
