@@ -14,13 +14,32 @@ struct MethodRow {
   void (*Write)(MethodRecord&);
 };
 
+/// The function of a row as the host calls it. Called on nil it gives its failure value: nil, false, or -1.
+template <class Function>
+struct OnObject;
+template <class Result, class... Arguments>
+struct OnObject<Result(PictureZOR*, Arguments...)> {
+  template <Result (*Function)(PictureZOR*, Arguments...)>
+  static Result Call(PictureZOR* self, Arguments... arguments) {
+    if (self) return Function(self, arguments...);
+    if constexpr (std::is_same_v<Result, Int64>)
+      return -1;
+    else
+      return Result();
+  }
+};
+
 /// Row `Number` of the class. The declaration says which overload of the function is meant;
 /// a declaration that fits none doesn't compile.
 template <int Number, Text Declaration, FunctionOf<Declaration>* Function, Word Flags = PlainFlags,
-          SetterOf<Declaration>* Setter = nullptr>
+          SetterOf<Declaration>*... Setter>
 constexpr MethodRow Method{Number, [](MethodRecord& record) {
-                             record = {reinterpret_cast<Word>(Function), reinterpret_cast<Word>(Setter),
-                                       Declaration.Characters, Flags};
+                             using Called = OnObject<FunctionOf<Declaration>>;
+                             using Assigned = OnObject<SetterOf<Declaration>>;
+                             record = {
+                                 reinterpret_cast<Word>(Called::template Call<Function>),
+                                 (Word{} | ... | reinterpret_cast<Word>(Assigned::template Call<Setter>)),
+                                 Declaration.Characters, Flags};
                            }};
 
 /// A row of the shared methods, which have no object.

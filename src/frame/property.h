@@ -57,7 +57,7 @@ constexpr PropertyRow FieldProperty{[](PropertyRecord& record) {
   Word setter = Of == Access::ReadOnly ? 0 : DirectField;
   // By its type: with -fsanitize=undefined g++ 12 takes no function's address for a constant.
   if constexpr (!std::is_null_pointer_v<decltype(Setter)>)
-    setter = reinterpret_cast<Word>(static_cast<SetterFunction<T>*>(Setter));
+    setter = reinterpret_cast<Word>(OnObject<SetterFunction<T>>::template Call<Setter>);
   record = {0, Name.Characters, TypeName<T>(), Flags, DirectField, setter, OffsetOf(Field), {}};
 }};
 
@@ -65,7 +65,8 @@ constexpr PropertyRow FieldProperty{[](PropertyRecord& record) {
 template <Text Name, auto Getter, Word Flags = PropertyFlags>
 constexpr PropertyRow GetterProperty{[](PropertyRecord& record) {
   using T = decltype(Getter(nullptr, Word{}));
-  record = {0, Name.Characters, TypeName<T>(), Flags, reinterpret_cast<Word>(Getter), 0, 0, {}};
+  const auto getter = OnObject<T(PictureZOR*, Word)>::template Call<Getter>;
+  record = {0, Name.Characters, TypeName<T>(), Flags, reinterpret_cast<Word>(getter), 0, 0, {}};
 }};
 
 }

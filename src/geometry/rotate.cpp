@@ -113,7 +113,7 @@ double Normalised(double angle) {
 
 PictureZOR* Rotate(PictureZOR* self, Double angle, Integer Red, Integer Green, Integer Blue, Integer Alpha,
                    Integer Gray, Integer Cyan, Integer Magenta, Integer Yellow, Integer Black) {
-  if (!self || !std::isfinite(angle)) return nullptr;
+  if (!std::isfinite(angle)) return nullptr;
   angle = Normalised(angle);
   if (angle == 0) return Locked(self);
   if (angle == 90) return Rotate90(self, nullptr);

@@ -76,7 +76,6 @@ int Try(const MethodEntry& row, StoredPicture::Kind kind, Format format, int fir
     const RowArguments with(kind, format);
     const bool constructs = row.LowerName == "constructor";
     const Picture made = UnbuiltPicture(), self = constructs ? made : with.Self();
-    void* const object = IsShared(row) ? nullptr : self.Address();
     const std::vector<Value> arguments = with.Ordinary(row);
     const std::vector<Samples> rows =
         constructs || row.LowerName == "close" ? std::vector<Samples>() : StoredRows(self);
@@ -85,7 +84,9 @@ int Try(const MethodEntry& row, StoredPicture::Kind kind, Format format, int fir
                        row.Of.Result == "variant" || row.Of.Result == "string" ||
                        row.Of.Result == "memoryblock";
     Outcome outcome;
-    calls = WithFaults(first, count, [&] { outcome = CallRow(row, object, arguments); });
+    calls = WithFaults(first, count, [&] {
+      outcome = IsShared(row) ? CallShared(row, arguments) : CallRow(row, self.Address(), arguments);
+    });
     const Value& result = outcome.Result;
     EXPECT_TRUE(outcome.Raised.empty() || (!result.Address && !result.Whole));
     if (row.Of.Result == "picturezor" && result.Address) {

@@ -112,11 +112,9 @@ std::string ArgumentLetters(const model::MethodEntry& row, bool onObject) {
   return letters;
 }
 
-Outcome CallShape(const std::string& letters, std::uintptr_t function, void* object,
-                  std::vector<Value> arguments) {
+Outcome CallShape(const std::string& letters, std::uintptr_t function, const std::vector<Value>& arguments) {
   const Shape* shape = Find(letters);
   if (!shape) throw std::logic_error(letters + " is no shape in row_call.cpp");
-  if (object) arguments.insert(arguments.begin(), Value{.Address = object});
   Outcome outcome{shape->Call(function, arguments), ""};
   try {
     model::ThrowPending();
@@ -137,16 +135,20 @@ bool CanCall(const model::MethodEntry& row) {
   return calls && (!row.Record->Setter || Find("V" + arguments + result));
 }
 
-Outcome CallRow(const model::MethodEntry& row, void* object, const std::vector<Value>& arguments) {
-  return CallShape(LetterOf(row.Of.Result) + ArgumentLetters(row, object != nullptr), row.Record->Function,
-                   object, arguments);
+Outcome CallRow(const model::MethodEntry& row, void* object, std::vector<Value> arguments) {
+  arguments.insert(arguments.begin(), Value{.Address = object});
+  return CallShape(LetterOf(row.Of.Result) + ArgumentLetters(row, true), row.Record->Function, arguments);
+}
+
+Outcome CallShared(const model::MethodEntry& row, const std::vector<Value>& arguments) {
+  return CallShape(LetterOf(row.Of.Result) + ArgumentLetters(row, false), row.Record->Function, arguments);
 }
 
 Outcome AssignRow(const model::MethodEntry& row, void* object, std::vector<Value> arguments,
                   const Value& value) {
+  arguments.insert(arguments.begin(), Value{.Address = object});
   arguments.push_back(value);
-  return CallShape("V" + ArgumentLetters(row, object != nullptr) + LetterOf(row.Of.Result),
-                   row.Record->Setter, object, std::move(arguments));
+  return CallShape("V" + ArgumentLetters(row, true) + LetterOf(row.Of.Result), row.Record->Setter, arguments);
 }
 
 void GiveBack(const model::TypeName& type, const Value& value) {

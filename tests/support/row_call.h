@@ -31,8 +31,9 @@ struct Outcome {
 /// listed in row_call.cpp.
 bool CanCall(const model::MethodEntry& row);
 
-/// Calls the function of a row on an object; null for a shared method.
-Outcome CallRow(const model::MethodEntry& row, void* object, const std::vector<Value>& arguments);
+/// Calls the function of a row on an object, which may be nil; and that of a shared row.
+Outcome CallRow(const model::MethodEntry& row, void* object, std::vector<Value> arguments);
+Outcome CallShared(const model::MethodEntry& row, const std::vector<Value>& arguments);
 /// Calls the assignment form.
 Outcome AssignRow(const model::MethodEntry& row, void* object, std::vector<Value> arguments,
                   const Value& value);

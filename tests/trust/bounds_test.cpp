@@ -114,9 +114,17 @@ TEST(Bounds, OfThePictureItself) {
   });
 }
 
-// Without the picture that it reads an operation can't have worked.
+/// What a row gives that hasn't worked.
+std::int64_t FailureOf(const MethodEntry& row) { return row.Of.Result == "int64" ? -1 : 0; }
+
+// Without the picture that it works on, or the one that it reads, an operation can't have worked.
 TEST(Bounds, NilIsRefused) {
   ForEachRow([](const RowArguments& with, const MethodEntry& row) {
+    const Outcome onNil = CallRow(row, nullptr, with.Ordinary(row));
+    EXPECT_EQ(onNil.Result.Whole, FailureOf(row));
+    EXPECT_EQ(onNil.Result.Address, nullptr);
+    EXPECT_EQ(onNil.Raised, "");
+    if (row.Record->Setter) AssignRow(row, nullptr, with.Ordinary(row), with.Assigned(row));
     if (row.Of.Result != "boolean" && row.Of.Result != "int64") return;
     for (std::size_t i = 0; i < row.Of.Parameters.size(); ++i) {
       const std::string name = model::Lower(row.Of.Parameters[i].Name);
@@ -124,8 +132,7 @@ TEST(Bounds, NilIsRefused) {
       std::vector<Value> arguments = with.Ordinary(row);
       arguments[i] = {};
       ++Calls;
-      EXPECT_EQ(CallRow(row, with.Self().Address(), arguments).Result.Whole,
-                row.Of.Result == "int64" ? -1 : 0);
+      EXPECT_EQ(CallRow(row, with.Self().Address(), arguments).Result.Whole, FailureOf(row));
     }
   });
 }
@@ -137,7 +144,7 @@ TEST(Bounds, OfSharedRows) {
       for (const Value& second : with.Hostile("integer"))
         for (const Value& third : with.Hostile("integer")) {
           SCOPED_TRACE(row.Record->Declaration);
-          Check(row, CallRow(row, nullptr, {first, second, third}));
+          Check(row, CallShared(row, {first, second, third}));
         }
 }
 
