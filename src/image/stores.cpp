@@ -152,6 +152,28 @@ std::int64_t MirroredStoreRow(const PictureData& data, std::int32_t row) {
   return std::int64_t{data.Height} - row - 1 + data.RowOffset;
 }
 
+/// The bytes of a picture's pixels, a run a row, by their addresses or by their places in its file. Pixels
+/// without planes begin where the row does, whatever the view.
+struct PixelRuns {
+  std::int64_t First, Step, Bytes, Count;
+
+  explicit PixelRuns(const PictureData& data) {
+    const std::int32_t left = data.ChannelCount > 0 ? data.LeftEdge : 0;
+    const std::int64_t base = data.IsMapping ? 0 : std::int64_t(reinterpret_cast<Word>(data.PixelBase));
+    First = base + StoreRow(data, 0) * data.RowSize + left;
+    Step = data.RowSize;
+    Bytes = data.LeftEdge - left + PackedRowBytes(data);
+    Count = data.Width > 0 ? data.Height : 0;
+  }
+  std::int64_t End() const { return First + Bytes; }
+  /// Leaves the runs out that end at a place or before it, of which the first is one.
+  void SkipTo(std::int64_t place) {
+    const std::int64_t runs = Step > 0 ? std::min((place - End()) / Step + 1, Count) : Count;
+    First += runs * Step;
+    Count -= runs;
+  }
+};
+
 Sample* PlainRowMirrored(PictureData* data, std::int32_t row) {
   return data->PixelBase + std::ptrdiff_t(MirroredStoreRow(*data, row)) * data->RowSize;
 }
@@ -284,18 +306,18 @@ void SetMappingBlockSize(PictureZOR* self, Word, Integer value) {
 }
 
 bool SharePixels(const PictureData& a, const PictureData& b) {
-  const Store *first = a.Samples, *second = b.Samples;
-  if (!first || !second) return false;
-  if (first == second || (first->Keeper && first->Keeper == second->Keeper)) return true;
-  if (a.IsMapping || b.IsMapping) return false;
-  const auto begin = [](const PictureData& data) {
-    return reinterpret_cast<Word>(data.PixelBase) + Word(std::int64_t{data.RowOffset} * data.RowSize);
-  };
-  // In a caller's block the last row may be longer than the way from row to row.
-  const auto end = [&](const PictureData& data) {
-    return begin(data) + Word(std::int64_t{data.RowSize} * (data.Height - 1) + StoredRowBytes(data));
-  };
-  return begin(a) < end(b) && begin(b) < end(a);
+  if (!a.Samples || !b.Samples || a.IsMapping != b.IsMapping) return false;
+  if (a.IsMapping && a.Samples != b.Samples) return false;
+  PixelRuns first(a), second(b);
+  while (first.Count > 0 && second.Count > 0) {
+    if (first.End() <= second.First)
+      first.SkipTo(second.First);
+    else if (second.End() <= first.First)
+      second.SkipTo(first.First);
+    else
+      return true;
+  }
+  return false;
 }
 
 std::int64_t StoreRowOf(const PictureData& picture, std::int32_t y) {
@@ -307,8 +329,8 @@ bool RowsAreApart(const PictureData& picture) { return StoredRowBytes(picture) <
 
 std::int32_t ReadAhead(const PictureData& read, Place from, const PictureData& written, Place into) {
   constexpr std::int32_t any = std::numeric_limits<std::int32_t>::max();
-  if (!SharePixels(read, written)) return any;
-  if (read.Samples != written.Samples || !RowsAreApart(read) || !RowsAreApart(written)) return 1;
+  if (read.Samples != written.Samples || !RowsAreApart(read) || !RowsAreApart(written))
+    return SharePixels(read, written) ? 1 : any;
   if (StoreRowOf(read, from.Y) != StoreRowOf(written, into.Y)) return any;
   const auto column = [](const PictureData& picture, std::int32_t x) {
     return picture.LeftEdge / picture.PixelSize + x;

@@ -72,7 +72,8 @@ bool HoldTogether(PictureData& data, std::int32_t first, std::int32_t last);
 /// The getter of every memory store.
 Sample* PlainRow(PictureData* data, std::int32_t row);
 
-/// Whether a write to one picture can show in the other: one store, one host object, or overlapping memory.
+/// Whether a byte from the first to the last pixel of a row of one picture is one of such a row of the other,
+/// so that a write to one can show in the other.
 bool SharePixels(const PictureData& a, const PictureData& b);
 
 /// The row of the store that a picture shows as row y; a mirrored one counts from its last row.

@@ -171,18 +171,21 @@ TEST(MappedStore, LeavesDevicesAlone) {
   EXPECT_TRUE(std::filesystem::exists("/dev/null"));
 }
 
-// Catches the bytes that a block's last row has beyond the way from row to row: what is written there is read
-// through the other picture.
-TEST(MemoryStore, IsSharedToItsLastPixel) {
+// Catches bytes that belong to a picture's rows and aren't taken for it, as those of the last row of a block
+// beyond the way from row to row, and bytes between its rows that are.
+TEST(MemoryStore, SharesNothingButItsPixels) {
   for (const int rowSize : {0, 4, 20, 23}) {
     const Picture picture(MemoryBlock(100), 20, 3, Format::G, rowSize);
     // The block that a picture gives says no size, so the class would refuse it.
     const Picture bytes = UnbuiltPicture();
     model::Invoke<void>(bytes, "Constructor", picture.Memory(), 1, 100, int(Format::G), 1);
-    for (int at = 0; at < 100; ++at)
-      EXPECT_EQ(SharePixels(DataOf(picture), DataOf(bytes.ClipImage({0, at, 1, 1}))),
-                at < 2 * rowSize + std::max(20, rowSize))
-          << "rows " << rowSize << " bytes apart, byte " << at;
+    for (int at = 0; at < 100; ++at) {
+      bool inRow = false;
+      for (int y = 0; y < 3; ++y) inRow |= at >= y * rowSize && at < y * rowSize + 20;
+      const Picture byte = bytes.ClipImage({0, at, 1, 1});
+      EXPECT_EQ(SharePixels(DataOf(picture), DataOf(byte)), inRow) << rowSize << " apart, byte " << at;
+      EXPECT_EQ(SharePixels(DataOf(byte), DataOf(picture)), inRow) << rowSize << " apart, byte " << at;
+    }
   }
 }
 

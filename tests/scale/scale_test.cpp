@@ -378,10 +378,37 @@ TEST(Scale, RefusesWhatDoesntFit) {
   EXPECT_EQ(StoredRows(dest), before);
   EXPECT_FALSE(invalid.Scale(source, {}, Kernel::Box, 1, 1));
   EXPECT_FALSE(dest.Scale(source.ClipImage({8, 0, 5, 5}), {}, Kernel::Box, 5, 4)) << "a source of no columns";
-  // Temporary picture and source in one block.
-  const MemoryBlock block(std::vector<std::uint8_t>(400));
-  const Picture first(block, 5, 4, Format::RGBA, 20), second(block, 5, 4, Format::RGBA, 20);
-  EXPECT_FALSE(Picture(5, 4, Format::RGBA).Scale(first, second, Kernel::Box, 5, 4));
+}
+
+// Source, dest and temporary picture in one block, or in one file: what counts is whether they share bytes.
+TEST(Scale, TakesATemporaryPictureBesideTheOthers) {
+  const Picture noise = NoisePicture(5, 4, Format::RGBA, 3), wanted(5, 4, Format::RGBA);
+  ASSERT_TRUE(wanted.Scale(noise, {}, Kernel::Cubic, 5, 4));
+  const TemporaryFile file;
+  const MemoryBlock block(480);
+  const Picture wholes[] = {Picture(block, 10, 12, Format::RGBA, 40),
+                            Picture::Mapped(file.Path(), 10, 12, Format::RGBA, 1)};
+  for (const Picture& whole : wholes) {
+    SCOPED_TRACE(whole.IsMapping());
+    const Picture temp = whole.ClipImage({0, 4, 5, 4});
+    for (const auto& [x, y, apart] :
+         {std::tuple{5, 4, true}, {4, 4, false}, {0, 0, true}, {0, 1, false}, {0, 7, false}, {3, 8, true}}) {
+      SCOPED_TRACE(testing::Message() << x << ' ' << y);
+      const Picture part = whole.ClipImage({x, y, 5, 4});
+      for (const int threads : {-1, 2}) {
+        SetPacked(part, Packed(noise));
+        EXPECT_EQ(part.ScaleMT(threads, noise, temp, Kernel::Cubic, 5, 4), apart);
+        EXPECT_TRUE(!apart || Packed(part) == Packed(wanted));
+        SetPacked(part, Packed(noise));
+        const Picture dest(5, 4, Format::RGBA);
+        EXPECT_EQ(dest.ScaleMT(threads, part, temp, Kernel::Cubic, 5, 4), apart);
+        EXPECT_TRUE(!apart || Packed(dest) == Packed(wanted));
+      }
+    }
+  }
+  // Raw pixels begin where their rows do, whatever is clipped off.
+  const Picture raw(block, 10, 12, Format::Scaling4, 40), left(block, 5, 12, Format::RGBA, 40);
+  EXPECT_FALSE(left.Scale(noise, raw.ClipImage({5, 0, 5, 4}), Kernel::Cubic, 5, 4));
 }
 
 // Catches a temporary picture of a factory that is used although it can't be, or that is never given back.
