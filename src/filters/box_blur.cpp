@@ -235,8 +235,8 @@ bool SamePixels(PictureData& a, PictureData& b) {
 
 PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, double radius, Boolean vertical,
                           Boolean horizontal) {
-  return RunFilter(self, dest, {.InPlace = false}, [&](const FilterCall& call) {
-    if (call.Source.Width < 1 || (!vertical && !horizontal)) return true;
+  const FilterRules rules{.InPlace = false, .Writes = vertical || horizontal};
+  return RunFilter(self, dest, rules, [&](const FilterCall& call) {
     // One sample is its own mean.
     const std::int64_t r = Truncate(radius), n = 2 * r + 1;
     if (r < 1) return Blur<std::uint16_t>(call, 0, false, false);
@@ -250,11 +250,12 @@ PictureZOR* BoxBlurFilter(PictureZOR* self, PictureZOR* dest, double radius, Int
                           Boolean vertical, Boolean horizontal) {
   PictureZOR* current = Locked(self);
   // A truncated mean of unequal samples is less than the largest of them, so passes end in an even picture,
-  // which no further pass changes.
+  // which no further pass changes. A factory is asked for every pass all the same.
   bool settled = false;
   for (Integer i = 0; i < iterations && current && !settled; ++i) {
     PictureZOR* blurred = BoxBlurFilter(current, dest, radius, vertical, horizontal);
-    settled = i >= 1 && blurred && SamePixels(DataOf(current), DataOf(blurred));
+    settled =
+        i >= 1 && blurred && !HasFactory(DataOf(blurred)) && SamePixels(DataOf(current), DataOf(blurred));
     Unlock(current);
     current = blurred;
     dest = nullptr;

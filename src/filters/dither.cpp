@@ -75,12 +75,11 @@ bool DitherSamples(const FilterCall& call, const DitherMatrix& matrix, const Dit
 }
 
 PictureZOR* DitherFilter(PictureZOR* self, PictureZOR* dest, Integer matrix, Integer levels) {
-  return RunFilter(self, dest, {.Groups = FilterRules::GrayAndRGB}, [&](const FilterCall& call) {
-    const DitherMatrix* cells = MatrixOf(matrix);
-    if (!cells) return true;
+  const DitherMatrix* cells = MatrixOf(matrix);
+  const FilterRules rules{.Groups = FilterRules::GrayAndRGB, .Writes = cells != nullptr};
+  return RunFilter(self, dest, rules, [&](const FilterCall& call) {
     const Dither dither(cells->Side, std::clamp(levels, 2, 256));
-    const bool runs = call.Source.Width > 0 && LieAlike(call.In, call.Out) &&
-                      (!call.SharesPixels || &call.Source == &call.Dest);
+    const bool runs = LieAlike(call.In, call.Out) && (!call.SharesPixels || &call.Source == &call.Dest);
     if (!runs) return DitherSamples(call, *cells, dither);
     return FillPixels(call.In) ? DitherRuns<false>(call, *cells, dither)
                                : DitherRuns<true>(call, *cells, dither);

@@ -79,13 +79,11 @@ class FractionalBlur {
 }
 
 PictureZOR* BoxBlurFractionalFilter(PictureZOR* self, PictureZOR* dest, Double radius) {
-  bool served = false;
   Held result{RunFilter(self, dest, {}, [&](const FilterCall& call) {
-    served = true;
     const double fraction = radius - std::floor(radius), f = std::isnan(fraction) ? 0 : fraction;
-    return call.Source.Width < 1 || FractionalBlur(call, {f, 1.0 / (f + f + 1.0)}).Run();
+    return FractionalBlur(call, {f, 1.0 / (f + f + 1.0)}).Run();
   })};
-  return served ? result.HandOn() : nullptr;
+  return GroupOf(DataOf(self)) == Group::None ? nullptr : result.HandOn();
 }
 
 }

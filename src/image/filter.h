@@ -18,6 +18,8 @@ struct FilterRules {
   /// Whether the pixels of a given `dest` must be of the size of the source's. Those of a new picture for a
   /// view of wider pixels never are.
   bool SamePixelSize = false;
+  /// Whether the call's numbers ask for anything to be written.
+  bool Writes = true;
 };
 
 /// A filter's two pictures, both usable, with the planes of the source's group in each.
@@ -32,10 +34,10 @@ struct FilterCall {
 };
 
 /// The way into every method with a `dest`. Takes `dest`, or makes a picture of the source's size and format,
-/// and runs body once if the source's group is served. The result is the destination with a reference for the
-/// caller. Nil when a picture isn't usable, when `dest` is smaller than the result or lacks a plane that
-/// would be written, when it is the source and may not be, or when a body that gives a Boolean gives false:
-/// a row can't be reached then, and what was written until then stays.
+/// and runs body once if the source's group is served and there is anything to write. The result is the
+/// destination with a reference for the caller. Nil when a picture isn't usable; when `dest`, if it would be
+/// written, is smaller than the result or lacks a plane, or is the source and may not be; or when a body that
+/// gives a Boolean gives false: a row can't be reached then, and what was written until then stays.
 template <class Body>
 PictureZOR* RunFilter(PictureZOR* self, PictureZOR* dest, const FilterRules& rules, Body&& body) {
   PictureData& source = DataOf(self);
@@ -44,16 +46,20 @@ PictureZOR* RunFilter(PictureZOR* self, PictureZOR* dest, const FilterRules& rul
   const std::int32_t width = rules.Turned ? source.Height : source.Width;
   const std::int32_t height = rules.Turned ? source.Width : source.Height;
   Held result{dest ? Locked(dest) : CreatePictureThroughFactory(&source, width, height, source.ImageFormat)};
-  if (!result || (result.Object() == self && !rules.InPlace)) return nullptr;
+  if (!result || !Usable(result.Data())) return nullptr;
   PictureData& into = result.Data();
-  if (!Usable(into) || into.Width < width || into.Height < height) return nullptr;
-  Group group = GroupOf(source);
-  if (rules.Groups == FilterRules::GrayAndRGB && group >= Group::CMYK) group = Group::None;
-  if (!HasPlanes(group, into, rules.WritesAlpha)) return nullptr;
-  if (rules.SamePixelSize && dest && group != Group::None && into.PixelSize != source.PixelSize)
+  const Group group = GroupOf(source);
+  const bool served =
+      group != Group::None && (rules.Groups == FilterRules::EveryGroup || group < Group::CMYK);
+  if (!served || !rules.Writes || source.Width < 1) {
+    MayYield(into);
+    return result.HandOn();
+  }
+  if (result.Object() == self && !rules.InPlace) return nullptr;
+  if (into.Width < width || into.Height < height || !HasPlanes(group, into, rules.WritesAlpha))
     return nullptr;
+  if (rules.SamePixelSize && dest && into.PixelSize != source.PixelSize) return nullptr;
   MayYield(into);
-  if (group == Group::None) return result.HandOn();
   const FilterCall call{source,
                         into,
                         group,

@@ -145,6 +145,8 @@ PictureZOR* Clone(PictureZOR* self) {
   return result.HandOn();
 }
 
+bool HasFactory(const PictureData& data) { return data.Factory || GlobalFactory; }
+
 PictureZOR* AskFactories(const PictureData* data, std::int32_t width, std::int32_t height,
                          std::int32_t format) {
   PictureFactoryZOR* const factories[] = {data ? data->Factory : nullptr, GlobalFactory};

@@ -23,6 +23,9 @@ inline bool IsNew(const PictureData& data) { return !data.Valid && !data.Samples
 /// A new, empty object of the class with a reference for the caller; nil when the host has none to give.
 PictureZOR* NewPictureObject();
 
+/// Whether a factory is asked when a picture is made for this one.
+bool HasFactory(const PictureData& data);
+
 /// A picture of at least the given size that the picture's own factory gives, or the global one, with a
 /// reference for the caller; nil without a factory that gives one. `data` may be null.
 PictureZOR* AskFactories(const PictureData* data, std::int32_t width, std::int32_t height,

@@ -107,6 +107,8 @@ TEST(AreaFilters, LeaveRawPixelsAlone) {
   const Picture inks(2, 2, Format::CMYK);
   FillWithNoise(inks, 66);
   EXPECT_EQ(Packed(inks.DiffuseFilter({}, 1)), Samples(16, 0));
+  const Picture small(1, 1, Format::G);
+  EXPECT_EQ(inks.DiffuseFilter(small, 1), small) << "nothing is written, so any picture will do";
   EXPECT_EQ(Packed(inks.EngraveFilter({}, 1)), Samples(16, 0));
 }
 

@@ -120,6 +120,22 @@ void ExpectLikeModel(const AreaFilter& filter, std::initializer_list<std::pair<i
   }
 }
 
+void ExpectUntouched(const Picture& source,
+                     const std::function<Picture(const Picture& source, const Picture& dest)>& run) {
+  const int width = source.Width(), height = source.Height();
+  const Picture fitting(width, height, Format::BGRA), small(1, 1, Format::RGB),
+      gray(width, height, Format::G);
+  for (const Picture& dest : {source, fitting, small, gray}) {
+    SCOPED_TRACE(testing::Message() << dest.Width() << " wide, format " << int(dest.ImageFormat()));
+    FillWithNoise(dest, 61);
+    const auto before = StoredRows(dest);
+    EXPECT_EQ(run(source, dest), dest);
+    EXPECT_EQ(StoredRows(dest), before);
+  }
+  EXPECT_FALSE(run(source, Picture(0, 1, Format::RGB)));
+  EXPECT_EQ(Packed(run(source, {})), Samples(std::size_t(width * height * source.PixelSize())));
+}
+
 void ExpectLikeModelOnEveryTarget(const AreaFilter& filter, Format format,
                                   std::initializer_list<std::pair<int, int>> sizes) {
   const unsigned seed = std::random_device{}();

@@ -41,6 +41,11 @@ struct AreaFilter {
 /// pictures, larger ones with another order of planes, and the source itself.
 void ExpectLikeModel(const AreaFilter& filter, std::initializer_list<std::pair<int, int>> sizes);
 
+/// Runs a filter that has nothing to write on `source`, of the RGB family: any usable `dest` comes back as it
+/// was, though it be the source, or too small, or without the planes.
+void ExpectUntouched(const Picture& source,
+                     const std::function<Picture(const Picture& source, const Picture& dest)>& run);
+
 /// Compares a filter with its model on noise for every instruction set.
 void ExpectLikeModelOnEveryTarget(const AreaFilter& filter, Format format,
                                   std::initializer_list<std::pair<int, int>> sizes);
