@@ -214,33 +214,33 @@ bool Convertible(Format from, Format to) {
   return a == b || a == Format::G || b == Format::G;
 }
 
-void WriteFrom(const Picture& picture, ImageWriter& writer, Format format, Progress& progress) {
+Bytes RowInFileFormat(const Picture& picture, std::int32_t y, Format format) {
   const Format from = picture.ImageFormat();
-  const std::int32_t height = picture.Height();
   const int channels = ChannelsOf(format);
   const bool opaque = HasAlpha(format) && !HasAlpha(from);
   const bool toInk = WithoutAlpha(format) == Format::CMYK && WithoutAlpha(from) == Format::G;
   const bool ofInk = WithoutAlpha(format) == Format::G && WithoutAlpha(from) == Format::CMYK;
-  // The rows of a view are its parent's.
-  const bool asStored = format == from && !picture.Parent();
-  progress.Begin("writing", height);
-  for (std::int32_t y = 0; y < height; ++y, progress.Step()) {
-    if (asStored) {
-      writer.WriteRow(RowOf(picture, y));
-      continue;
+  Bytes row = picture.RowInFormat(y, format);
+  if (row.empty()) throw Failure("a row of a picture can't be converted");
+  if (!opaque && !ofInk && !toInk) return row;
+  for (std::size_t at = 0; at < row.size(); at += std::size_t(channels)) {
+    if (opaque) row[at + std::size_t(channels) - 1] = 255;
+    if (ofInk) row[at] = std::uint8_t(255 - row[at]);
+    if (toInk) {
+      row[at + 3] = std::uint8_t(255 - row[at + 3]);
+      row[at] = row[at + 1] = row[at + 2] = 0;
     }
-    Bytes row = picture.RowInFormat(y, format);
-    if (row.empty()) throw Failure("a row of a picture can't be converted");
-    for (std::size_t at = 0; at < row.size(); at += std::size_t(channels)) {
-      if (opaque) row[at + std::size_t(channels) - 1] = 255;
-      if (ofInk) row[at] = std::uint8_t(255 - row[at]);
-      if (toInk) {
-        row[at + 3] = std::uint8_t(255 - row[at + 3]);
-        row[at] = row[at + 1] = row[at + 2] = 0;
-      }
-    }
-    writer.WriteRow(row.data());
   }
+  return row;
+}
+
+void WriteFrom(const Picture& picture, ImageWriter& writer, Format format, Progress& progress) {
+  const std::int32_t height = picture.Height();
+  // The rows of a view are its parent's.
+  const bool asStored = format == picture.ImageFormat() && !picture.Parent();
+  progress.Begin("writing", height);
+  for (std::int32_t y = 0; y < height; ++y, progress.Step())
+    writer.WriteRow(asStored ? RowOf(picture, y) : RowInFileFormat(picture, y, format).data());
 }
 
 }

@@ -52,8 +52,10 @@ ImageInfo Upright(const ImageInfo& info);
 void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress);
 /// Whether `WriteFrom` has a way from a picture's format to a file's.
 bool Convertible(Format from, Format to);
-/// Writes all rows in a format of files. A missing alpha becomes opaque. Gray becomes black ink alone, and
-/// gray comes of black ink alone.
+/// A row in a format of files. A missing alpha becomes opaque. Gray becomes black ink alone, and gray comes
+/// of black ink alone.
+Bytes RowInFileFormat(const Picture& picture, std::int32_t y, Format format);
+/// Writes all rows in a format of files.
 void WriteFrom(const Picture& picture, ImageWriter& writer, Format format, Progress& progress);
 
 }

@@ -46,10 +46,11 @@ class Operation {
   virtual Dependence DependsOn(const Shape&) const { return {}; }
   /// The pictures of the source's size that the work takes at a time, source and result included.
   virtual int Pictures() const { return 2; }
-  /// The result of a whole picture, or of a band of rows with those in reach. In place where that can be: the
+  /// The result of a whole picture, or of a band of rows with those in reach, of which the topmost is row
+  /// `first` of the whole source. In place where that can be: the
   /// source may come back changed, and is lost otherwise. The source may be a view. New pictures live where
   /// `stores` says. Throws files::Failure where it can't be done.
-  virtual Picture Apply(Picture source, const files::StoreOptions& stores) const = 0;
+  virtual Picture Apply(Picture source, std::int32_t first, const files::StoreOptions& stores) const = 0;
 };
 
 }

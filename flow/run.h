@@ -1,0 +1,40 @@
+#pragma once
+#include <memory>
+#include <span>
+#include <vector>
+
+#include "operation.h"
+#include "progress.h"
+#include "rows.h"
+
+namespace picturezor::flow {
+
+using Chain = std::vector<std::unique_ptr<const Operation>>;
+
+struct RunOptions {
+  /// Where pictures that have to stand whole live. With Store::Auto rows go straight from operation to
+  /// operation where they can; otherwise every picture on the way stands whole, in memory or mapped.
+  files::StoreOptions Stores;
+  /// Threads to work on; 0 is one a processor. The result doesn't depend on it.
+  int Threads = 0;
+};
+
+/// What comes out of operations one after the other. Throws files::Failure where one isn't there for what it
+/// gets.
+Shape ResultOf(const Shape& source, const Chain& chain);
+
+/// The rows of a file, upright.
+std::unique_ptr<Rows> Open(std::unique_ptr<files::ImageReader> reader, const RunOptions& options,
+                           files::Progress& progress);
+/// The rows of the result of operations. The chain outlives it.
+std::unique_ptr<Rows> Through(std::unique_ptr<Rows> source, const Chain& chain, const RunOptions& options,
+                              files::Progress& progress);
+/// All rows as a picture.
+Picture Gather(Rows& rows, const files::StoreOptions& stores, files::Progress& progress);
+
+/// Carries a file's picture through operations into another file, as pixels of `format`, one of those of
+/// files to which there is a way; see files::Convertible. The writer is finished at the end.
+void Run(std::unique_ptr<files::ImageReader> reader, const Chain& chain, Format format,
+         files::ImageWriter& writer, const RunOptions& options, files::Progress& progress);
+
+}
