@@ -19,7 +19,7 @@ class SourceRows {
       : Of(call.Source),
         Packing(packing),
         Copies(call.SharesPixels),
-        Line(NewBuffer(std::size_t(packing.Samples()))),
+        Line(NewBuffer(2, packing.Samples())),
         Copy(NewBuffer(Copies ? Of.Height : 0, packing.Samples())) {}
   explicit operator bool() const { return Line && (Copy || !Copies); }
 
@@ -36,6 +36,16 @@ class SourceRows {
   bool With(std::int64_t y, Work&& work) {
     if (Copies) return work(static_cast<const Sample*>(Copied(y))), true;
     return WithRow(Of, std::int32_t(y), [&](Sample* row) { work(Packing.Packed(row, Line.get())); });
+  }
+  /// The same with two rows.
+  template <class Work>
+  bool With(std::int64_t a, std::int64_t b, Work&& work) {
+    if (Copies)
+      return work(static_cast<const Sample*>(Copied(a)), static_cast<const Sample*>(Copied(b))), true;
+    return Walk(From(Of, std::int32_t(a)), From(Of, std::int32_t(b)))
+        .Rows(1, [&](std::int32_t, Sample* rowA, Sample* rowB) {
+          work(Packing.Packed(rowA, Line.get()), Packing.Packed(rowB, Line.get() + Packing.Samples()));
+        });
   }
 
  private:
@@ -58,12 +68,18 @@ void AddTimes(Sum* sums, const Sample* row, Sum times, std::ptrdiff_t count) {
   for (std::ptrdiff_t i = 0; i < count; ++i) sums[i] = Sum(sums[i] + times * row[i]);
 }
 template <class Sum>
-void Subtract(Sum* sums, const Sample* row, std::ptrdiff_t count) {
-  for (std::ptrdiff_t i = 0; i < count; ++i) sums[i] = Sum(sums[i] - row[i]);
-}
-template <class Sum>
 void Divide(const Sum* sums, Sample* out, std::ptrdiff_t count, BoxMean<Sum> mean) {
   for (std::ptrdiff_t i = 0; i < count; ++i) out[i] = mean(sums[i]);
+}
+/// Moves the sums on by a row, and divides them.
+template <class Sum>
+void MoveOn(Sum* sums, const Sample* entering, const Sample* leaving, Sample* out, std::ptrdiff_t count,
+            BoxMean<Sum> mean) {
+  for (std::ptrdiff_t i = 0; i < count; ++i) {
+    const Sum sum = Sum(sums[i] + entering[i] - leaving[i]);
+    sums[i] = sum;
+    out[i] = mean(sum);
+  }
 }
 
 /// The sums of the columns over 2r + 1 rows.
@@ -76,22 +92,17 @@ class ColumnSums {
 
   /// Writes the means around row y; y is 0 first, then one more each time.
   bool MoveTo(std::int64_t y, SourceRows& source, Sample* out) {
+    if (y > 0)
+      return source.With(std::min(y + Radius, Height - 1), std::max<std::int64_t>(y - 1 - Radius, 0),
+                         [&](const Sample* entering, const Sample* leaving) {
+                           OnBestTarget<MoveOn<Sum>>(Sums(), entering, leaving, out, Samples, Mean);
+                         });
+    std::fill_n(Sums(), Samples, Sum{0});
     bool reached = true;
-    const auto add = [&](std::int64_t row, std::int64_t times) {
-      reached = reached && source.With(row, [&](const Sample* samples) {
-        OnBestTarget<AddTimes<Sum>>(Sums(), samples, Sum(times), Samples);
+    for (std::int64_t row = 0; reached && row < Height && row <= Radius; ++row)
+      reached = source.With(row, [&](const Sample* samples) {
+        OnBestTarget<AddTimes<Sum>>(Sums(), samples, Sum(TimesMet(row, Height, Radius)), Samples);
       });
-    };
-    if (y == 0) {
-      std::fill_n(Sums(), Samples, Sum(Mean.Bias));
-      for (std::int64_t row = 0; row < Height && row <= Radius; ++row)
-        add(row, TimesMet(row, Height, Radius));
-    } else {
-      reached = source.With(std::max<std::int64_t>(y - 1 - Radius, 0), [&](const Sample* samples) {
-        OnBestTarget<Subtract<Sum>>(Sums(), samples, Samples);
-      });
-      add(std::min(y + Radius, Height - 1), 1);
-    }
     if (reached) OnBestTarget<Divide<Sum>>(static_cast<const Sum*>(Sums()), out, Samples, Mean);
     return reached;
   }
@@ -105,40 +116,61 @@ class ColumnSums {
   Buffer Memory;
 };
 
-/// Means along a row, whose first and last pixel are repeated over `reach` pixels to the left and reach + 1
-/// to the right of it. Beyond the width of the row r makes no difference but to how often they count.
-template <class Sum, int N>
-void MeansAlong(const Sample* row, Sample* out, std::ptrdiff_t width, std::ptrdiff_t reach, std::int64_t r,
-                BoxMean<Sum> mean) {
-  Sum sums[N];
-  for (int c = 0; c < N; ++c) {
-    sums[c] = Sum(mean.Bias);
-    for (std::ptrdiff_t x = 0; x < width && x <= r; ++x)
-      sums[c] = Sum(sums[c] + Sum(TimesMet(x, width, r)) * row[x * N + c]);
-  }
-  const Sample *leaving = row - reach * N, *entering = row + (reach + 1) * N;
-  for (std::ptrdiff_t i = 0; i < width * N; i += N)
-    for (int c = 0; c < N; ++c) {
-      out[i + c] = mean(sums[c]);
-      sums[c] = Sum(sums[c] + entering[i + c] - leaving[i + c]);
+/// Lanes that a row's sums are made in.
+constexpr std::ptrdiff_t Lanes = 8;
+template <class Sum>
+struct SumLanes {
+  typedef Sum Vector __attribute__((vector_size(Lanes * sizeof(Sum))));
+};
+
+/// Adds to each lane the one `By` lanes before it, where there is one.
+template <int By, class Vector>
+void AddShifted(Vector& v) {
+  constexpr auto lane = [](int j) { return j < By ? j : j - By + int(Lanes); };
+  const Vector none{};
+  [&]<std::size_t... J>(std::index_sequence<J...>) { v += __builtin_shufflevector(none, v, lane(int(J))...); }
+  (std::make_index_sequence<Lanes>{});
+}
+/// Repeats the last N lanes over all: by way of one half, which machines without a free shuffle do well.
+template <int N, class Vector>
+void RepeatLast(Vector& v) {
+  constexpr auto lane = [](int j) { return int(Lanes) - N + j % N; };
+  [&]<std::size_t... J>(std::index_sequence<J...>) {
+    if constexpr (N <= 4) {
+      v = __builtin_shufflevector(v, v, (4 + int(J) % 4)...);
+      v = __builtin_shufflevector(v, v, (J < 4 ? lane(int(J)) - 4 : int(J))...);
+      v = __builtin_shufflevector(v, v, (J < 4 ? int(J) : lane(int(J)))...);
+    } else {
+      v = __builtin_shufflevector(v, v, lane(int(J))...);
     }
+  }
+  (std::make_index_sequence<Lanes>{});
 }
 
-/// The same for rows that r doesn't reach beyond, in vectors: the sum of a stretch is the difference between
-/// two of the sums of all samples up to a place, even where those have run over. Such a sum is the one 32
-/// pixels before and four sums of eight, so no step waits for the one before, and vectors are loaded as they
-/// were stored. 32 pixels before `begin`, where the row extended by r pixels begins, are zero, and so are
-/// those before `eights` and `sums`.
+/// The means along a row, from the sums before its first pixel and what enters and leaves at each. Reads on
+/// up to a whole number of lanes.
 template <class Sum, int N>
-void MeansByDifference(const Sample* begin, Sample* out, Sum* eights, Sum* sums, std::ptrdiff_t width,
-                       std::ptrdiff_t r, BoxMean<Sum> mean) {
-  for (std::ptrdiff_t i = 0; i < (width + 2 * r) * N; ++i)
-    eights[i] = Sum(begin[i] + begin[i - N] + begin[i - 2 * N] + begin[i - 3 * N] + begin[i - 4 * N] +
-                    begin[i - 5 * N] + begin[i - 6 * N] + begin[i - 7 * N]);
-  for (std::ptrdiff_t i = 0; i < (width + 2 * r) * N; ++i)
-    sums[i] = Sum(sums[i - 32 * N] + eights[i] + eights[i - 8 * N] + eights[i - 16 * N] + eights[i - 24 * N]);
-  const Sum* const last = sums + 2 * r * N;
-  for (std::ptrdiff_t i = 0; i < width * N; ++i) out[i] = mean(Sum(last[i] - sums[i - N] + mean.Bias));
+void MeansAlong(const Sample* entering, const Sample* leaving, std::array<Sum, 5> before, Sample* out,
+                std::ptrdiff_t count, BoxMean<Sum> mean) {
+  constexpr std::ptrdiff_t Stretch = 2048;
+  Sum sums[Stretch];
+  typename SumLanes<Sum>::Vector last;
+  for (int j = 0; j < Lanes; ++j) last[j] = before[std::size_t(j % N)];
+  for (std::ptrdiff_t first = 0; first < count; first += Stretch) {
+    const std::ptrdiff_t some = std::min(Stretch, count - first);
+    for (std::ptrdiff_t i = 0; i < some; i += Lanes) {
+      typename SumLanes<Sum>::Vector v;
+      for (int j = 0; j < Lanes; ++j) v[j] = Sum(entering[first + i + j] - leaving[first + i + j]);
+      AddShifted<N>(v);
+      if constexpr (2 * N < Lanes) AddShifted<2 * N>(v);
+      if constexpr (4 * N < Lanes) AddShifted<4 * N>(v);
+      v += last;
+      std::memcpy(sums + i, &v, sizeof v);
+      last = v;
+      RepeatLast<N>(last);
+    }
+    Divide<Sum>(sums, out + first, some, mean);
+  }
 }
 
 /// A row with room for its repeated ends.
@@ -150,39 +182,34 @@ class ExtendedRow {
         Reach(std::ptrdiff_t(std::min<std::int64_t>(width, r))),
         Radius(r),
         Pixel(planes),
-        Memory(NewBuffer(Samples(), 1)),
-        Eights(NewBuffer(Samples(), sizeof(Sum))),
-        Sums(NewBuffer(Samples(), sizeof(Sum))) {}
-  explicit operator bool() const { return Memory && Eights && Sums; }
+        Memory(NewBuffer((Width + 2 * std::int64_t{Reach} + 1) * Pixel + Lanes, 1)) {}
+  explicit operator bool() const { return Memory != nullptr; }
 
-  Sample* Row() const { return Memory.get() + (Before + Reach) * Pixel; }
+  Sample* Row() const { return Memory.get() + (Reach + 1) * Pixel; }
 
+  /// Means along the row. Beyond its width the radius makes no difference but to how often the ends count.
   void Means(Sample* out, const BoxMean<Sum>& mean) const {
     Sample *first = Row(), *end = first + Width * Pixel;
-    for (std::ptrdiff_t i = 1; i <= Reach; ++i) std::copy_n(first, Pixel, first - i * Pixel);
-    for (std::ptrdiff_t i = 0; i <= Reach; ++i) std::copy_n(end - Pixel, Pixel, end + i * Pixel);
+    for (std::ptrdiff_t i = 1; i <= Reach + 1; ++i) std::copy_n(first, Pixel, first - i * Pixel);
+    for (std::ptrdiff_t i = 0; i < Reach; ++i) std::copy_n(end - Pixel, Pixel, end + i * Pixel);
+    const Sample *entering = first + Reach * Pixel, *leaving = first - (Reach + 1) * Pixel;
+    std::array<Sum, 5> before{};
+    for (int c = 0; c < Pixel; ++c) {
+      Sum sum = Sum(leaving[c] - entering[c]);
+      for (std::ptrdiff_t x = 0; x < Width && x <= Radius; ++x)
+        sum = Sum(sum + Sum(TimesMet(x, Width, Radius)) * first[x * Pixel + c]);
+      before[std::size_t(c)] = sum;
+    }
     ForPlaneCount(Pixel, [&](auto n) {
-      if constexpr (sizeof(Sum) <= 4)
-        if (Reach == Radius)
-          return OnBestTarget<MeansByDifference<Sum, n>>(
-              static_cast<const Sample*>(Memory.get() + Before * n), out, At(Eights), At(Sums), Width, Reach,
-              mean);
-      OnBestTarget<MeansAlong<Sum, n>>(static_cast<const Sample*>(first), out, Width, Reach, Radius, mean);
+      OnBestTarget<MeansAlong<Sum, n>>(entering, leaving, before, out, Width * n, mean);
     });
   }
 
  private:
-  static constexpr std::ptrdiff_t Before = 32;
-
-  std::int64_t Samples() const {
-    return (std::int64_t{Before} + Width + std::int64_t{2} * Reach + 1) * Pixel;
-  }
-  Sum* At(const Buffer& buffer) const { return reinterpret_cast<Sum*>(buffer.get()) + Before * Pixel; }
-
   std::ptrdiff_t Width, Reach;
   std::int64_t Radius;
   int Pixel;
-  Buffer Memory, Eights, Sums;
+  Buffer Memory;
 };
 
 /// False when a row can't be reached. Without memory nothing is done.

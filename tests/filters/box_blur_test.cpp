@@ -160,14 +160,14 @@ TEST(BoxMean, EqualsTheDivision) {
   for (std::int64_t n = 3; zor::BoxMean<std::uint16_t>::Holds(n); n += 2) {
     const zor::BoxMean<std::uint16_t> mean(n);
     for (std::int64_t sum = 0; sum <= 255 * n; ++sum)
-      ASSERT_EQ(mean(std::uint16_t(mean.Bias + sum)), sum / n) << sum << " / " << n;
+      ASSERT_EQ(mean(std::uint16_t(sum)), sum / n) << sum << " / " << n;
   }
   for (std::int64_t n = 3; zor::BoxMean<std::uint32_t>::Holds(n); n += n < 100000 ? 2 : 12346) {
     const zor::BoxMean<std::uint32_t> mean(n);
     for (std::int64_t multiple = 0; multiple <= 255 * n; multiple += n)
       for (const std::int64_t sum : {multiple - 1, multiple, multiple + n / 2})
         if (sum >= 0 && sum <= 255 * n) {
-          ASSERT_EQ(mean(std::uint32_t(mean.Bias + sum)), sum / n) << sum << " / " << n;
+          ASSERT_EQ(mean(std::uint32_t(sum)), sum / n) << sum << " / " << n;
         }
   }
 }
