@@ -43,10 +43,11 @@ std::vector<RowRange> BandChain::Ranges(RowRange result) const {
   return ranges;
 }
 
-Picture BandChain::Apply(Picture source, RowRange result, const files::StoreOptions& stores) const {
+Picture BandChain::Apply(Picture source, RowRange result, Workplace at) const {
   const std::vector<RowRange> ranges = Ranges(result);
   for (std::size_t i = 0; i < Chain.size(); ++i) {
-    source = Chain[i]->Apply(std::move(source), std::int32_t(ranges[i].First), stores);
+    at.FirstRow = std::int32_t(ranges[i].First);
+    source = Chain[i]->Apply(std::move(source), at);
     if (source.Height() != ranges[i].Count() || source.Width() != Shapes[i + 1].Width)
       throw files::Failure("a step gave a band of another size than it said");
     const std::int64_t top = ranges[i + 1].First - (ranges[i].First - Needs[i].First);

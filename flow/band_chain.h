@@ -29,7 +29,7 @@ class BandChain {
   /// The rows of the source that some rows of the result are made of.
   RowRange SourceOf(RowRange result) const { return Ranges(result).front(); }
   /// Rows of the result, out of the rows SourceOf(result) of the source, whose samples are lost.
-  Picture Apply(Picture source, RowRange result, const files::StoreOptions& stores) const;
+  Picture Apply(Picture source, RowRange result, Workplace at) const;
 
  private:
   /// The rows of each of the shapes that some rows of the result are made of.

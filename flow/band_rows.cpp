@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cstring>
-#include <limits>
 #include <system_error>
 
 #include "failure.h"
@@ -126,7 +125,8 @@ Picture BandRows::ReadBand(RowRange rows, std::int64_t nextFirst) {
 }
 
 void BandRows::Work() {
-  const files::StoreOptions inMemory{files::Store::Memory, std::numeric_limits<std::int64_t>::max(), {}};
+  Workplace here;
+  here.Stores.Kind = files::Store::Memory;
   for (;;) {
     Band* band;
     {
@@ -137,7 +137,7 @@ void BandRows::Work() {
       if (band->Done) continue;
     }
     try {
-      band->Result = Packed(Chain.Apply(band->Source, band->Rows, inMemory), About());
+      band->Result = Packed(Chain.Apply(band->Source, band->Rows, here), About());
     } catch (...) {
       band->Failed = std::current_exception();
     }

@@ -15,10 +15,10 @@ Shape InFormat::Result(const Shape& source) const {
   return result;
 }
 
-Picture InFormat::Apply(Picture source, std::int32_t, const files::StoreOptions& stores) const {
+Picture InFormat::Apply(Picture source, const Workplace& at) const {
   if (source.ImageFormat() == To) return source;
   const std::int32_t width = source.Width(), height = source.Height();
-  Picture result = files::MakePictures(stores, {{width, height, To}})[0];
+  Picture result = files::MakePictures(at.Stores, {{width, height, To}})[0];
   for (std::int32_t y = 0; y < height; ++y) {
     const Bytes row = files::RowInFileFormat(source, y, To);
     std::memcpy(RowOf(result, y), row.data(), row.size());

@@ -9,7 +9,7 @@ class InFormat final : public Operation {
   explicit InFormat(Format format) : To(format) {}
   Shape Result(const Shape& source) const override;
   Dependence DependsOn(const Shape&) const override { return {.Of = Dependence::Kind::Bands}; }
-  Picture Apply(Picture source, std::int32_t first, const files::StoreOptions& stores) const override;
+  Picture Apply(Picture source, const Workplace& at) const override;
 
  private:
   Format To;

@@ -36,6 +36,16 @@ struct Dependence {
   std::int32_t Period = 1;
 };
 
+/// Where and how an operation works.
+struct Workplace {
+  /// Where new pictures live.
+  files::StoreOptions Stores;
+  /// The row of the whole source that the picture at hand begins with.
+  std::int32_t FirstRow = 0;
+  /// Threads that the work may keep busy. With 1 it stays on the calling thread.
+  int Threads = 1;
+};
+
 /// What a step does to a picture, its options known. It keeps nothing from call to call, so it may work on
 /// several threads at once, each with pictures of its own.
 class Operation {
@@ -46,11 +56,10 @@ class Operation {
   virtual Dependence DependsOn(const Shape&) const { return {}; }
   /// The pictures of the source's size that the work takes at a time, source and result included.
   virtual int Pictures() const { return 2; }
-  /// The result of a whole picture, or of a band of rows with those in reach, of which the topmost is row
-  /// `first` of the whole source. In place where that can be: the
-  /// source may come back changed, and is lost otherwise. The source may be a view. New pictures live where
-  /// `stores` says. Throws files::Failure where it can't be done.
-  virtual Picture Apply(Picture source, std::int32_t first, const files::StoreOptions& stores) const = 0;
+  /// The result of a whole picture, or of a band of rows with those in reach. In place where that can be: the
+  /// source may come back changed, and is lost otherwise. The source may be a view. Throws files::Failure
+  /// where it can't be done.
+  virtual Picture Apply(Picture source, const Workplace& at) const = 0;
 };
 
 }

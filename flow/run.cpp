@@ -98,14 +98,14 @@ class Stream {
     if (Coming) Whole = Gather(*TakeComing(), stores, Report);
     Report.Begin("working");
     if (work.DependsOn(Of).Of != Kind::Bands) {
-      Whole = work.Apply(std::move(Whole), 0, stores);
+      Whole = work.Apply(std::move(Whole), {.Stores = stores, .Threads = ThreadsOf(Options)});
       return;
     }
     const BandChain chain({&work}, Of);
     const RowRange all{0, chain.Result().Height}, rows = chain.SourceOf(all);
     if (rows.Count() < Of.Height)
       Whole = Whole.ClipImage({0, std::int32_t(rows.First), Of.Width, std::int32_t(rows.Count())});
-    Whole = chain.Apply(std::move(Whole), all, stores);
+    Whole = chain.Apply(std::move(Whole), all, {.Stores = stores, .Threads = ThreadsOf(Options)});
   }
 
   std::unique_ptr<Rows> Coming;
