@@ -47,9 +47,15 @@ void AddQualityOption(CLI::App& command, Session& session) {
 
 OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
     : File(file),
-      Reader(OpenImage(file, {session.Stores.MemoryLimit})),
+      Reader(OpenImage(file, {.MemoryLimit = session.Stores.MemoryLimit})),
       Upright(files::Upright(Reader->Info())) {
   for (const std::string& note : Upright.Notes) session.Note(file, note);
+}
+
+void OpenedImage::Limit(const Rect& part) {
+  const Rect stored = Stored(part, Reader->Info());
+  Reader = PartOf(std::move(Reader), stored);
+  Upright = files::Upright(Reader->Info());
 }
 
 Target::Target(const std::filesystem::path& file) : File(file), Type(TypeByExtension(file)) {}

@@ -50,6 +50,8 @@ struct OpenedImage {
 
   OpenedImage(Session& session, const std::filesystem::path& file);
   PictureSize Size() const { return {Upright.Width, Upright.Height, Upright.Pixels}; }
+  /// From now on only this part of the upright picture counts.
+  void Limit(const Rect& part);
   /// Reads all of it, once.
   void ReadInto(Session& session, const Picture& picture) { files::ReadInto(picture, *Reader, session.Bar); }
 };

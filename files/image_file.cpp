@@ -28,6 +28,14 @@ bool StartsWith(std::span<const std::uint8_t> bytes, std::string_view magic) {
   return bytes.size() >= magic.size() && std::memcmp(bytes.data(), magic.data(), magic.size()) == 0;
 }
 
+void ImageReader::ReadRows(std::uint8_t* rows, std::ptrdiff_t stride, std::int32_t count) {
+  for (std::int32_t i = 0; i < count; ++i, rows += stride) ReadRow(rows);
+}
+
+void ImageWriter::WriteRows(const std::uint8_t* rows, std::ptrdiff_t stride, std::int32_t count) {
+  for (std::int32_t i = 0; i < count; ++i, rows += stride) WriteRow(rows);
+}
+
 std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, const ReadOptions& options) {
   Bytes start(64);
   {

@@ -42,8 +42,20 @@ class ImageReader {
   virtual ~ImageReader() = default;
   const ImageInfo& Info() const { return About; }
   virtual const FileType& Type() const = 0;
+  /// Before the first row: a type that can give the picture smaller for less work (JPEG by its transform, a
+  /// file with smaller copies of itself) does so, as long as it stays at least this large; the proportions
+  /// stay to within a pixel. Info() tells what comes then. Other types change nothing.
+  virtual void Reduce(std::int32_t /*leastWidth*/, std::int32_t /*leastHeight*/) {}
+  /// From now on ReadRow gives the rows of this part, counted in pixels as they are stored; Info() has its
+  /// size. False where the type reads only whole rows from the top; `PartOf` serves those too.
+  virtual bool Select(const Rect& /*part*/) { return false; }
+  /// Whether a part costs little more than its own pixels, wherever it lies. Select may then be called again
+  /// and again, after any row.
+  virtual bool StartsAnywhere() const { return false; }
   /// The next row, packed pixels of Info().Pixels. To be called Info().Height times.
   virtual void ReadRow(std::uint8_t* row) = 0;
+  /// The next rows, `stride` bytes from one to the next.
+  virtual void ReadRows(std::uint8_t* rows, std::ptrdiff_t stride, std::int32_t count);
   /// To be called after the last row: reads what stands behind the pixels, so that a file which is cut off
   /// there is noticed too.
   virtual void Finish() = 0;
@@ -57,6 +69,8 @@ class ImageWriter {
  public:
   virtual ~ImageWriter() = default;
   virtual void WriteRow(const std::uint8_t* row) = 0;
+  /// The next rows, `stride` bytes from one to the next.
+  virtual void WriteRows(const std::uint8_t* rows, std::ptrdiff_t stride, std::int32_t count);
   /// To be called after the last row: the file is complete then.
   virtual void Finish() = 0;
 };
@@ -64,11 +78,29 @@ class ImageWriter {
 struct ReadOptions {
   /// Bytes that a file may need for itself beside one row (interlaced PNG, progressive JPEG, large tiles).
   std::int64_t MemoryLimit = 0;
+  /// Threads that may decode beside the caller's; 0 stands for one a processor. The pixels don't depend on
+  /// it.
+  int Threads = 0;
+  /// Which picture of a file with several, from 0 on.
+  int Page = 0;
 };
+
+enum class Compression { Usual, None, LZW, Deflate, Zstd, JPEG, WebP };
 
 struct WriteOptions {
   /// 1 to 100, for JPEG. From 90 on colours are kept at full resolution.
   int Quality = 90;
+  /// How TIFF packs its samples. Types with one way only refuse others than Usual.
+  Compression Packing = Compression::Usual;
+  /// The effort of deflate, 0 to 9.
+  std::optional<int> Level;
+  /// For TIFF: the edge of square tiles, a multiple of 16; 0 makes strips.
+  std::int32_t Tile = 0;
+  /// For TIFF: offsets of 64 bits however small the file is; smaller copies of the picture, each half as
+  /// large as the one before, down to a tile.
+  bool Big = false, Pyramid = false;
+  /// Threads that may encode beside the caller's; 0 stands for one a processor. The bytes don't depend on it.
+  int Threads = 0;
 };
 
 /// A type of image files: a row of the list in file_types.cpp, standing in the file of its reader and writer.
@@ -94,6 +126,9 @@ std::span<const FileType* const> FileTypes();
 /// Opens an image file of any of the types, told by its first bytes. A file whose size can't hold the pixels
 /// that it claims is refused before anything of their size is allocated.
 std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, const ReadOptions& options);
+
+/// Reads a part of a picture, which must lie within it. What lies below the part isn't looked at.
+std::unique_ptr<ImageReader> PartOf(std::unique_ptr<ImageReader> reader, const Rect& part);
 
 /// The type that the file's extension stands for. Throws UsageFailure.
 const FileType& TypeByExtension(const std::filesystem::path& file);

@@ -23,7 +23,7 @@ Format FileFormatOf(const std::filesystem::path& file, const Picture& picture) {
 
 Picture LoadImage(const std::filesystem::path& file) {
   const StoreOptions stores{Store::Auto, DefaultMemoryLimit(), DefaultTempDirectory()};
-  const auto reader = OpenImage(file, {stores.MemoryLimit});
+  const auto reader = OpenImage(file, {.MemoryLimit = stores.MemoryLimit});
   const ImageInfo upright = Upright(reader->Info());
   Picture picture = MakePictures(stores, {{upright.Width, upright.Height, upright.Pixels}})[0];
   Silence silent;

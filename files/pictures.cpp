@@ -190,6 +190,17 @@ ImageInfo Upright(const ImageInfo& info) {
   return upright;
 }
 
+Rect Stored(const Rect& upright, const ImageInfo& info) {
+  Rect part = upright;
+  if (info.Orientation >= 5) part = {part.Y, part.X, part.Height, part.Width};
+  const int turned = info.Orientation;
+  const bool mirrored = turned == 2 || turned == 3 || turned == 7 || turned == 8;
+  const bool fromBottom = turned == 3 || turned == 4 || turned == 6 || turned == 7;
+  if (mirrored) part.X = info.Width - part.X - part.Width;
+  if (fromBottom) part.Y = info.Height - part.Y - part.Height;
+  return part;
+}
+
 void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress) {
   const ImageInfo& info = reader.Info();
   progress.Begin("reading", info.Height);

@@ -48,6 +48,8 @@ struct PicturesLike {
 
 /// What an image file is once its orientation has been applied.
 ImageInfo Upright(const ImageInfo& info);
+/// Where a part of the upright image is stored.
+Rect Stored(const Rect& upright, const ImageInfo& info);
 /// Reads all rows into a picture of the upright size and the file's format.
 void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress);
 /// Whether `WriteFrom` has a way from a picture's format to a file's.

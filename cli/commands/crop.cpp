@@ -24,10 +24,10 @@ int Crop(Session& session, const CropOptions& options) {
                                   std::to_string(size.Width) + " x " + std::to_string(size.Height));
   const Format format = target.Storable(session, size.Of);
   target.Start(width, height);
-  const auto pictures = MakePictures(session.Stores, {size});
+  source.Limit({std::int32_t(x), std::int32_t(y), std::int32_t(width), std::int32_t(height)});
+  const auto pictures = MakePictures(session.Stores, {source.Size()});
   source.ReadInto(session, pictures[0]);
-  const Picture part = pictures[0].ClipImage({int(x), int(y), int(width), int(height)});
-  target.Write(session, part, format, source.Upright);
+  target.Write(session, pictures[0], format, source.Upright);
   target.Commit();
   return Done;
 }

@@ -146,12 +146,13 @@ class TileBand : public PlaneSource {
   }
 
   const std::uint8_t* Row(std::int64_t y) override {
-    if (y % TileHeight == 0) Fill(y);
+    if (y < Top || y >= Top + TileHeight) Fill(y - y % TileHeight);
     return Band.data() + BandRow * std::size_t(y % TileHeight);
   }
 
  private:
   void Fill(std::int64_t y) {
+    Top = y;
     const std::int64_t rows = std::min(TileHeight, Of.Height - y);
     for (std::int64_t across = 0; across < Across; ++across) {
       const std::uint32_t tile =
@@ -168,6 +169,8 @@ class TileBand : public PlaneSource {
   Layout Of;
   std::uint16_t Plane;
   std::int64_t TileWidth, TileHeight, Across = 0;
+  /// The first row of the band; far away as long as there is none.
+  std::int64_t Top = INT64_MIN / 2;
   std::size_t TileRow = 0, BandRow = 0;
   Bytes Band, Tile;
 };
@@ -202,18 +205,34 @@ class TIFFReader : public ImageReader {
 
   const FileType& Type() const override { return TIFFType; }
 
+  bool Select(const Rect& part) override {
+    About.Width = part.Width;
+    About.Height = part.Height;
+    Left = part.X;
+    NextRow = part.Y;
+    return true;
+  }
+
+  /// A strip that is compressed has to be read from its first row on.
+  bool StartsAnywhere() const override {
+    constexpr std::uint32_t few = 64;
+    return Of.Tiled || Of.Compression == COMPRESSION_NONE ||
+           File->Get<std::uint32_t>(TIFFTAG_ROWSPERSTRIP, UINT32_MAX) <= few;
+  }
+
   void ReadRow(std::uint8_t* row) override {
     for (std::size_t i = 0; i < Sources.size(); ++i)
       if (Sources[i]) Lines[i] = Sources[i]->Row(NextRow);
     ++NextRow;
     const int channels = ChannelsOf(About.Pixels);
     if (Of.Photometric == PHOTOMETRIC_PALETTE) {
-      for (std::int64_t x = 0; x < Of.Width; ++x)
+      for (std::int64_t x = 0; x < About.Width; ++x)
         std::memcpy(row + x * channels, Palette[Raw(x, 0) & 255].data(), 3);
     } else {
       for (int c = 0; c < Of.Colours; ++c) CopySamples(row + c, channels, c);
       if (Of.Photometric == PHOTOMETRIC_MINISWHITE)
-        for (std::int64_t x = 0; x < Of.Width; ++x) row[x * channels] = std::uint8_t(255 - row[x * channels]);
+        for (std::int64_t x = 0; x < About.Width; ++x)
+          row[x * channels] = std::uint8_t(255 - row[x * channels]);
     }
     if (Of.AlphaAt >= 0) CopySamples(row + channels - 1, channels, Of.AlphaAt);
     if (Of.Associated) Divide(row, channels);
@@ -332,7 +351,7 @@ class TIFFReader : public ImageReader {
   /// A sample as it stands in the file; `sample` counts within what is interleaved.
   int Raw(std::int64_t x, int sample) const {
     const std::uint8_t* line = Lines[Of.Planar ? std::size_t(sample) : 0];
-    const std::int64_t at = Of.Planar ? x : x * Of.Samples + sample;
+    const std::int64_t at = Of.Planar ? Left + x : (Left + x) * Of.Samples + sample;
     if (Of.Bits == 8) return line[at];
     if (Of.Bits == 16) {
       std::uint16_t value;
@@ -346,17 +365,18 @@ class TIFFReader : public ImageReader {
   void CopySamples(std::uint8_t* out, int step, int sample) const {
     const int most = (1 << Of.Bits) - 1;
     if (Of.Bits == 8)
-      for (std::int64_t x = 0; x < Of.Width; ++x) out[x * step] = std::uint8_t(Raw(x, sample));
+      for (std::int64_t x = 0; x < About.Width; ++x) out[x * step] = std::uint8_t(Raw(x, sample));
     else if (Of.Bits == 16)
-      for (std::int64_t x = 0; x < Of.Width; ++x)
+      for (std::int64_t x = 0; x < About.Width; ++x)
         out[x * step] = std::uint8_t((Raw(x, sample) * 255u + 32895u) >> 16);
     else
-      for (std::int64_t x = 0; x < Of.Width; ++x) out[x * step] = std::uint8_t(Raw(x, sample) * 255 / most);
+      for (std::int64_t x = 0; x < About.Width; ++x)
+        out[x * step] = std::uint8_t(Raw(x, sample) * 255 / most);
   }
 
   /// Takes the alpha out of colours that have been multiplied by it.
   void Divide(std::uint8_t* row, int channels) const {
-    for (std::int64_t x = 0; x < Of.Width; ++x, row += channels) {
+    for (std::int64_t x = 0; x < About.Width; ++x, row += channels) {
       const int alpha = row[channels - 1];
       for (int c = 0; c < channels - 1; ++c)
         row[c] = std::uint8_t(alpha ? std::min(255, (row[c] * 255 + alpha / 2) / alpha) : 0);
@@ -369,7 +389,7 @@ class TIFFReader : public ImageReader {
   std::vector<std::array<std::uint8_t, 3>> Palette;
   std::vector<std::unique_ptr<PlaneSource>> Sources;
   std::vector<const std::uint8_t*> Lines;
-  std::int64_t NextRow = 0;
+  std::int64_t NextRow = 0, Left = 0;
 };
 
 class TIFFWriter : public ImageWriter {
