@@ -3,6 +3,8 @@
 #include <dlfcn.h>
 
 #include <algorithm>
+#include <atomic>
+#include <mutex>
 
 #include "object_model.h"
 
@@ -16,6 +18,8 @@ std::filesystem::path& LoadedModule() {
   static std::filesystem::path module;
   return module;
 }
+std::mutex LoadMutex;
+std::atomic<bool> Loaded = false;
 
 std::vector<Host::MethodInfo> InfosOf(const std::vector<MethodEntry>& rows) {
   std::vector<Host::MethodInfo> infos;
@@ -29,6 +33,7 @@ std::vector<Host::MethodInfo> InfosOf(const std::vector<MethodEntry>& rows) {
 
 void Host::Load(const std::filesystem::path& module, const Options& options) {
   const std::filesystem::path path = std::filesystem::absolute(module);
+  const std::lock_guard lock(LoadMutex);
   if (IsLoaded()) {
     if (path == LoadedModule()) return;
     throw ModuleError("a module is loaded already: " + LoadedModule().string());
@@ -48,11 +53,16 @@ void Host::Load(const std::filesystem::path& module, const Options& options) {
   entry([](const char* name) { return ServiceNamed(name); });
   ThrowPending();
   LoadedModule() = path;
+  Loaded = true;
 }
 
-bool Host::IsLoaded() { return !LoadedModule().empty(); }
+bool Host::IsLoaded() { return Loaded; }
 
-void Host::OnYield(std::function<void()> hook) { TheRuntime().OnYield = std::move(hook); }
+void Host::OnYield(std::function<void()> hook) {
+  auto next = hook ? std::make_shared<const std::function<void()>>(std::move(hook)) : nullptr;
+  const std::lock_guard lock(TheRuntime().YieldMutex);
+  TheRuntime().OnYield.swap(next);
+}
 
 void Host::MakePicturesAs(PictureForm form) { TheRuntime().Pictures = form; }
 
@@ -64,11 +74,21 @@ void Host::Hide(const std::string& service, bool hidden) {
 
 void Host::FailCreationsAfter(int successes) { TheRuntime().CreationsLeft = successes; }
 
-Host::Alive Host::Count() { return TheRuntime().Alive; }
+Host::Alive Host::Count() {
+  Runtime& runtime = TheRuntime();
+  Alive alive;
+  for (const auto& [name, of] : runtime.Classes) alive.Objects += of.Alive;
+  alive.MemoryBlocks = CountOf("MemoryBlock");
+  alive.Strings = runtime.Alive.Strings;
+  alive.OpenDescriptions = runtime.Alive.OpenDescriptions;
+  alive.GWorlds = runtime.Alive.GWorlds;
+  alive.PixelLocks = runtime.Alive.PixelLocks;
+  return alive;
+}
 
 int Host::CountOf(std::string_view className) {
   const Class* of = FindClass(className);
-  return of ? of->Alive : 0;
+  return of ? of->Alive.load() : 0;
 }
 
 std::vector<Host::MethodInfo> Host::Methods(std::string_view className) {

@@ -1,6 +1,7 @@
 #include "invoke.h"
 
 #include <algorithm>
+#include <unordered_map>
 
 namespace picturezor::model {
 namespace {
@@ -13,6 +14,26 @@ bool Takes(const MethodEntry& row, const std::string& lowerName, TypeList types)
     if (parameters[i].Type != types[i]) return false;
   return types.size() == parameters.size() || parameters[types.size()].Optional;
 }
+
+/// What is asked for: a class, the name of a method, and the address of the list of the arguments' types.
+template <class Text>
+struct Question {
+  const Class* Of;
+  Text Name;
+  const void* Types;
+};
+
+struct SameQuestion {
+  using is_transparent = void;
+  template <class Text>
+  std::size_t operator()(const Question<Text>& asked) const {
+    return std::hash<std::string_view>()(asked.Name) ^ std::hash<const void*>()(asked.Types);
+  }
+  template <class Text, class OtherText>
+  bool operator()(const Question<Text>& a, const Question<OtherText>& b) const {
+    return a.Of == b.Of && a.Types == b.Types && a.Name == b.Name;
+  }
+};
 
 std::string Listed(std::string_view name, TypeList types) {
   std::string text = std::string(name) + "(";
@@ -34,11 +55,14 @@ Found FindMethod(const std::vector<MethodEntry>& rows, std::string_view name, Ty
 
 const Found& FindMethod(const Object& self, std::string_view name, TypeList types) {
   if (!self) throw ModuleError(std::string(name) + ": called on nil");
-  const Class& of = *HeaderOf(self.Address()).Of;
-  const std::pair<std::string_view, const void*> asked(name, types.data());
-  auto found = of.FoundMethods.find(asked);
-  if (found == of.FoundMethods.end())
-    found = of.FoundMethods.emplace(asked, FindMethod(of.Methods, name, types)).first;
+  // Some calls work on a row of a picture only, so a search is much to them.
+  thread_local std::unordered_map<Question<std::string>, Found, SameQuestion, SameQuestion> known;
+  const Question<std::string_view> asked{HeaderOf(self.Address()).Of, name, types.data()};
+  auto found = known.find(asked);
+  if (found == known.end()) {
+    const Found row = FindMethod(asked.Of->Methods, name, types);
+    found = known.emplace(Question<std::string>{asked.Of, std::string(name), asked.Types}, row).first;
+  }
   return found->second;
 }
 

@@ -61,11 +61,17 @@ template <class... A>
 inline constexpr std::array<const char*, sizeof...(A)> TypesOf{Passed<A>::TypeName...};
 using TypeList = std::span<const char* const>;
 
+/// A row found for a call, and those of its parameters whose arguments weren't given.
+struct Found {
+  const MethodEntry* Entry;
+  std::span<const Parameter> Missing;
+};
+
 /// The row with this name that takes arguments of these types, as a compiler would choose it: one that takes
 /// just these first, then one whose further arguments are optional. Throws ModuleError when there is none.
 Found FindMethod(const std::vector<MethodEntry>& rows, std::string_view name, TypeList types);
 
-/// The same for a method of an object, remembered by its class. `types` is one of `TypesOf`. Throws
+/// The same for a method of an object, remembered by each thread. `types` is one of `TypesOf`. Throws
 /// ModuleError for nil, too.
 const Found& FindMethod(const Object& self, std::string_view name, TypeList types);
 

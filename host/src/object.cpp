@@ -21,7 +21,7 @@ Object Object::Share(void* address) {
   return Adopt(address);
 }
 
-int Object::References() const { return At ? HeaderOf(At).References : 0; }
+int Object::References() const { return At ? HeaderOf(At).References.load() : 0; }
 
 MemoryBlock::MemoryBlock(std::size_t size) : Object(Adopt(NewBlock(Bytes(size)))) {}
 

@@ -15,8 +15,10 @@ Runtime* MakeRuntime() {
   auto* runtime = new Runtime;
   for (const char* name : {"OutOfBoundsException", "NilObjectException", "MemoryBlock", "FolderItem",
                            "IntegerArray", "Picture", "Graphics"})
-    runtime->Classes[Lower(name)] = {.Name = name};
-  runtime->Classes["gworldzor"] = {.Name = "GWorldZOR", .Destructor = quickdraw::DisposeOfInstance};
+    runtime->Classes[Lower(name)].Name = name;
+  Class& gworlds = runtime->Classes["gworldzor"];
+  gworlds.Name = "GWorldZOR";
+  gworlds.Destructor = quickdraw::DisposeOfInstance;
   return runtime;
 }
 
@@ -54,6 +56,11 @@ Runtime& TheRuntime() {
   return *runtime;
 }
 
+Pending& PendingHere() {
+  thread_local Pending pending;
+  return pending;
+}
+
 std::string Lower(std::string_view text) {
   std::string lower(text);
   std::ranges::transform(lower, lower.begin(), [](unsigned char c) { return char(std::tolower(c)); });
@@ -76,7 +83,7 @@ void Register(zor::ClassRecord* record) {
   record->InstanceOffsetSlot = InstanceOffset;
   for (std::size_t i = 0; i < record->EventCount; ++i) record->Events[i].EventWord = i + 1;
 
-  Class added;
+  Class& added = TheRuntime().Classes[Lower(record->ClassName)];
   added.Name = record->ClassName;
   added.DataSize = record->DataSize;
   added.Destructor = reinterpret_cast<void (*)(void*)>(record->DestructorFunction);
@@ -91,7 +98,6 @@ void Register(zor::ClassRecord* record) {
     const auto [name, value] = ParseConstant(record->Constants[i].Declaration);
     added.Constants[Lower(name)] = value;
   }
-  TheRuntime().Classes[Lower(added.Name)] = std::move(added);
 }
 
 bool IsHidden(std::string_view name) {
@@ -99,47 +105,51 @@ bool IsHidden(std::string_view name) {
 }
 
 bool MayCreate() {
-  int& left = TheRuntime().CreationsLeft;
-  if (left == 0) return false;
-  if (left > 0) --left;
-  return true;
+  std::atomic<int>& left = TheRuntime().CreationsLeft;
+  int now = left;
+  while (now > 0 && !left.compare_exchange_weak(now, now - 1)) continue;
+  return now != 0;
 }
 
 void* NewObject(const Class& of, std::unique_ptr<Payload> holds) {
   void* memory = ::operator new(InstanceOffset + of.DataSize);
   std::memset(memory, 0, InstanceOffset + of.DataSize);
   new (memory) ObjectHeader{&of, 1, std::move(holds)};
-  ++TheRuntime().Alive.Objects;
-  ++of.Alive;
+  of.Alive.fetch_add(1, std::memory_order_relaxed);
   return memory;
 }
 
 void Lock(void* object) {
-  if (object) ++HeaderOf(object).References;
+  if (object) HeaderOf(object).References.fetch_add(1, std::memory_order_relaxed);
 }
 
 void Unlock(void* object) {
-  if (!object || --HeaderOf(object).References > 0) return;
+  if (!object) return;
+  std::atomic<int>& references = HeaderOf(object).References;
+  // Who holds the only one needn't ask the other processors.
+  if (references.load(std::memory_order_acquire) != 1 &&
+      references.fetch_sub(1, std::memory_order_acq_rel) > 1)
+    return;
   const Class* of = HeaderOf(object).Of;
   if (of->Destructor) {
     // A destructor may lock and unlock its own object; it must not end twice.
-    HeaderOf(object).References = 1 << 20;
+    references = 1 << 20;
     of->Destructor(object);
   }
   ReleaseFields(object);
   HeaderOf(object).~ObjectHeader();
   ::operator delete(object);
-  --TheRuntime().Alive.Objects;
-  --of->Alive;
+  of->Alive.fetch_sub(1, std::memory_order_relaxed);
 }
 
 void ThrowPending() {
-  Runtime& runtime = TheRuntime();
-  if (std::exception_ptr thrown = std::exchange(runtime.Thrown, nullptr)) {
-    Unlock(std::exchange(runtime.Raised, nullptr));
+  Pending& pending = PendingHere();
+  if (!pending.Thrown && !pending.Raised) return;
+  if (std::exception_ptr thrown = std::exchange(pending.Thrown, nullptr)) {
+    Unlock(std::exchange(pending.Raised, nullptr));
     std::rethrow_exception(thrown);
   }
-  if (void* raised = std::exchange(runtime.Raised, nullptr)) {
+  if (void* raised = std::exchange(pending.Raised, nullptr)) {
     const auto* holds = HeldBy<ExceptionPayload>(raised);
     const HostException exception(HeaderOf(raised).Of->Name, holds ? holds->Message : "");
     Unlock(raised);

@@ -1,15 +1,16 @@
 #pragma once
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <map>
 #include <memory>
+#include <mutex>
 #include <new>
 #include <span>
 #include <string>
 #include <string_view>
 #include <typeinfo>
-#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -33,25 +34,6 @@ struct PropertyEntry {
   std::string LowerName, LowerType;
 };
 
-/// A row found for a call, and those of its parameters whose arguments weren't given.
-struct Found {
-  const MethodEntry* Entry;
-  std::span<const Parameter> Missing;
-};
-
-/// Hashes and compares what was asked for: a name, and the address of the list of the arguments' types.
-struct SameQuestion {
-  using is_transparent = void;
-  template <class Name>
-  std::size_t operator()(const std::pair<Name, const void*>& asked) const {
-    return std::hash<std::string_view>()(asked.first) ^ std::hash<const void*>()(asked.second);
-  }
-  template <class Name, class OtherName>
-  bool operator()(const std::pair<Name, const void*>& a, const std::pair<OtherName, const void*>& b) const {
-    return a.second == b.second && a.first == b.first;
-  }
-};
-
 struct Class {
   std::string Name;
   std::size_t DataSize = 0;
@@ -60,10 +42,8 @@ struct Class {
   std::vector<MethodEntry> Methods{}, SharedMethods{};
   std::vector<PropertyEntry> Properties{};
   std::map<std::string, std::int64_t> Constants{};  // by lower-case name
-  mutable int Alive = 0;
-  /// The methods found so far, since some calls work on a row of a picture only.
-  mutable std::unordered_map<std::pair<std::string, const void*>, Found, SameQuestion, SameQuestion>
-      FoundMethods{};
+  /// Objects of the class. Written by all threads, so it keeps off what they only read.
+  alignas(64) mutable std::atomic<int> Alive = 0;
 };
 
 /// What an object of one of the host's own classes holds beside its instance data.
@@ -73,7 +53,7 @@ struct Payload {
 
 struct ObjectHeader {
   const Class* Of;
-  int References;
+  std::atomic<int> References;
   std::unique_ptr<Payload> Holds;
 };
 
@@ -92,11 +72,17 @@ T* HeldBy(void* object) {
   return held && typeid(*held) == typeid(T) ? static_cast<T*>(held) : nullptr;
 }
 
-/// All that lives behind the services.
+/// What is alive beside the objects of classes.
+struct AliveCounts {
+  std::atomic<int> Strings = 0, OpenDescriptions = 0, GWorlds = 0, PixelLocks = 0;
+};
+
+/// All that lives behind the services. The settings are made while one thread is here, the hook at any time.
 struct Runtime {
   std::map<std::string, Class, std::less<>> Classes;  // by lower-case name
   std::vector<std::string> Hidden;
-  std::function<void()> OnYield;
+  std::shared_ptr<const std::function<void()>> OnYield;
+  std::mutex YieldMutex;
   double Version = 0;
   PictureForm Pictures = PictureForm::GWorld32;
   int BytesOfDepth24 = 3;
@@ -104,15 +90,20 @@ struct Runtime {
   int MissingColumns = 0, MissingRows = 0;
   /// Told the name of each service of pictures and QuickDraw that is called.
   std::function<void(const char* service)> OnPictureService;
-  int CreationsLeft = -1;
-  Host::Alive Alive;
-  /// What comes out of the call in hand once the module returns: an exception that the module raised, or one
-  /// that C++ code called by the module threw.
+  std::atomic<int> CreationsLeft = -1;
+  AliveCounts Alive;
+};
+
+Runtime& TheRuntime();
+
+/// What comes out of a thread's call in hand once the module returns: an exception that the module raised, or
+/// one that C++ code called by the module threw.
+struct Pending {
   void* Raised = nullptr;
   std::exception_ptr Thrown;
 };
 
-Runtime& TheRuntime();
+Pending& PendingHere();
 
 std::string Lower(std::string_view text);
 const Class* FindClass(std::string_view name);
@@ -132,14 +123,9 @@ struct BlockPayload : Payload {
   Bytes Own;
   std::uint8_t* Start;
   std::size_t Size;
-  explicit BlockPayload(Bytes bytes) : Own(std::move(bytes)), Start(Own.data()), Size(Own.size()) {
-    ++TheRuntime().Alive.MemoryBlocks;
-  }
+  explicit BlockPayload(Bytes bytes) : Own(std::move(bytes)), Start(Own.data()), Size(Own.size()) {}
   /// Over memory of the module, whose size isn't known.
-  explicit BlockPayload(void* start) : Start(static_cast<std::uint8_t*>(start)), Size(0) {
-    ++TheRuntime().Alive.MemoryBlocks;
-  }
-  ~BlockPayload() override { --TheRuntime().Alive.MemoryBlocks; }
+  explicit BlockPayload(void* start) : Start(static_cast<std::uint8_t*>(start)), Size(0) {}
 };
 /// A new block, of bytes or over an address.
 template <class Of>
@@ -168,7 +154,7 @@ Result Guarded(Result failure, Body&& body) {
   try {
     return body();
   } catch (...) {
-    if (!TheRuntime().Thrown) TheRuntime().Thrown = std::current_exception();
+    if (!PendingHere().Thrown) PendingHere().Thrown = std::current_exception();
     return failure;
   }
 }
@@ -186,7 +172,8 @@ void* Created(Make&& make) {
 
 bool IsHidden(std::string_view name);
 
-/// Throws what the module raised, or what code called by it threw, during the call that has just returned.
+/// Throws what the module raised, or what code called by it threw, during this thread's call that has just
+/// returned.
 void ThrowPending();
 
 struct Service {

@@ -59,7 +59,7 @@ void* REALConvertString(void* string, std::uint32_t encoding) {
 }
 void REALUnlockString(void* string) { UnlockString(static_cast<StringRecord*>(string)); }
 
-void RuntimeRaiseException(void* exception) { Unlock(std::exchange(TheRuntime().Raised, exception)); }
+void RuntimeRaiseException(void* exception) { Unlock(std::exchange(PendingHere().Raised, exception)); }
 
 unsigned char REALSetPropValueString(void* object, const char* name, void* string) {
   auto* exception = HeldBy<ExceptionPayload>(object);
@@ -80,10 +80,16 @@ void* PtrToMemoryBlock(void* address) {
   return Created([&] { return NewBlock(address); });
 }
 
+std::shared_ptr<const std::function<void()>> YieldHook() {
+  Runtime& runtime = TheRuntime();
+  const std::lock_guard lock(runtime.YieldMutex);
+  return runtime.OnYield;
+}
+
 void REALYieldToRB() {
   Guarded(0, [] {
-    // A copy, since the hook may set another one.
-    if (const auto hook = TheRuntime().OnYield) hook();
+    // Held, since the hook, or another thread, may set another one.
+    if (const auto hook = YieldHook()) (*hook)();
     return 0;
   });
 }

@@ -1,4 +1,6 @@
 #pragma once
+#include <atomic>
+
 #include "frame/declaration.h"
 #include "frame/records.h"
 #include "frame/types.h"
@@ -12,16 +14,20 @@ void* Resolve(const char* name);
 void SetResolver(Resolver resolver);
 
 /// A service of the host, called like a function. Its address is looked up at the first call and kept; while
-/// the name doesn't resolve a call gives 0 and the next one tries again. For host threads only.
+/// the name doesn't resolve a call gives 0 and the next one tries again. For host threads only, any of them.
 template <Text Name, class Signature>
 struct Service;
 
 template <Text Name, class Result, class... Arguments>
 struct Service<Name, Result(Arguments...)> {
   Result operator()(Arguments... arguments) const {
-    static Result (*slot)(Arguments...) = nullptr;
-    if (!slot) slot = reinterpret_cast<Result (*)(Arguments...)>(Resolve(Name.Characters));
-    return slot ? slot(arguments...) : Result();
+    static constinit std::atomic<Result (*)(Arguments...)> slot = nullptr;
+    auto* service = slot.load(std::memory_order_relaxed);
+    if (!service) {
+      service = reinterpret_cast<Result (*)(Arguments...)>(Resolve(Name.Characters));
+      slot.store(service, std::memory_order_relaxed);
+    }
+    return service ? service(arguments...) : Result();
   }
 };
 

@@ -5,6 +5,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <limits>
+#include <mutex>
 
 #include "frame/classes.h"
 #include "image/formats.h"
@@ -16,7 +17,9 @@ namespace {
 
 constexpr std::int32_t MemoryRowUnit = 64;
 
+/// The factory of the process, which any thread may set or ask.
 PictureFactoryZOR* GlobalFactory = nullptr;
+std::mutex FactoryMutex;
 
 /// Rows in memory start 64 bytes apart or a multiple of it. False when such a row passes 32 bits.
 bool SizeInMemory(PictureData& data) {
@@ -39,6 +42,13 @@ PictureZOR* AskFactory(PictureFactoryZOR* factory, std::int32_t width, std::int3
   auto* handler =
       reinterpret_cast<NewPictureHandler*>(GetEventInstancePPC(factory, FactoryClass.Events[0].EventWord));
   return handler ? handler(factory, width, height, format) : nullptr;
+}
+
+/// The factory of the process with a reference for the caller, since another thread may set the next one
+/// while this one works.
+PictureFactoryZOR* TakeGlobalFactory() {
+  const std::lock_guard lock(FactoryMutex);
+  return Locked(GlobalFactory);
 }
 
 /// The picture if it is large enough; otherwise it is given back.
@@ -149,11 +159,14 @@ bool HasFactory(const PictureData& data) { return data.Factory || GlobalFactory;
 
 PictureZOR* AskFactories(const PictureData* data, std::int32_t width, std::int32_t height,
                          std::int32_t format) {
-  PictureFactoryZOR* const factories[] = {data ? data->Factory : nullptr, GlobalFactory};
-  for (PictureFactoryZOR* factory : factories)
-    if (PictureZOR* picture = Acceptable(AskFactory(factory, width, height, format), width, height))
-      return picture;
-  return nullptr;
+  const auto ask = [=](PictureFactoryZOR* factory) {
+    return Acceptable(AskFactory(factory, width, height, format), width, height);
+  };
+  if (PictureZOR* picture = ask(data ? data->Factory : nullptr)) return picture;
+  PictureFactoryZOR* const global = TakeGlobalFactory();
+  PictureZOR* const picture = ask(global);
+  Unlock(global);
+  return picture;
 }
 
 PictureZOR* NewPictureInMemory(std::int32_t width, std::int32_t height, std::int32_t format) {
@@ -194,8 +207,12 @@ Boolean CanAllocateImage(Integer width, Integer height, Integer format) {
 }
 
 void SetFactory(PictureFactoryZOR* factory) {
-  PictureFactoryZOR* former = std::exchange(GlobalFactory, Locked(factory));
-  Unlock(former);
+  Locked(factory);
+  {
+    const std::lock_guard lock(FactoryMutex);
+    std::swap(GlobalFactory, factory);
+  }
+  Unlock(factory);
 }
 
 MemoryBlock* Memory(PictureZOR* self, Word) {

@@ -10,6 +10,8 @@
 #include <cerrno>
 #include <cstdlib>
 #include <limits>
+#include <mutex>
+#include <new>
 #include <utility>
 
 #include "frame/host_services.h"
@@ -30,17 +32,15 @@ constexpr std::int64_t Int32Max = std::numeric_limits<std::int32_t>::max();
 /// The bytes that follow the last row of a file, so that its end is backed before anything is mapped.
 constexpr std::size_t TailSize = 4096;
 
-Store* NewStore(PictureData& data) {
-  auto* store = static_cast<Store*>(std::calloc(1, sizeof(Store)));
-  if (!store) return nullptr;
-  store->Pictures = 1;
-  store->FileDescriptor = -1;
-  data.Samples = store;
-  return store;
+/// A store for one picture.
+Store* NewStore() {
+  void* memory = std::calloc(1, sizeof(Store));
+  return memory ? new (memory) Store : nullptr;
 }
 
-/// All stores on files.
+/// All stores on files. A file loses its name before it leaves the list, so that nobody opens it in between.
 Store* StoresOnFiles = nullptr;
+std::mutex FilesMutex;
 
 /// Whether a picture may be put on the file. One that another picture is on would lose its rows, and touching
 /// those would end the process; a device, or a pipe, is no place for one.
@@ -68,22 +68,37 @@ void WantLargePages([[maybe_unused]] Sample* memory, [[maybe_unused]] std::size_
 #endif
 }
 
-void EndFile(int fileDescriptor, char* path) {
+/// Opens the file for the store. False, and the file left as it was, where no picture may be put on it.
+bool OpenFile(Store& store) {
+  const std::lock_guard lock(FilesMutex);
+  // Cut once it is known that nobody is on it. Not waiting, since a pipe would wait for its other end.
+  const int opened = open(store.Path, O_RDWR | O_CREAT | O_CLOEXEC | O_NONBLOCK, S_IRUSR | S_IWUSR);
+  if (opened < 0) return false;
+  if (!MayBeOverwritten(opened)) {
+    close(opened);
+    return false;
+  }
+  store.FileDescriptor = opened;
+  store.NextOnFile = std::exchange(StoresOnFiles, &store);
+  return true;
+}
+
+void EndFile(Store& store) {
+  if (store.FileDescriptor < 0) return;
   // Where the file can't be cut, removing it frees its blocks all the same.
-  if (ftruncate(fileDescriptor, 0) != 0) errno = 0;
-  close(fileDescriptor);
-  unlink(path);
-  std::free(path);
+  if (ftruncate(store.FileDescriptor, 0) != 0) errno = 0;
+  const std::lock_guard lock(FilesMutex);
+  unlink(store.Path);
+  Store** place = &StoresOnFiles;
+  while (*place != &store) place = &(*place)->NextOnFile;
+  *place = store.NextOnFile;
+  close(store.FileDescriptor);
 }
 
 void EndStore(Store* store) {
   std::free(store->Memory);
-  if (store->Path) {
-    Store** place = &StoresOnFiles;
-    while (*place != store) place = &(*place)->NextOnFile;
-    *place = store->NextOnFile;
-    EndFile(store->FileDescriptor, store->Path);
-  }
+  EndFile(*store);
+  std::free(store->Path);
   if (store->Keeper) REALUnlockObject(store->Keeper);
   std::free(store);
 }
@@ -218,11 +233,12 @@ bool UseOwnMemory(PictureData& data) {
   auto* memory = static_cast<Sample*>(std::calloc(1, std::size_t(data.TotalSize)));
   if (!memory) return false;
   WantLargePages(memory, std::size_t(data.TotalSize));
-  Store* store = NewStore(data);
+  Store* store = NewStore();
   if (!store) {
     std::free(memory);
     return false;
   }
+  data.Samples = store;
   store->Memory = data.PixelBase = memory;
   data.RowsPerBlock = data.Height;
   data.RowGetter = PlainRow;
@@ -230,8 +246,9 @@ bool UseOwnMemory(PictureData& data) {
 }
 
 bool UseHostMemory(PictureData& data, void* base, void* keeper) {
-  Store* store = base ? NewStore(data) : nullptr;
+  Store* store = base ? NewStore() : nullptr;
   if (!store) return false;
+  data.Samples = store;
   REALLockObject(keeper);
   store->Keeper = keeper;
   data.PixelBase = static_cast<Sample*>(base);
@@ -241,21 +258,17 @@ bool UseHostMemory(PictureData& data, void* base, void* keeper) {
 }
 
 bool UseMappedFile(PictureData& data, char* path, std::int32_t blockSize) {
-  // Cut once it is known that nobody is on it. Not waiting, since a pipe would wait for its other end.
-  const int fileDescriptor = open(path, O_RDWR | O_CREAT | O_CLOEXEC | O_NONBLOCK, S_IRUSR | S_IWUSR);
-  if (fileDescriptor < 0 || !MayBeOverwritten(fileDescriptor)) {
-    if (fileDescriptor >= 0) close(fileDescriptor);
+  Store* store = NewStore();
+  if (!store) {
     std::free(path);
     return false;
   }
-  Store* store = ReserveFile(fileDescriptor, data.TotalSize) ? NewStore(data) : nullptr;
-  if (!store) {
-    EndFile(fileDescriptor, path);
+  store->Path = path;
+  if (!OpenFile(*store) || !ReserveFile(store->FileDescriptor, data.TotalSize)) {
+    EndStore(store);
     return false;
   }
-  store->FileDescriptor = fileDescriptor;
-  store->Path = path;
-  store->NextOnFile = std::exchange(StoresOnFiles, store);
+  data.Samples = store;
   data.WindowFirstRow = data.WindowLastRow = -1;
   data.PixelBase = nullptr;
   data.IsMapping = true;

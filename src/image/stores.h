@@ -1,4 +1,6 @@
 #pragma once
+#include <atomic>
+
 #include "image/picture_data.h"
 
 namespace zor {
@@ -8,18 +10,18 @@ namespace zor {
 // window of rows is mapped, and the window follows the rows that are asked for.
 //
 // A store is shared by the picture that made it and all views on it, and ends with the last of them. So
-// closing a picture never takes the samples from under a view. Pictures of one store are used by one host
-// thread at a time, which is why the count is a plain one.
+// closing a picture never takes the samples from under a view. A picture is used by one host thread at a
+// time; pictures of one store, each with a window of its own, may be used by several.
 struct Store {
-  std::int32_t Pictures;
+  std::atomic<std::int32_t> Pictures = 1;
   /// `calloc`ed samples, or null.
-  Sample* Memory;
+  Sample* Memory = nullptr;
   /// The host object that the samples belong to, with a reference; or null.
-  void* Keeper;
+  void* Keeper = nullptr;
   /// The mapped file with its `calloc`ed path, or a null path.
-  char* Path;
-  int FileDescriptor;
-  Store* NextOnFile;
+  char* Path = nullptr;
+  int FileDescriptor = -1;
+  Store* NextOnFile = nullptr;
 };
 
 /// Bytes of a page as the stores count them: the system's, but at least 4096.

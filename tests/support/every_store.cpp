@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 
 #include "image/picture_data.h"
 #include "object_model.h"
@@ -42,7 +43,7 @@ void MakeWindowSmall(const Picture& picture) {
 }
 
 TemporaryFile::TemporaryFile() {
-  static int count = 0;
+  static std::atomic<int> count = 0;
   At = std::filesystem::temp_directory_path() /
        ("picturezor-test-" + std::to_string(getpid()) + "-" + std::to_string(count++));
 }

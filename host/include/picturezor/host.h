@@ -35,8 +35,11 @@ enum class PictureForm { GWorld32, GWorld24, GWorld16, Form1, Form2, Form3, Rows
 
 /// The host that the module runs in: object model, strings, memory blocks, events, exceptions and services.
 ///
-/// There is one a process, since the module keeps process-wide state and stays loaded. All calls come from
-/// one thread at a time.
+/// There is one a process, since the module keeps process-wide state and stays loaded. Different pictures may
+/// be used on different threads at once; one picture, or other object, belongs to one thread at a time. So
+/// each of several threads that read one picture takes a view of its own. A factory and the hook of `OnYield`
+/// are called on the thread whose call needs them. What else is set here is set while no other thread is in
+/// the host.
 class Host {
  public:
   /// What the module finds at load, and for good.
