@@ -1,8 +1,10 @@
+#include <algorithm>
 #include <array>
 
 #include "filters/filters.h"
 #include "filters/plane_tables.h"
 #include "image/arithmetic.h"
+#include "image/targets.h"
 #include "image/walk.h"
 
 namespace zor {
@@ -10,34 +12,55 @@ namespace {
 
 using Histogram = std::array<std::int64_t, 256>;
 
-/// The luma of a colour, in doubles as it is defined, from the products of every sample value.
-struct LumaTables {
-  std::array<double, 256> Red, Green, Blue;
+/// The lumas of a run of pixels, in doubles as they are defined.
+template <int Step>
+void FindLumas(const PlaneRow<3, Step>& in, std::ptrdiff_t first, Sample* lumas, std::ptrdiff_t count) {
+  const PlaneRow<3, Step> from = in;
+  for (std::ptrdiff_t i = 0; i < count; ++i) {
+    const std::ptrdiff_t x = first + i;
+    // Below 256, so that a plain conversion does.
+    lumas[i] = Sample(int(0.177 * from(0, x) + 0.813 * from(1, x) + 0.01 * from(2, x)));
+  }
+}
 
-  LumaTables() {
-    for (int v = 0; v < 256; ++v) {
-      Red[v] = 0.177 * v;
-      Green[v] = 0.813 * v;
-      Blue[v] = 0.01 * v;
+/// Counts the lumas of rows.
+class LumaCounts {
+ public:
+  template <int Step>
+  void Add(const PlaneRow<3, Step>& in, std::int32_t width) {
+    for (std::ptrdiff_t first = 0; first < width; first += Stretch) {
+      const std::ptrdiff_t count = std::min(Stretch, width - first);
+      Sample lumas[Stretch];
+      OnBestTarget<FindLumas<Step>>(in, first, static_cast<Sample*>(lumas), count);
+      for (std::ptrdiff_t i = 0; i < count; ++i) ++Apart[i % Many][lumas[i]];
     }
   }
-  int operator()(Sample red, Sample green, Sample blue) const {
-    // Below 256, so that a plain conversion does.
-    return int(Red[red] + Green[green] + Blue[blue]);
+  Histogram Sums() const {
+    Histogram sums{};
+    for (const Histogram& counts : Apart)
+      for (std::size_t luma = 0; luma < 256; ++luma) sums[luma] += counts[luma];
+    return sums;
   }
+
+ private:
+  static constexpr std::ptrdiff_t Stretch = 512, Many = 8;
+  /// Neighbours often have one luma; counted apart they don't wait for each other.
+  Histogram Apart[Many]{};
 };
 
 /// How many pixels of the part have each luma. False when a row can't be reached.
 bool CountLumas(PictureData& picture, const Rectangle& part, Histogram& counts) {
   const PlaneList planes = PlanesOf(Group::RGB, picture, part.X);
-  const LumaTables luma;
-  // Neighbours often have one luma; counted apart they don't wait for each other.
-  std::array<Histogram, 4> apart{};
-  const bool done = Walk(Yielding(From(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
-    const PlaneRow<3> in(row, planes);
-    for (std::ptrdiff_t x = 0; x < part.Width; ++x) ++apart[x % 4][luma(in(0, x), in(1, x), in(2, x))];
-  });
-  for (int i = 0; i < 256; ++i) counts[i] = apart[0][i] + apart[1][i] + apart[2][i] + apart[3][i];
+  LumaCounts lumas;
+  const auto count = [&]<int Step>() {
+    return Walk(Yielding(From(picture, part.Y))).Rows(part.Height, [&](std::int32_t, Sample* row) {
+      lumas.Add(PlaneRow<3, Step>(row, planes), part.Width);
+    });
+  };
+  const bool done = planes.Step == 3   ? count.template operator()<3>()
+                    : planes.Step == 4 ? count.template operator()<4>()
+                                       : count.template operator()<0>();
+  counts = lumas.Sums();
   return done;
 }
 
