@@ -1,0 +1,10 @@
+// Linked into every program that is built with a sanitizer, so that it holds wherever one is started.
+
+/// The sanitizer keeps a list of each thread's variables in modules that were loaded later, to look for leaks
+/// behind them. For a block that the C library allocated it guesses the size from the 16 bytes before it,
+/// where older C libraries kept one, if the block lies 16 bytes behind the start of a page. Workers stay
+/// parked with such a block, the guess is nonsense now and then, and the search at the end runs into memory
+/// that isn't there. What the module keeps a thread, two flags, leads to no memory.
+extern "C" [[gnu::visibility("default")]] const char* __asan_default_options() {
+  return "intercept_tls_get_addr=0";
+}
