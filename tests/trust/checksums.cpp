@@ -4,20 +4,24 @@
 #include <cstring>
 #include <fstream>
 #include <iostream>
+#include <list>
 #include <map>
+#include <span>
 #include <string>
 #include <vector>
 
 #include "host_strings.h"
+#include "image/picture_data.h"
 #include "picturezor/host_picture.h"
 #include "support/every_store.h"
 #include "support/every_target.h"
 #include "support/row_call.h"
 
 // A line for each row of the class, format and kernel or dither matrix: what comes out of calls with seeded
-// arguments, down to the padding of the rows, as one number. It is the same on every machine and for every
-// instruction set. Without an argument the lines are printed; with the name of a file they are compared to
-// its lines, with a number N behind it only every N-th one of them.
+// arguments, down to the padding of the rows, as one number; and a line for each row and kernel or matrix of
+// very tall and very wide pictures. It is the same on every machine and for every instruction set. Without an
+// argument the lines are printed; with the name of a file they are compared to its lines, with a number N
+// behind it only every N-th one of them.
 
 /// The one thing that differs from system to system: the numbers of the C library.
 static std::uint32_t RandomState;
@@ -32,7 +36,18 @@ namespace {
 using model::MethodEntry;
 using model::Parameter;
 
-constexpr int Variants = 6;
+/// The size of the pictures of a call.
+struct Shape {
+  int Width, Height;
+  bool Mapped = false;
+  bool IsExtreme() const { return Width > 1000 || Height > 1000; }
+};
+// On either side of the vectors' widths.
+constexpr Shape Ordinary[] = {{77, 7}, {5, 9}, {33, 8}, {130, 3}, {16, 12}, {64, 5}};
+constexpr Shape Extreme[] = {{1, 5000}, {5000, 1}, {3, 70000}, {2, 1200, true}, {1200, 5, true}};
+/// No picture of a host has more on a side.
+constexpr int Largest = 32767;
+constexpr Format ExtremeFormats[] = {Format::G, Format::BGRA, Format::CMYK, Format::AG, Format::RGB};
 
 class Checksum {
  public:
@@ -57,12 +72,22 @@ class Checksum {
   void Add(const Picture& picture) {
     Add(picture ? 1 : 0);
     if (!picture || !picture.Valid()) return;
+    zor::PictureData& data = DataOf(picture);
+    if (data.IsMapping || Shape{data.Width, data.Height}.IsExtreme()) return AddPixels(data);
     for (const char* name : {"Width", "Height", "PixelSize", "RowSize", "RowOffset", "ImageFormat"})
       Add(picture.IntegerProperty(name));
     for (int y = 0; y < picture.Height(); ++y) {
       const Bytes row = picture.Row(y);
       Add(row.data(), row.size());
     }
+  }
+  /// Without the padding: in a file it fills pages, which differ, and of many rows it would take most of the
+  /// time.
+  void AddPixels(zor::PictureData& data) {
+    for (const int number : {data.Width, data.Height, data.PixelSize, data.RowOffset, data.ImageFormat})
+      Add(number);
+    for (int y = 0; Usable(data) && data.Width > 0 && y < data.Height; ++y)
+      Add(data.RowGetter(&data, y) + data.LeftEdge, std::size_t(data.Width) * std::size_t(data.PixelSize));
   }
   std::uint32_t Folded() const { return std::uint32_t(State ^ State >> 32); }
 
@@ -76,6 +101,31 @@ Picture Filled(int width, int height, Format format, Noise& noise) {
   return picture;
 }
 
+/// Pictures of a call, with the files that some of them are in.
+class Pictures {
+ public:
+  Picture Make(const Shape& shape, Format format, Noise& noise) {
+    if (!shape.IsExtreme()) return Filled(shape.Width, shape.Height, format, noise);
+    const Picture picture =
+        shape.Mapped ? Picture::Mapped(Files.emplace_back().Path(), shape.Width, shape.Height, format, 1)
+                     : Picture(shape.Width, shape.Height, format);
+    if (shape.Mapped) MakeWindowSmall(picture);
+    zor::PictureData& data = DataOf(picture);
+    std::uint32_t state = noise.Byte();
+    for (int y = 0; y < data.Height; ++y) {
+      zor::Sample* row = data.RowGetter(&data, y);
+      for (int i = 0; i < data.Width * data.PixelSize; ++i) {
+        state = state * 1664525 + 1013904223;
+        row[i] = zor::Sample(state >> 24);
+      }
+    }
+    return picture;
+  }
+
+ private:
+  std::list<TemporaryFile> Files;
+};
+
 HostPicture Shown(int width, int height, Noise& noise) {
   const HostPicture picture(width, height);
   picture.SetRGB(noise.Many(std::size_t(width * height * 3)));
@@ -83,16 +133,22 @@ HostPicture Shown(int width, int height, Noise& noise) {
 }
 
 /// What is tried of an integer, by the name of its parameter.
-Value Number(const std::string& name, const Picture& self, Noise& noise) {
+Value Number(const std::string& name, const Shape& of, bool constructs, Noise& noise) {
+  // Few rows of many are as telling as many of few.
+  const bool few = of.IsExtreme() && (constructs || noise.Between(0, 1));
+  const int width = few ? std::min(of.Width, 12) : of.Width,
+            height = few ? std::min(of.Height, 12) : of.Height;
+  const int wide = of.IsExtreme() ? std::max(width, 90) : 90,
+            high = of.IsExtreme() ? std::max(height, 12) : 12;
   struct {
     const char* Name;
     int First, Last;
-  } const ranges[] = {{"width", 1, self.Width()},
-                      {"height", 1, self.Height()},
-                      {"destwidth", -9, 90},
-                      {"destheight", -4, 12},
-                      {"w", -9, 90},
-                      {"h", -4, 12},
+  } const ranges[] = {{"width", 1, width},
+                      {"height", 1, height},
+                      {"destwidth", -9, wide},
+                      {"destheight", -4, high},
+                      {"w", -9, wide},
+                      {"h", -4, high},
                       {"x", -9, 20},
                       {"y", -4, 8},
                       {"destx", -9, 20},
@@ -112,20 +168,22 @@ Value Number(const std::string& name, const Picture& self, Noise& noise) {
   return {.Whole = noise.Between(-9, 300)};
 }
 
-double Real(const std::string& name, Noise& noise) {
+double Real(const std::string& name, const Shape& of, Noise& noise) {
+  // Far from a right angle the result would be as wide as it is high.
+  if (name == "angle" && of.IsExtreme()) return noise.Between(0, 3) * 90 + noise.Between(-16, 16) / 16.0;
   if (name == "angle") return noise.Between(-7200, 7200) / 16.0;
   if (name == "radius") return noise.Between(-8, 80) / 16.0;
   return noise.Between(-32, 96) / 16.0;
 }
 
 /// One call with arguments of a seed, and all that it leaves behind.
-void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, int variant) {
-  Noise noise(unsigned(chosen * Variants + variant));
+void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, const Shape& shape,
+             int variant) {
+  Noise noise(unsigned(chosen * int(std::size(Ordinary)) + variant));
   RandomState = unsigned(variant);
-  // On either side of the vectors' widths.
-  constexpr int widths[Variants] = {77, 5, 33, 130, 16, 64}, heights[Variants] = {7, 9, 8, 3, 12, 5};
-  const int width = widths[variant], height = heights[variant];
-  const Picture self = Filled(width, height, format, noise);
+  const int width = shape.Width, height = shape.Height;
+  Pictures make;
+  const Picture self = make.Make(shape, format, noise);
   const bool constructs = row.LowerName == "constructor";
   const Picture made(Object::Adopt(model::NewObject(model::ClassNamed("PictureZOR"))));
   std::vector<Picture> pictures;
@@ -139,11 +197,11 @@ void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, i
       if (name == "dest" && variant % 3 == 1)
         picture = self;
       else if (name == "mask" && variant % 3 != 2)
-        picture = Filled(width, height, Format::G, noise);
+        picture = make.Make(shape, Format::G, noise);
       else if (name == "image" || name == "source" || name == "origpixels" || name == "other" ||
                variant % 3 == 2)
-        picture = Filled(width + variant / 3, height + variant / 3,
-                         variant % 2 ? Format(noise.Between(1, 13)) : format, noise);
+        picture = make.Make({width + variant / 3, height + variant / 3, shape.Mapped},
+                            variant % 2 ? Format(noise.Between(1, 13)) : format, noise);
       pictures.push_back(picture);
       value.Address = picture.Address();
     } else if (parameter.Type == "integer()") {
@@ -152,19 +210,20 @@ void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, i
       others.push_back(IntegerArray(numbers));
       value.Address = others.back().Address();
     } else if (parameter.Type == "picture") {
-      const HostPicture shown = Shown(width, height, noise);
-      if (variant % 3) shown.MakeMask().SetRGB(noise.Many(std::size_t(width * height * 3)));
+      const HostPicture shown = Shown(std::min(width, Largest), std::min(height, Largest), noise);
+      if (variant % 3) shown.MakeMask().SetRGB(noise.Many(std::size_t(shown.Width() * shown.Height() * 3)));
       others.push_back(shown);
       value.Address = shown.Address();
     } else if (parameter.Type == "memoryblock") {
       others.push_back(MemoryBlock(noise.Many(1 << 14)));
       value.Address = others.back().Address();
     } else if (parameter.Type == "double") {
-      value.Real = Real(name, noise);
+      value.Real = Real(name, shape, noise);
     } else if (parameter.Type == "boolean") {
       value.Whole = noise.Between(0, 1);
     } else {
-      value = name == "mode" || name == "matrix" ? Value{.Whole = chosen} : Number(name, self, noise);
+      value = name == "mode" || name == "matrix" ? Value{.Whole = chosen}
+                                                 : Number(name, shape, constructs, noise);
     }
     arguments.push_back(value);
   }
@@ -188,12 +247,13 @@ void AddCall(Checksum& sum, const MethodEntry& row, Format format, int chosen, i
     }
   } else if (type == "memoryblock") {
     const MemoryBlock block(Object::Adopt(outcome.Result.Address));
-    sum.Add(block.Data().data(), block.Data().size());
+    // A stored row of a file fills pages.
+    if (!shape.Mapped) sum.Add(block.Data().data(), block.Data().size());
   } else {
     GiveBack(type, outcome.Result);
   }
   if (row.Record->Setter) {
-    Bytes bytes = noise.Many(1 << 13);
+    Bytes bytes = noise.Many(shape.IsExtreme() ? 1 << 21 : 1 << 13);
     if (type == "string") {
       const Value text{.Address = model::NewString(bytes, model::UTF8)};
       sum.Add(AssignRow(row, self.Address(), arguments, text).Raised);
@@ -233,22 +293,33 @@ bool DependsOnTheMachine(const MethodEntry& row) {
                              [](const Parameter& parameter) { return parameter.Type == "folderitem"; });
 }
 
+/// Turned by a degree 70000 rows are more than a thousand columns.
+bool TakesTooLong(const MethodEntry& row, const Shape& shape) {
+  return row.LowerName == "rotate" && shape.Height > 10000;
+}
+
 /// Every n-th line.
 std::vector<std::string> Lines(int every = 1) {
   std::vector<std::string> lines;
   int number = 0;
+  const auto add = [&](const MethodEntry& row, int chosen, Format format, std::span<const Shape> shapes,
+                       const char* what) {
+    if (number++ % every != 0) return;
+    Checksum sum;
+    for (std::size_t i = 0; i < shapes.size(); ++i)
+      if (!TakesTooLong(row, shapes[i])) AddCall(sum, row, format, chosen, shapes[i], int(i));
+    char line[120];
+    std::snprintf(line, sizeof line, "%s %d %d%s %08x", KeyOf(row).c_str(), chosen, int(format), what,
+                  unsigned(sum.Folded()));
+    lines.push_back(line);
+  };
+  std::size_t extremes = 0;
   for (const MethodEntry& row : model::ClassNamed("PictureZOR").Methods) {
     if (DependsOnTheMachine(row)) continue;
     for (const int chosen : ChoicesOf(row))
-      for (const Format format : EveryFormat()) {
-        if (number++ % every != 0) continue;
-        Checksum sum;
-        for (int variant = 0; variant < Variants; ++variant) AddCall(sum, row, format, chosen, variant);
-        char line[120];
-        std::snprintf(line, sizeof line, "%s %d %d %08x", KeyOf(row).c_str(), chosen, int(format),
-                      unsigned(sum.Folded()));
-        lines.push_back(line);
-      }
+      for (const Format format : EveryFormat()) add(row, chosen, format, Ordinary, "");
+    for (const int chosen : ChoicesOf(row))
+      add(row, chosen, ExtremeFormats[extremes++ % std::size(ExtremeFormats)], Extreme, " extreme");
   }
   return lines;
 }
