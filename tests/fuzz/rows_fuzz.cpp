@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cmath>
 #include <cstdio>
 #include <cstdlib>
 #include <stdexcept>
@@ -7,6 +8,7 @@
 #include <vector>
 
 #include "fuzz/input.h"
+#include "fuzz/time_limit.h"
 #include "picturezor/host_picture.h"
 #include "support/row_arguments.h"
 
@@ -20,8 +22,10 @@ namespace {
 using model::MethodEntry;
 using model::Parameter;
 
-/// Rows that a picture must not have more of, so that a run of steps stays short.
-constexpr std::int64_t MostPixels = 4096;
+/// Pixels of the pictures that are asked for by numbers, of those that are kept, and of all that the calls of
+/// a program look at, so that it stays short.
+constexpr std::int64_t MostPixels = 4096, MostKept = 1 << 18, MostWork = 1 << 24;
+constexpr int MostRowsInFile = 5000;
 constexpr std::size_t MostPictures = 12, MostSteps = 200, BlockSize = 1 << 16;
 
 class Program {
@@ -40,7 +44,7 @@ class Program {
   Program(const Program&) = delete;
 
   void Run() {
-    for (std::size_t step = 0; step < MostSteps && !In.AtEnd(); ++step) {
+    for (std::size_t step = 0; step < MostSteps && Work < MostWork && !In.AtEnd(); ++step) {
       try {
         Step();
       } catch (const HostException&) {
@@ -70,13 +74,16 @@ class Program {
   Picture NewPicture() {
     int width = In.Between(1, 40), height = In.Between(1, 24);
     auto format = Format(In.Between(0, 41));
+    if (format == Format(41)) return Extreme();
     if (In.Byte() & 1)
       if (const Picture like = Any(); like && like.Valid() && like.Width() > 0 && like.Height() > 0) {
-        width = std::min(like.Width(), 64);
-        height = std::min(like.Height(), 64);
+        width = like.Width();
+        height = like.Height();
         if (In.Byte() & 3) format = like.ImageFormat();
       }
-    switch (In.Between(0, 3)) {
+    // A row of a file takes up a page.
+    const int store = In.Between(0, 3);
+    switch (store == 0 && height > MostRowsInFile ? 1 : store) {
       case 0:
         return Filled(Picture::Mapped(Files[std::size_t(In.Between(0, 3))].Path(), width, height, format, 1));
       case 1: {
@@ -88,6 +95,20 @@ class Program {
       default: return Filled(Picture(width, height, format));
     }
   }
+  /// As tall, or as wide, as one in a file can be too; and, in memory, 70000 rows.
+  Picture Extreme() {
+    constexpr std::pair<int, int> sizes[] = {{1, 5000}, {5000, 1}, {3, 70000}, {6000, 6}, {2, 4000}};
+    const auto& [width, height] = sizes[In.Between(0, 4)];
+    const auto format = Format(In.Between(1, 40));
+    const Picture small = Filled(Picture(std::min(width, 40), std::min(height, 24), format));
+    const Picture picture =
+        height >= 5 && height <= MostRowsInFile && In.Byte() % 2
+            ? Picture::Mapped(Files[std::size_t(In.Between(0, 3))].Path(), width, height, format, 1)
+            : Picture(width, height, format);
+    if (picture.Valid() && picture.IsMapping()) MakeWindowSmall(picture);
+    picture.ScaleFast(small, width, height);
+    return picture;
+  }
   static Picture Filled(Picture picture) {
     if (!picture.Valid()) return picture;
     if (picture.IsMapping()) MakeWindowSmall(picture);
@@ -96,8 +117,10 @@ class Program {
   }
 
   void Keep(const Picture& picture) {
-    const bool large = picture && std::int64_t{picture.Width()} * picture.Height() > MostPixels;
-    if (!large && Pictures.size() < MostPictures) Pictures.push_back(picture);
+    if (PixelsOf(picture) <= MostKept && Pictures.size() < MostPictures) Pictures.push_back(picture);
+  }
+  static std::int64_t PixelsOf(const Picture& picture) {
+    return picture ? std::int64_t{std::max(picture.Width(), 0)} * std::max(picture.Height(), 0) : 0;
   }
   void DropPicture() {
     if (Pictures.empty()) return;
@@ -187,7 +210,7 @@ class Program {
   }
 
   /// Sizes that would only take long, as asked of a row that makes pictures.
-  static bool IsLarge(const MethodEntry& row, const std::vector<Value>& arguments) {
+  static bool IsLarge(const MethodEntry& row, const Picture& self, const std::vector<Value>& arguments) {
     std::int64_t pixels = 1;
     bool makes = row.LowerName == "constructor" || row.LowerName == "createpicturezor";
     for (std::size_t i = 0; makes && i < arguments.size(); ++i) {
@@ -195,18 +218,43 @@ class Program {
       if (name == "width" || name == "height")
         pixels = arguments[i].Whole > MostPixels ? MostPixels + 1 : pixels * arguments[i].Whole;
     }
+    if (row.LowerName == "rotate" && std::fmod(arguments[0].Real, 90) != 0)
+      pixels = std::max<std::int64_t>(self.Width(), self.Height()) * (self.Width() + self.Height()) / 4;
     return pixels > MostPixels;
+  }
+
+  /// The pixels that a call looks at: of its pictures, as often as its numbers say. Numbers that a row
+  /// refuses count as well, which only ends a program early.
+  std::int64_t WorkOf(const MethodEntry& row, const Picture& self,
+                      const std::vector<Value>& arguments) const {
+    std::int64_t pixels = PixelsOf(self), times = 1;
+    for (std::size_t i = 0; i < arguments.size(); ++i) {
+      const std::string name = model::Lower(row.Of.Parameters[i].Name);
+      const std::int64_t number = std::clamp<std::int64_t>(std::abs(arguments[i].Whole), 1, 1 << 20);
+      if (row.Of.Parameters[i].Type == "picturezor")
+        for (const Picture& picture : Pictures)
+          if (picture.Address() == arguments[i].Address) pixels += PixelsOf(picture);
+      if (name == "iterations") times *= number;
+      if (name == "range") times *= (2 * number + 1) * (2 * number + 1);
+      if (name == "matrixdimension") times *= number * number;
+    }
+    return std::max<std::int64_t>(pixels, 1) * times;
   }
 
   void Call(Numbers numbers) {
     const MethodEntry& row = AnyRow();
     const bool constructs = row.LowerName == "constructor";
     const Picture self = constructs && In.Between(0, 7) ? UnbuiltPicture() : Any();
-    if (!self) return;
     std::vector<Value> arguments;
     for (const Parameter& parameter : row.Of.Parameters) arguments.push_back(Argument(parameter, numbers));
-    if (IsLarge(row, arguments) || !KeepsPromises(row, arguments)) return;
-    const Outcome outcome = CallRow(row, self.Address(), arguments);
+    if ((self && IsLarge(row, self, arguments)) || !KeepsPromises(row, arguments)) return;
+    const std::int64_t work = WorkOf(row, self, arguments);
+    if (work > MostWork) return;
+    Work += work;
+    const Outcome outcome = [&] {
+      const TimeLimit limit(work);
+      return CallRow(row, self.Address(), arguments);
+    }();
     if (constructs) Keep(self);
     if (row.Of.Result == "picturezor")
       Keep(Picture(Object::Adopt(outcome.Result.Address)));
@@ -219,8 +267,11 @@ class Program {
     const MethodEntry& row = AnyRow();
     const Picture self = Any();
     if (!self || !row.Record->Setter) return;
+    if (row.LowerName == "datastringinformat" && PixelsOf(self) > MostPixels) return;
     std::vector<Value> arguments;
     for (const Parameter& parameter : row.Of.Parameters) arguments.push_back(Argument(parameter));
+    Work += PixelsOf(self);
+    const TimeLimit limit(PixelsOf(self));
     AssignRow(row, self.Address(), arguments, Argument({"value", row.Of.Result}));
   }
 
@@ -235,6 +286,7 @@ class Program {
                                             IntegerArray({1, -2, 2147483647, 4, 5, 6, 7, 8, 9}),
                                             IntegerArray(std::vector<std::int32_t>{})};
   model::StringRecord* const Text = model::NewString(Bytes(BlockSize, 'x'), model::UTF8);
+  std::int64_t Work = 0;
   bool Yielding = false;
 };
 
