@@ -209,13 +209,15 @@ class Program {
                                      });
   }
 
-  /// Sizes that would only take long, as asked of a row that makes pictures.
+  /// Numbers that would only take long.
   static bool IsLarge(const MethodEntry& row, const Picture& self, const std::vector<Value>& arguments) {
     std::int64_t pixels = 1;
-    bool makes = row.LowerName == "constructor" || row.LowerName == "createpicturezor";
-    for (std::size_t i = 0; makes && i < arguments.size(); ++i) {
+    const bool makes = row.LowerName == "constructor" || row.LowerName == "createpicturezor";
+    for (std::size_t i = 0; i < arguments.size(); ++i) {
       const std::string name = model::Lower(row.Of.Parameters[i].Name);
-      if (name == "width" || name == "height")
+      // A factory may be asked in each.
+      if (name == "iterations" && arguments[i].Whole > 1000) return true;
+      if (makes && (name == "width" || name == "height"))
         pixels = arguments[i].Whole > MostPixels ? MostPixels + 1 : pixels * arguments[i].Whole;
     }
     if (row.LowerName == "rotate" && std::fmod(arguments[0].Real, 90) != 0)
@@ -223,22 +225,26 @@ class Program {
     return pixels > MostPixels;
   }
 
-  /// The pixels that a call looks at: of its pictures, as often as its numbers say. Numbers that a row
-  /// refuses count as well, which only ends a program early.
-  std::int64_t WorkOf(const MethodEntry& row, const Picture& self,
-                      const std::vector<Value>& arguments) const {
-    std::int64_t pixels = PixelsOf(self), times = 1;
+  /// The pixels of a call's pictures.
+  std::int64_t PixelsOf(const MethodEntry& row, const Picture& self,
+                        const std::vector<Value>& arguments) const {
+    std::int64_t pixels = PixelsOf(self);
+    for (std::size_t i = 0; i < arguments.size(); ++i)
+      for (const Picture& picture : Pictures)
+        if (row.Of.Parameters[i].Type == "picturezor" && picture.Address() == arguments[i].Address)
+          pixels += PixelsOf(picture);
+    return pixels;
+  }
+  /// How often a call looks at them, by its numbers.
+  static std::int64_t TimesOf(const MethodEntry& row, const std::vector<Value>& arguments) {
+    std::int64_t times = 1;
     for (std::size_t i = 0; i < arguments.size(); ++i) {
       const std::string name = model::Lower(row.Of.Parameters[i].Name);
-      const std::int64_t number = std::clamp<std::int64_t>(std::abs(arguments[i].Whole), 1, 1 << 20);
-      if (row.Of.Parameters[i].Type == "picturezor")
-        for (const Picture& picture : Pictures)
-          if (picture.Address() == arguments[i].Address) pixels += PixelsOf(picture);
+      const std::int64_t number = std::clamp<std::int64_t>(arguments[i].Whole, 1, 1000);
       if (name == "iterations") times *= number;
-      if (name == "range") times *= (2 * number + 1) * (2 * number + 1);
-      if (name == "matrixdimension") times *= number * number;
+      if (name == "range" || name == "matrixdimension") times *= 4 * number * number;
     }
-    return std::max<std::int64_t>(pixels, 1) * times;
+    return times;
   }
 
   void Call(Numbers numbers) {
@@ -248,11 +254,12 @@ class Program {
     std::vector<Value> arguments;
     for (const Parameter& parameter : row.Of.Parameters) arguments.push_back(Argument(parameter, numbers));
     if ((self && IsLarge(row, self, arguments)) || !KeepsPromises(row, arguments)) return;
-    const std::int64_t work = WorkOf(row, self, arguments);
-    if (work > MostWork) return;
-    Work += work;
+    const std::int64_t pixels = PixelsOf(row, self, arguments), all = pixels * TimesOf(row, arguments);
+    const bool few = pixels <= MostPixels;
+    if (!few && all > MostWork) return;
+    Work += few ? pixels : all;
     const Outcome outcome = [&] {
-      const TimeLimit limit(work);
+      const TimeLimit limit(std::min(all, MostWork));
       return CallRow(row, self.Address(), arguments);
     }();
     if (constructs) Keep(self);
