@@ -28,6 +28,12 @@ MemoryBlock::MemoryBlock(std::size_t size) : Object(Adopt(NewBlock(Bytes(size)))
 MemoryBlock::MemoryBlock(std::span<const std::uint8_t> bytes)
     : Object(Adopt(NewBlock(Bytes(bytes.begin(), bytes.end())))) {}
 
+MemoryBlock MemoryBlock::Over(std::span<std::uint8_t> memory) {
+  MemoryBlock block{Adopt(NewBlock(static_cast<void*>(memory.data())))};
+  block.Limit(memory.size());
+  return block;
+}
+
 std::span<std::uint8_t> MemoryBlock::Data() const {
   const auto* payload = HeldBy<BlockPayload>(Address());
   return payload ? std::span(payload->Start, payload->Size) : std::span<std::uint8_t>();

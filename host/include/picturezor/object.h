@@ -47,6 +47,8 @@ class MemoryBlock : public Object {
   /// A zeroed block.
   explicit MemoryBlock(std::size_t size);
   explicit MemoryBlock(std::span<const std::uint8_t> bytes);
+  /// Over somebody else's memory, which outlives it.
+  static MemoryBlock Over(std::span<std::uint8_t> memory);
 
   /// The bytes of the block. One over memory of the module knows no size of its own: 0 unless `Limit` has
   /// told it.
