@@ -9,9 +9,6 @@ namespace zor {
 /// Bytes that repeat along a row, as a stretch that is long enough for vectors.
 class BytePattern {
  public:
-  /// The bytes of a stretch at most.
-  static constexpr std::ptrdiff_t Most = 1536;
-
   /// byteAt(i) gives the bytes of one period, of at most 256.
   template <class ByteAt>
   BytePattern(std::ptrdiff_t period, ByteAt&& byteAt) : Length(Most / period * period) {
@@ -28,6 +25,7 @@ class BytePattern {
   }
 
  private:
+  static constexpr std::ptrdiff_t Most = 1536;
   std::ptrdiff_t Length;
   std::array<Sample, Most> Bytes;
 };

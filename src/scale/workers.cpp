@@ -67,10 +67,12 @@ bool Start(WorkerSlot& slot) {
   pthread_cond_init(&slot.Finished, &monotonic);
   pthread_condattr_destroy(&monotonic);
   slot.Pending = false;
-  // Signals are the program's business.
-  sigset_t all, before;
-  sigfillset(&all);
-  pthread_sigmask(SIG_SETMASK, &all, &before);
+  // Signals are the program's business, but for those that what a thread does raises for itself: the program
+  // may have a way to go on.
+  sigset_t others, before;
+  sigfillset(&others);
+  for (const int own : {SIGSEGV, SIGBUS, SIGFPE, SIGILL, SIGABRT, SIGTRAP}) sigdelset(&others, own);
+  pthread_sigmask(SIG_SETMASK, &others, &before);
   pthread_t thread;
   slot.Started = pthread_create(&thread, nullptr, RunSlices, &slot) == 0;
   pthread_sigmask(SIG_SETMASK, &before, nullptr);
