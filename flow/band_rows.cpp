@@ -39,8 +39,9 @@ BandSizes ChooseBands(const BandChain& chain, int threads, std::int64_t memory) 
   return sizes;
 }
 
-BandRows::BandRows(std::unique_ptr<Rows> source, BandChain chain, int threads, const BandSizes& sizes)
-    : Rows(chain.Result()), Source(std::move(source)), Chain(std::move(chain)), Sizes(sizes) {
+BandRows::BandRows(const RowSource& source, const BandChain& chain, int threads, const BandSizes& sizes,
+                   std::int64_t first)
+    : Rows(chain.Result()), From(source), Chain(chain), Sizes(sizes), FirstRow(first), NextRow(first) {
   try {
     Threads.push_back(StartThread([this] { ReadAhead(); }));
     for (int i = 0; i < threads && !Chain.Empty(); ++i) Threads.push_back(StartThread([this] { Work(); }));
@@ -66,7 +67,7 @@ void BandRows::Stop() {
 
 void BandRows::ReadAhead() {
   const std::int64_t height = About().Height;
-  for (std::int64_t first = 0; first < height; first += Sizes.Rows) {
+  for (std::int64_t first = FirstRow; first < height; first += Sizes.Rows) {
     auto band = std::make_unique<Band>();
     const std::int64_t next = std::min<std::int64_t>(first + Sizes.Rows, height);
     band->Rows = {first, next};
@@ -103,7 +104,7 @@ Picture BandRows::SourcePicture(std::int32_t rows) {
       if (spare.Height() == rows) return spare;
     }
   }
-  const Shape& shape = Source->About();
+  const Shape& shape = From.Of;
   Picture picture(shape.Width, rows, shape.Of);
   if (!picture.Valid()) throw files::Failure("not enough memory for a band of rows");
   return picture;
@@ -111,13 +112,18 @@ Picture BandRows::SourcePicture(std::int32_t rows) {
 
 Picture BandRows::ReadBand(RowRange rows, std::int64_t nextFirst) {
   const Picture picture = SourcePicture(std::int32_t(rows.Count()));
-  const auto rowBytes = std::int64_t(Source->RowBytes()), rowSize = std::int64_t{picture.RowSize()};
+  const std::int64_t rowBytes = SourceBytes(From.Of), rowSize = picture.RowSize();
   std::uint8_t* const samples = RowOf(picture, 0);
   const auto at = [&](std::int64_t row) { return samples + (row - rows.First) * rowSize; };
   for (std::int64_t row = rows.First, kept = 0; row < RowsRead; ++row, kept += rowBytes)
     std::memcpy(at(row), &Kept[std::size_t(kept)], std::size_t(rowBytes));
-  if (RowsRead < rows.First) Source->Skip(rows.First - std::exchange(RowsRead, rows.First));
-  for (; RowsRead < rows.End && !Stopped; ++RowsRead) ReadRow(*Source, at(RowsRead));
+  if (!Source) Source = From.From(RowsRead = rows.First);
+  while (RowsRead < rows.End && !Stopped) {
+    const auto count = std::int32_t(
+        std::min<std::int64_t>(rows.End - RowsRead, std::max<std::int64_t>(LeastBytes / rowBytes, 1)));
+    ReadRows(*Source, at(RowsRead), rowSize, count);
+    RowsRead += count;
+  }
   Kept.clear();
   for (std::int64_t row = std::max(nextFirst, rows.First); row < rows.End; ++row)
     Kept.insert(Kept.end(), at(row), at(row) + rowBytes);
@@ -168,15 +174,12 @@ void BandRows::GoOn() {
   RowSize = InHand->Result.RowSize();
 }
 
-const std::uint8_t* BandRows::Next(std::uint8_t*) {
+RowBlock BandRows::Next(std::uint8_t*, std::ptrdiff_t, std::int32_t most) {
   if (!InHand || NextRow >= InHand->Rows.End) GoOn();
-  return Samples + (NextRow++ - InHand->Rows.First) * RowSize;
-}
-
-void BandRows::Skip(std::int64_t count) {
+  const auto count = std::int32_t(std::min<std::int64_t>(most, InHand->Rows.End - NextRow));
+  const RowBlock block{Samples + (NextRow - InHand->Rows.First) * RowSize, RowSize, count};
   NextRow += count;
-  // Not from the band before it.
-  while (!InHand || (NextRow > InHand->Rows.End)) GoOn();
+  return block;
 }
 
 }

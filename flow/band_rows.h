@@ -29,10 +29,11 @@ BandSizes ChooseBands(const BandChain& chain, int threads, std::int64_t memory);
 /// operations the source alone is read ahead.
 class BandRows final : public Rows {
  public:
-  BandRows(std::unique_ptr<Rows> source, BandChain chain, int threads, const BandSizes& sizes);
+  /// From the row `first` of the result on.
+  BandRows(const RowSource& source, const BandChain& chain, int threads, const BandSizes& sizes,
+           std::int64_t first);
   ~BandRows() override;
-  const std::uint8_t* Next(std::uint8_t* room) override;
-  void Skip(std::int64_t count) override;
+  RowBlock Next(std::uint8_t* room, std::ptrdiff_t stride, std::int32_t most) override;
 
  private:
   /// A band on its way.
@@ -52,11 +53,13 @@ class BandRows final : public Rows {
   void GoOn();
   void Stop();
 
-  const std::unique_ptr<Rows> Source;
+  const RowSource From;
   const BandChain Chain;
   const BandSizes Sizes;
+  const std::int64_t FirstRow;
 
-  // The reading thread's: the last rows read, which the next band begins with, and how many have been read.
+  // The reading thread's: the last rows read, which the next band begins with, and the row behind them.
+  std::unique_ptr<Rows> Source;
   Bytes Kept;
   std::int64_t RowsRead = 0;
 

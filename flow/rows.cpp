@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <mutex>
 
 #include "failure.h"
 
@@ -11,19 +12,25 @@ namespace {
 
 class RowsOfFile final : public Rows {
  public:
-  explicit RowsOfFile(std::unique_ptr<files::ImageReader> reader)
-      : Rows(ShapeOf(reader->Info())), Reader(std::move(reader)) {}
-
-  const std::uint8_t* Next(std::uint8_t* room) override {
-    Reader->ReadRow(room);
-    if (Reader->Info().Orientation == 2) Mirror(room);
-    if (++Done == About().Height) Reader->Finish();
-    return room;
+  RowsOfFile(std::unique_ptr<files::ImageReader> reader, std::int64_t first)
+      : Rows(ShapeOf(reader->Info())), Reader(std::move(reader)) {
+    const files::ImageInfo& info = Reader->Info();
+    const auto y = std::int32_t(first);
+    if (y > 0 && Reader->StartsAnywhere() && Reader->Select({0, y, info.Width, info.Height - y})) {
+      Done = y;
+    } else {
+      Bytes dropped(RowBytes());
+      while (Done < y) Next(dropped.data(), 0, 1);
+    }
   }
 
-  void Skip(std::int64_t count) override {
-    Dropped.resize(RowBytes());
-    while (count-- > 0) Next(Dropped.data());
+  RowBlock Next(std::uint8_t* room, std::ptrdiff_t stride, std::int32_t most) override {
+    Reader->ReadRows(room, stride, most);
+    if (Reader->Info().Orientation == 2)
+      for (std::int32_t y = 0; y < most; ++y) Mirror(room + y * stride);
+    Done += most;
+    if (Done == About().Height) Reader->Finish();
+    return {room, stride, most};
   }
 
  private:
@@ -36,38 +43,49 @@ class RowsOfFile final : public Rows {
 
   std::unique_ptr<files::ImageReader> Reader;
   std::int32_t Done = 0;
-  Bytes Dropped;
 };
 
 class RowsOfPicture final : public Rows {
  public:
-  RowsOfPicture(const Picture& picture, const Shape& shape)
-      : Rows(shape), Of(picture), Packed(!picture.Parent() && picture.ImageFormat() == shape.Of) {}
-
-  const std::uint8_t* Next(std::uint8_t* room) override {
-    if (Packed) return RowOf(Of, Done++);
-    Row = Of.RowInFormat(Done++, About().Of);
-    if (Row.empty()) throw files::Failure("a row of a picture can't be converted");
-    std::memcpy(room, Row.data(), Row.size());
-    return room;
+  RowsOfPicture(const Picture& picture, const Shape& shape, std::int64_t first)
+      : Rows(shape), Of(picture), Done(std::int32_t(first)) {
+    Packed = !picture.Parent() && picture.ImageFormat() == shape.Of;
+    // A window shows a few rows only.
+    if (Packed && !picture.IsMapping()) Samples = RowOf(picture, 0);
   }
 
-  void Skip(std::int64_t count) override { Done += std::int32_t(count); }
+  RowBlock Next(std::uint8_t* room, std::ptrdiff_t stride, std::int32_t most) override {
+    if (Samples) {
+      const RowBlock block{Samples + std::ptrdiff_t{Of.RowSize()} * Done, Of.RowSize(), most};
+      Done += most;
+      return block;
+    }
+    if (Packed) return {RowOf(Of, Done++), 0, 1};
+    const Bytes row = Of.RowInFormat(Done++, About().Of);
+    if (row.empty()) throw files::Failure("a row of a picture can't be converted");
+    std::memcpy(room, row.data(), row.size());
+    return {room, stride, 1};
+  }
 
  private:
   Picture Of;
-  const bool Packed;
-  std::int32_t Done = 0;
-  Bytes Row;
+  std::int32_t Done;
+  bool Packed;
+  const std::uint8_t* Samples = nullptr;
 };
 
 }
 
 std::size_t Rows::RowBytes() const { return std::size_t(Of.Width) * std::size_t(BytesPerPixel(Of.Of)); }
 
-void ReadRow(Rows& rows, std::uint8_t* room) {
-  const std::uint8_t* row = rows.Next(room);
-  if (row != room) std::memcpy(room, row, rows.RowBytes());
+void ReadRows(Rows& rows, std::uint8_t* room, std::ptrdiff_t stride, std::int32_t count) {
+  while (count > 0) {
+    const RowBlock block = rows.Next(room, stride, count);
+    for (std::int32_t y = 0; block.First != room && y < block.Count; ++y)
+      std::memcpy(room + y * stride, block.First + y * block.Stride, rows.RowBytes());
+    room += block.Count * stride;
+    count -= block.Count;
+  }
 }
 
 Shape ShapeOf(const files::ImageInfo& info) {
@@ -75,11 +93,32 @@ Shape ShapeOf(const files::ImageInfo& info) {
   return {upright.Width, upright.Height, upright.Pixels, upright.Density};
 }
 
-std::unique_ptr<Rows> RowsOf(std::unique_ptr<files::ImageReader> reader) {
-  return std::make_unique<RowsOfFile>(std::move(reader));
+RowSource RowsOf(OpenFile file) {
+  struct Opened {
+    std::mutex Access;
+    OpenFile File;
+  };
+  const Shape shape = ShapeOf(file.Reader->Info());
+  const bool anywhere = file.Reader->StartsAnywhere() && file.Again;
+  auto opened = std::make_shared<Opened>();
+  opened->File = std::move(file);
+  const auto from = [opened](std::int64_t first) -> std::unique_ptr<Rows> {
+    std::unique_ptr<files::ImageReader> reader;
+    {
+      const std::lock_guard lock(opened->Access);
+      reader = std::move(opened->File.Reader);
+      if (!reader && !opened->File.Again)
+        throw files::Failure("the input would have to be read twice, which can't be done with this one");
+      if (!reader) reader = opened->File.Again();
+    }
+    return std::make_unique<RowsOfFile>(std::move(reader), first);
+  };
+  return {.Of = shape, .From = from, .Anywhere = anywhere};
 }
-std::unique_ptr<Rows> RowsOf(const Picture& picture, const Shape& shape) {
-  return std::make_unique<RowsOfPicture>(picture, shape);
+
+RowSource RowsOf(const Picture& picture, const Shape& shape) {
+  return {.Of = shape,
+          .From = [=](std::int64_t first) { return std::make_unique<RowsOfPicture>(picture, shape, first); }};
 }
 
 std::uint8_t* RowOf(const Picture& picture, std::int32_t y) {

@@ -1,7 +1,10 @@
 #include "run.h"
 
 #include <algorithm>
+#include <chrono>
+#include <condition_variable>
 
+#include "arriving_picture.h"
 #include "band_rows.h"
 #include "failure.h"
 #include "in_format.h"
@@ -13,36 +16,47 @@ namespace {
 
 /// Bytes that bands take where they need no more.
 constexpr std::int64_t FewBandBytes = 32 << 20;
+/// Bytes of rows that go to a writer together.
+constexpr std::int64_t RowsAtOnceBytes = 1 << 20;
 
 using Kind = Dependence::Kind;
 
 int ThreadsOf(const RunOptions& options) { return options.Threads > 0 ? options.Threads : Processors(); }
 
-/// Rows on their way through operations: they come one by one, or all of them stand in a picture.
+/// A picture on its way through operations: its rows come one by one, or all of them stand in memory.
 class Stream {
  public:
-  Stream(std::unique_ptr<Rows> rows, const RunOptions& options, files::Progress& progress)
-      : Coming(std::move(rows)), Of(Coming->About()), Options(options), Report(progress) {}
+  Stream(OpenFile file, const RunOptions& options, files::Progress& progress)
+      : Of(ShapeOf(file.Reader->Info())), Options(options), Report(progress) {
+    const bool asItComes = file.Reader->Info().Orientation <= 2 && options.Stores.Kind == files::Store::Auto;
+    if (asItComes) {
+      Coming = RowsOf(std::move(file));
+    } else {
+      Whole = files::MakePictures(options.Stores, {{Of.Width, Of.Height, Of.Of}})[0];
+      files::ReadInto(Whole, *file.Reader, progress);
+    }
+  }
 
   const Shape& About() const { return Of; }
 
   void Add(const Operation& work) {
     const Shape result = work.Result(Of);
-    if (work.DependsOn(Of).Of != Kind::Bands || Options.Stores.Kind != files::Store::Auto ||
-        !JoinsBands(work)) {
+    const Kind kind = Options.Stores.Kind == files::Store::Auto ? work.DependsOn(Of).Of : Kind::Whole;
+    if (kind != Kind::Bands || !JoinsBands(work)) {
       FlushBands();
-      ApplyWhole(work);
+      if (kind == Kind::InOrder && Coming)
+        ApplyInOrder(work);
+      else
+        ApplyWhole(work);
     }
     Of = result;
   }
 
   std::unique_ptr<Rows> Take() {
-    if (Coming && Options.Stores.Kind != files::Store::Auto)
-      Whole = Gather(*TakeComing(), Options.Stores, Report);
     FlushBands();
     // Where nothing is left to do they are read ahead.
     if (Coming && !ReadAhead) AddBands(BandChain({}, Of));
-    return Coming ? std::move(Coming) : RowsOf(Whole, Of);
+    return Coming ? Coming->From(0) : RowsOf(Whole, Of).From(0);
   }
 
  private:
@@ -80,22 +94,69 @@ class Stream {
     AddBands(BandChain(std::exchange(Bands, {}), BandsFrom));
   }
 
-  void AddBands(BandChain chain) {
-    if (!Coming) Coming = RowsOf(std::exchange(Whole, {}), BandsFrom);
-    const BandSizes sizes = ChooseBands(chain, ThreadsOf(Options), MemoryFor(chain));
-    Coming = std::make_unique<BandRows>(std::move(Coming), std::move(chain), ThreadsOf(Options), sizes);
+  void AddBands(const BandChain& chain) {
+    if (!Coming) Coming = RowsOf(std::exchange(Whole, {}), chain.Source());
+    const int threads = ThreadsOf(Options);
+    const BandSizes sizes = ChooseBands(chain, threads, MemoryFor(chain));
+    const auto from = [=, source = *Coming](std::int64_t first) {
+      return std::make_unique<BandRows>(source, chain, threads, sizes, first);
+    };
+    Coming = RowSource{chain.Result(), from, Coming->Anywhere};
     ReadAhead = true;
   }
 
-  std::unique_ptr<Rows> TakeComing() {
+  /// The work goes on while the rows arrive. This thread reports.
+  void ApplyInOrder(const Operation& work) {
+    const int threads = Coming->Anywhere ? ThreadsOf(Options) : 1;
+    ArrivingPicture source(*Coming, threads);
+    std::exception_ptr failed;
+    std::atomic<bool> done = false;
+    std::mutex access;
+    std::condition_variable changed;
+    std::thread worker = StartThread([&] {
+      try {
+        Whole = work.Apply(source.Of(), {.Stores = Options.Stores, .Threads = threads});
+      } catch (...) {
+        failed = std::current_exception();
+      }
+      const std::lock_guard lock(access);
+      done = true;
+      changed.notify_one();
+    });
+    const struct Join {
+      ArrivingPicture& Source;
+      std::thread& Worker;
+      ~Join() {
+        if (!Worker.joinable()) return;
+        Source.GiveUp();
+        Worker.join();
+      }
+    } join{source, worker};
+    Report.Begin("reading", Of.Height);
+    std::unique_lock lock(access);
+    for (std::int64_t told = 0; !done;) {
+      changed.wait_for(lock, std::chrono::milliseconds(50));
+      const std::int64_t now = std::min<std::int64_t>(source.RowsRead(), Of.Height);
+      if (now > told) Report.Step(now - told);
+      told = now;
+      Report.Tick();
+    }
+    lock.unlock();
+    worker.join();
+    source.RequireAll();
+    if (failed) std::rethrow_exception(failed);
+    Coming.reset();
     ReadAhead = false;
-    return std::exchange(Coming, nullptr);
   }
 
   void ApplyWhole(const Operation& work) {
     files::StoreOptions stores = Options.Stores;
     stores.MemoryLimit /= std::max(1, work.Pictures());
-    if (Coming) Whole = Gather(*TakeComing(), stores, Report);
+    if (Coming) {
+      Whole = Gather(*Coming->From(0), stores, Report);
+      Coming.reset();
+      ReadAhead = false;
+    }
     Report.Begin("working");
     if (work.DependsOn(Of).Of != Kind::Bands) {
       Whole = work.Apply(std::move(Whole), {.Stores = stores, .Threads = ThreadsOf(Options)});
@@ -108,7 +169,7 @@ class Stream {
     Whole = chain.Apply(std::move(Whole), all, {.Stores = stores, .Threads = ThreadsOf(Options)});
   }
 
-  std::unique_ptr<Rows> Coming;
+  std::optional<RowSource> Coming;
   /// Whether those come from bands, which read ahead themselves.
   bool ReadAhead = false;
   Picture Whole;
@@ -127,18 +188,9 @@ Shape ResultOf(const Shape& source, const Chain& chain) {
   return shape;
 }
 
-std::unique_ptr<Rows> Open(std::unique_ptr<files::ImageReader> reader, const RunOptions& options,
-                           files::Progress& progress) {
-  if (reader->Info().Orientation <= 2) return RowsOf(std::move(reader));
-  const Shape shape = ShapeOf(reader->Info());
-  const Picture picture = files::MakePictures(options.Stores, {{shape.Width, shape.Height, shape.Of}})[0];
-  files::ReadInto(picture, *reader, progress);
-  return RowsOf(picture, shape);
-}
-
-std::unique_ptr<Rows> Through(std::unique_ptr<Rows> source, const Chain& chain, const RunOptions& options,
+std::unique_ptr<Rows> Through(OpenFile file, const Chain& chain, const RunOptions& options,
                               files::Progress& progress) {
-  Stream stream(std::move(source), options, progress);
+  Stream stream(std::move(file), options, progress);
   for (const auto& work : chain) stream.Add(*work);
   return stream.Take();
 }
@@ -147,21 +199,29 @@ Picture Gather(Rows& rows, const files::StoreOptions& stores, files::Progress& p
   const Shape& shape = rows.About();
   const Picture picture = files::MakePictures(stores, {{shape.Width, shape.Height, shape.Of}})[0];
   progress.Begin("reading", shape.Height);
-  for (std::int32_t y = 0; y < shape.Height; ++y, progress.Step()) ReadRow(rows, RowOf(picture, y));
+  for (std::int32_t y = 0; y < shape.Height; ++y, progress.Step()) ReadRows(rows, RowOf(picture, y), 0, 1);
   return picture;
 }
 
-void Run(std::unique_ptr<files::ImageReader> reader, const Chain& chain, Format format,
-         files::ImageWriter& writer, const RunOptions& options, files::Progress& progress) {
+void Run(OpenFile file, const Chain& chain, Format format, files::ImageWriter& writer,
+         const RunOptions& options, files::Progress& progress) {
   const InFormat converted(format);
-  Stream stream(Open(std::move(reader), options, progress), options, progress);
+  Stream stream(std::move(file), options, progress);
   for (const auto& work : chain) stream.Add(*work);
   if (stream.About().Of != format) stream.Add(converted);
   const std::unique_ptr<Rows> rows = stream.Take();
   const std::int32_t height = rows->About().Height;
   progress.Begin("writing", height);
-  Bytes room(rows->RowBytes());
-  for (std::int32_t y = 0; y < height; ++y, progress.Step()) writer.WriteRow(rows->Next(room.data()));
+  const auto together =
+      std::int32_t(std::clamp<std::int64_t>(RowsAtOnceBytes / std::int64_t(rows->RowBytes()), 1, height));
+  Bytes room(rows->RowBytes() * std::size_t(together));
+  for (std::int32_t y = 0; y < height;) {
+    const RowBlock block =
+        rows->Next(room.data(), std::ptrdiff_t(rows->RowBytes()), std::min(together, height - y));
+    writer.WriteRows(block.First, block.Stride, block.Count);
+    y += block.Count;
+    progress.Step(block.Count);
+  }
   writer.Finish();
 }
 

@@ -23,18 +23,15 @@ struct RunOptions {
 /// gets.
 Shape ResultOf(const Shape& source, const Chain& chain);
 
-/// The rows of a file, upright.
-std::unique_ptr<Rows> Open(std::unique_ptr<files::ImageReader> reader, const RunOptions& options,
-                           files::Progress& progress);
-/// The rows of the result of operations. The chain outlives it.
-std::unique_ptr<Rows> Through(std::unique_ptr<Rows> source, const Chain& chain, const RunOptions& options,
+/// The rows of the result of operations on a file's picture. The chain and the progress outlive them.
+std::unique_ptr<Rows> Through(OpenFile file, const Chain& chain, const RunOptions& options,
                               files::Progress& progress);
 /// All rows as a picture.
 Picture Gather(Rows& rows, const files::StoreOptions& stores, files::Progress& progress);
 
 /// Carries a file's picture through operations into another file, as pixels of `format`, one of those of
 /// files to which there is a way; see files::Convertible. The writer is finished at the end.
-void Run(std::unique_ptr<files::ImageReader> reader, const Chain& chain, Format format,
-         files::ImageWriter& writer, const RunOptions& options, files::Progress& progress);
+void Run(OpenFile file, const Chain& chain, Format format, files::ImageWriter& writer,
+         const RunOptions& options, files::Progress& progress);
 
 }
