@@ -1,3 +1,5 @@
+#include <cstring>
+
 #include "image/conversion.h"
 #include "image/lifecycle.h"
 #include "image/walk.h"
@@ -6,17 +8,17 @@
 namespace zor {
 namespace {
 
-/// A row of nearest pixels. The product is made anew for each, so that no error adds up.
+/// A row of nearest pixels, each from a column of the source.
 using NearestRow = void (*)(const Sample* from, const PlaneList& in, Sample* into, const PlaneList& out,
-                            std::int32_t width, double ratio);
+                            std::int32_t width, const std::int32_t* columns);
 
 template <int I, int O, Colour<O> (*Step)(Colour<I>), bool Alpha>
 void TakeNearest(const Sample* from, const PlaneList& in, Sample* into, const PlaneList& out,
-                 std::int32_t width, double ratio) {
+                 std::int32_t width, const std::int32_t* columns) {
   const PlaneRow<I + Alpha> source(const_cast<Sample*>(from), in);
   const PlaneRow<O + Alpha> dest(into, out);
   for (std::int32_t x = 0; x < width; ++x) {
-    const auto nearest = std::int32_t(ratio * x);
+    const std::ptrdiff_t nearest = columns[x];
     Colour<I> colour;
     for (int i = 0; i < I; ++i) colour.Of[i] = source(i, nearest);
     const Colour<O> result = Step(colour);
@@ -60,6 +62,22 @@ NearestRow FindNearest(const PictureData& source, const PictureData& dest) {
   return nullptr;
 }
 
+/// Whole pixels. Those of three bytes go as four, of which the next pixel overwrites one.
+template <int Size>
+void CopyNearest(const Sample* from, const PlaneList& in, Sample* into, const PlaneList& out,
+                 std::int32_t width, const std::int32_t* columns) {
+  constexpr std::size_t all = Size == 3 ? 4 : Size;
+  const Sample* const first = from + FirstOffset(in);
+  Sample* const dest = into + FirstOffset(out);
+  std::ptrdiff_t x = 0;
+  for (const std::int32_t last = columns[width - 1]; columns[x] < last; ++x) {
+    Sample pixel[all];
+    std::memcpy(pixel, first + std::ptrdiff_t{columns[x]} * Size, all);
+    std::memcpy(dest + x * Size, pixel, all);
+  }
+  for (; x < width; ++x) std::memcpy(dest + x * Size, first + std::ptrdiff_t{columns[x]} * Size, Size);
+}
+
 /// The planes that a pair's loop works on: alpha only where both have it.
 PlaneList PlanesFor(const PictureData& picture, bool alpha) {
   const Group group = GroupOf(picture);
@@ -74,7 +92,7 @@ Boolean ScaleFast(PictureZOR* self, PictureZOR* source, Integer width, Integer h
   if (!from.Valid || !dest.Valid) return false;
   width = std::min(width, dest.Width);
   height = std::min(height, dest.Height);
-  const NearestRow take = FindNearest(from, dest);
+  NearestRow take = FindNearest(from, dest);
   if (width < 1 || height < 1 || !take || !Usable(from) || from.Width < 1) return false;
   MayYield(from);
   const double xRatio = double(from.Width) / width, yRatio = double(from.Height) / height;
@@ -82,14 +100,31 @@ Boolean ScaleFast(PictureZOR* self, PictureZOR* source, Integer width, Integer h
   MayYield(dest);
   const bool alpha = from.HasAlpha && dest.HasAlpha;
   const PlaneList in = PlanesFor(from, alpha), out = PlanesFor(dest, alpha);
-  for (std::int32_t y = 0; y < height; ++y) {
-    Walk walk(From(from, std::int32_t(yRatio * y)), Yielding(Into(dest, y)));
-    if (!walk.Rows(1, [&](std::int32_t, const Sample* row, Sample* into) {
-          take(row, in, into, out, width, xRatio);
-        }))
-      return false;
+  const Buffer memory = NewBuffer(std::int64_t{width}, sizeof(std::int32_t));
+  if (!memory) return false;
+  auto* const columns = reinterpret_cast<std::int32_t*>(memory.get());
+  // A product for each, so that no error adds up.
+  for (std::int32_t x = 0; x < width; ++x) columns[x] = std::int32_t(xRatio * x);
+  const bool apart = !SharePixels(from, dest) && RowsAreApart(dest);
+  if (apart && FamilyOf(from) == FamilyOf(dest) && FillPixelsAlike(in, out))
+    ForPlaneCount(in.Count, [&](auto n) { take = CopyNearest<n>; });
+  const bool repeats = apart && FillPixels(out);
+  bool reached = true;
+  for (std::int32_t y = 0, last = -1; reached && y < height; ++y) {
+    const auto nearest = std::int32_t(yRatio * y);
+    const Lane into = Yielding(Into(dest, y));
+    if (repeats && nearest == last)
+      reached = Walk(From(dest, y - 1), into).Rows(1, [&](std::int32_t, const Sample* above, Sample* row) {
+        const std::int32_t first = FirstOffset(out);
+        std::memcpy(row + first, above + first, std::size_t(width) * std::size_t(out.Step));
+      });
+    else
+      reached = Walk(From(from, nearest), into).Rows(1, [&](std::int32_t, const Sample* source, Sample* row) {
+        take(source, in, row, out, width, columns);
+      });
+    last = nearest;
   }
-  return true;
+  return reached;
 }
 
 }

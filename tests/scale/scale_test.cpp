@@ -477,25 +477,32 @@ TEST(ScaleFast, TakesTruncatedPlaces) {
     int From, Into;
     Samples Columns;
   } cases[] = {{2, 4, {0, 0, 1, 1}}, {4, 2, {0, 2}}, {3, 2, {0, 1}}, {3, 3, {0, 1, 2}}, {7, 3, {0, 2, 4}}};
-  for (const auto& [from, into, columns] : cases) {
-    Picture source(from, from, Format::G), dest(into, into, Format::G);
-    for (int y = 0; y < from; ++y) {
-      Samples row;
-      for (int x = 0; x < from; ++x) row.push_back(std::uint8_t(16 * y + x));
-      source.SetRowInFormat(y, Format::G, row);
+  for (const auto& [from, into, columns] : cases)
+    for (const Format format : {Format::G, Format::RGB, Format::XRGB, Format::CMYKA}) {
+      SCOPED_TRACE(testing::Message() << int(format) << ", " << from << " to " << into);
+      // Place c of the pixel at x, y.
+      const auto sample = [](int x, int y, int c) { return std::uint8_t(16 * y + x + 64 * c); };
+      const Picture source(from, from, format);
+      const int size = BytesPerPixel(format);
+      Samples pixels, wanted;
+      for (int i = 0; i < from * from * size; ++i)
+        pixels.push_back(sample(i / size % from, i / size / from, i % size));
+      SetPacked(source, pixels);
+      for (const auto y : columns)
+        for (const auto x : columns)
+          for (int c = 0; c < size; ++c)
+            wanted.push_back(format == Format::XRGB && c == 0 ? 9 : sample(x, y, c));
+      ForEveryStore(into, into, format, [&, into = into](const Picture& dest) {
+        SetPacked(dest, Samples(wanted.size(), 9));
+        // A size beyond dest's is cut to it.
+        ASSERT_TRUE(dest.ScaleFast(source, into + 5, 0x7FFFFFFF));
+        EXPECT_EQ(Packed(dest), wanted);
+        for (const int none : {0, -1, -0x7FFFFFFF - 1}) {
+          EXPECT_FALSE(dest.ScaleFast(source, none, 1));
+          EXPECT_FALSE(dest.ScaleFast(source, 1, none));
+        }
+      });
     }
-    // A size beyond dest's is cut to it.
-    ASSERT_TRUE(dest.ScaleFast(source, into + 5, 0x7FFFFFFF));
-    for (int y = 0; y < into; ++y) {
-      Samples row;
-      for (const auto column : columns) row.push_back(std::uint8_t(16 * columns[std::size_t(y)] + column));
-      EXPECT_EQ(dest.RowInFormat(y, Format::G), row);
-    }
-    for (const int none : {0, -1, -0x7FFFFFFF - 1}) {
-      EXPECT_FALSE(dest.ScaleFast(source, none, 1));
-      EXPECT_FALSE(dest.ScaleFast(source, 1, none));
-    }
-  }
 }
 
 // Which pairs there are, and what a pixel becomes.
