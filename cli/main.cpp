@@ -13,16 +13,6 @@ namespace picturezor::cli {
 
 namespace {
 
-/// $PICTUREZOR_MODULE, or beside the program, or where an installation puts it.
-std::filesystem::path ModulePath() {
-  if (const char* named = std::getenv("PICTUREZOR_MODULE"); named && *named) return named;
-  std::error_code failed;
-  const auto program = std::filesystem::read_symlink("/proc/self/exe", failed).parent_path();
-  for (const auto* place : {"PictureZOR.so", "../" PICTUREZOR_LIBRARY_DIR "/picturezor/PictureZOR.so"})
-    if (std::filesystem::exists(program / place, failed)) return (program / place).lexically_normal();
-  throw Failure("the module PictureZOR.so isn't beside the program; PICTUREZOR_MODULE can name it");
-}
-
 int Complain(Session& session, std::string text, int code) {
   session.Bar.Clear();
   std::ranges::replace(text, '\n', ' ');
@@ -62,7 +52,7 @@ int Run(int count, char** arguments) {
   try {
     if (!session.Quiet) session.Bar.Enable();
     CatchSignals(Failed);
-    Host::Load(ModulePath());
+    Host::Load();
     const int code = session.Work();
     session.Bar.Clear();
     if (std::fflush(stdout) != 0) return Complain(session, "standard output can't be written", Failed);

@@ -4,6 +4,8 @@
 
 #include <algorithm>
 #include <atomic>
+#include <cstdlib>
+#include <cstring>
 #include <mutex>
 
 #include "object_model.h"
@@ -20,6 +22,25 @@ std::filesystem::path& LoadedModule() {
 }
 std::mutex LoadMutex;
 std::atomic<bool> Loaded = false;
+
+std::filesystem::path InstalledModule() {
+  if (const char* named = std::getenv("PICTUREZOR_MODULE"); named && *named) return named;
+  // The file that this code is in, a shared library or a program that was linked with it.
+  Dl_info code{};
+  dladdr(reinterpret_cast<void*>(&InstalledModule), &code);
+  std::error_code failed;
+  auto file = std::filesystem::read_symlink("/proc/self/exe", failed);
+  if (code.dli_fname && std::strchr(code.dli_fname, '/')) {
+    const auto library = std::filesystem::canonical(code.dli_fname, failed);
+    if (!failed) file = library;
+  }
+  for (const auto* place : {"PictureZOR.so", "picturezor/PictureZOR.so",
+                            "../" PICTUREZOR_LIBRARY_DIR "/picturezor/PictureZOR.so"})
+    if (const auto module = file.parent_path() / place; std::filesystem::exists(module, failed))
+      return module.lexically_normal();
+  throw ModuleError("the module PictureZOR.so isn't beside " + file.string() +
+                    "; the environment variable PICTUREZOR_MODULE can name it");
+}
 
 std::vector<Host::MethodInfo> InfosOf(const std::vector<MethodEntry>& rows) {
   std::vector<Host::MethodInfo> infos;
@@ -55,6 +76,8 @@ void Host::Load(const std::filesystem::path& module, const Options& options) {
   LoadedModule() = path;
   Loaded = true;
 }
+
+void Host::Load() { Load(InstalledModule()); }
 
 bool Host::IsLoaded() { return Loaded; }
 

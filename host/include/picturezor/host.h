@@ -57,6 +57,9 @@ class Host {
   /// Loads the module; once more with the same path does nothing. Throws ModuleError.
   static void Load(const std::filesystem::path& module, const Options& options);
   static void Load(const std::filesystem::path& module) { Load(module, Options()); }
+  /// Loads the module named by the environment variable PICTUREZOR_MODULE, or else the one beside this
+  /// library or program, or where an installation puts it.
+  static void Load();
   static bool IsLoaded();
 
   /// Called when the module lets other host threads run; empty for nothing. An exception that it throws comes

@@ -1,0 +1,41 @@
+# What CMake and pkg-config need to know of the installed libraries, and Debian packages of it all (cpack -G DEB).
+set(cmake_dir ${CMAKE_INSTALL_LIBDIR}/cmake/picturezor)
+configure_package_config_file(cmake/picturezorConfig.cmake.in picturezorConfig.cmake INSTALL_DESTINATION ${cmake_dir})
+write_basic_package_version_file(picturezorConfigVersion.cmake COMPATIBILITY SameMajorVersion)
+install(FILES ${CMAKE_BINARY_DIR}/picturezorConfig.cmake ${CMAKE_BINARY_DIR}/picturezorConfigVersion.cmake
+  DESTINATION ${cmake_dir} COMPONENT development)
+install(EXPORT picturezorTargets NAMESPACE picturezor:: DESTINATION ${cmake_dir} COMPONENT development)
+
+file(RELATIVE_PATH to_prefix /${CMAKE_INSTALL_LIBDIR}/pkgconfig /)
+string(REPLACE ";" " " files_libraries "${PICTUREZOR_FILES_LIBRARIES}")
+set(modules picturezor)
+if(PICTUREZOR_CLI)
+  list(APPEND modules picturezor-files)
+endif()
+foreach(module ${modules})
+  configure_file(cmake/${module}.pc.in ${module}.pc @ONLY)
+  install(FILES ${CMAKE_BINARY_DIR}/${module}.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig COMPONENT development)
+endforeach()
+
+set(CPACK_GENERATOR DEB)
+set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
+set(CPACK_PACKAGE_VENDOR PictureZOR)
+set(CPACK_PACKAGE_CONTACT "PictureZOR's developers <maintainers@example.org>")
+set(CPACK_STRIP_FILES ON)
+set(CPACK_DEB_COMPONENT_INSTALL ON)
+set(CPACK_COMPONENTS_ALL runtime development)
+set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
+# The libraries of one package are looked for while the other is made.
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${CMAKE_BINARY_DIR})
+set(CPACK_DEBIAN_RUNTIME_PACKAGE_NAME picturezor)
+set(CPACK_DEBIAN_RUNTIME_PACKAGE_SECTION graphics)
+set(CPACK_COMPONENT_RUNTIME_DESCRIPTION "Images larger than memory, the same bytes on every machine
+ The command picturezor, the shared libraries and the module that does the work.")
+set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_NAME libpicturezor-dev)
+set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
+set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS
+  "picturezor (= ${PROJECT_VERSION}), libpng-dev, libjpeg-dev, libtiff-dev")
+set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION "Headers and libraries for programs that use PictureZOR
+ C++ headers, static libraries, and files for CMake and pkg-config.")
+include(CPack)
