@@ -34,6 +34,6 @@ for program in by_cmake/outside by_cmake/outside_static ./by_pkg_config; do
   case $program in *_static) export PICTUREZOR_MODULE=$libraries/picturezor/PictureZOR.so ;; *) unset PICTUREZOR_MODULE ;; esac
   echo "$program: $("$program" lake.jpg half.png | tr '\n' ' ')" | tee told
   # A failure of the library is caught outside of it.
-  grep -q '480 x 320 no such file.png: No such file or directory' told
+  grep -q '960 x 600 no such file.png: No such file or directory' told
   usr/bin/picturezor compare expected.png half.png
 done
