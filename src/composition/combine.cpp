@@ -33,10 +33,12 @@ constexpr FamilyPair MeanPairs[] = {
     Pair<Family::RGB, Family::RGB, MeanToAll>,
 };
 
-/// v / 255 for v up to 255 * 255, in 16 bits. With v = 255 q + r = 256 q + (r - q), r from 0 to 254, v >> 8
-/// is q where r >= q and q - 1 elsewhere. So the sum is 256 q + r + 1 or 256 q + r, both within the 256 from
-/// 256 q on, and 256 * 255 + 254 at most.
-constexpr std::uint16_t By255(std::uint16_t v) { return std::uint16_t(std::uint16_t(v + 1 + (v >> 8)) >> 8); }
+/// v / 255 for v up to 255 * 255, as a product of which 16 bits are high ones. With v = 255 q + r, r from 0
+/// to 254, 257 (v + 1) is 65536 q + 257 (r + 1) - q: no less than 65536 q, as q is 255 at most, and less than
+/// 65536 (q + 1), as it is 65535 - q above 65536 q at most.
+constexpr std::uint16_t By255(std::uint16_t v) {
+  return std::uint16_t(std::uint32_t{std::uint16_t(v + 1)} * 257 >> 16);
+}
 
 template <bool PreMultiplied>
 constexpr std::uint16_t Blend(Sample s, Sample m, Sample d) {

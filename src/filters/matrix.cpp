@@ -69,6 +69,14 @@ template <class Sum>
 void ClampSums(const Sum* sums, Sample* out, std::ptrdiff_t count) {
   for (std::ptrdiff_t i = 0; i < count; ++i) out[i] = Sample(std::clamp<Sum>(sums[i], 0, 255));
 }
+/// Sums above `most` are 255 whatever they are.
+void ScaleSumsWhole(const std::int16_t* sums, Sample* out, std::ptrdiff_t count, std::uint16_t factor,
+                    std::int16_t most) {
+  for (std::ptrdiff_t i = 0; i < count; ++i) {
+    const std::uint16_t sum = std::uint16_t(std::clamp<std::int16_t>(sums[i], 0, most));
+    out[i] = Sample(std::uint32_t{sum} * factor >> 16);
+  }
+}
 template <class Sum, class Real>
 void ScaleSums(const Sum* sums, Sample* out, std::ptrdiff_t count, Real scaleFactor) {
   for (std::ptrdiff_t i = 0; i < count; ++i) {
@@ -78,26 +86,41 @@ void ScaleSums(const Sum* sums, Sample* out, std::ptrdiff_t count, Real scaleFac
   }
 }
 
-/// A factor in single precision that gives the same samples for all sums up to the bound; 0 when none is
-/// found. Either way samples never fall as sums grow, so they agree if each of them begins at the same sum.
+/// Whether scaled(sum) gives the same samples as the factor for all sums up to the bound. Either way samples
+/// never fall as sums grow, so they agree if each of them begins at the same sum.
+template <class Scale>
+bool Agrees(double scaleFactor, std::int64_t bound, Scale&& scaled) {
+  for (int sample = 1; sample < 256; ++sample) {
+    std::int64_t below = 0, from = bound + 1;
+    while (from - below > 1) {
+      const std::int64_t middle = (below + from) / 2;
+      (Scaled(double(middle) * scaleFactor) >= sample ? from : below) = middle;
+    }
+    if (scaled(below) >= sample) return false;
+    if (from > bound) return true;
+    if (scaled(from) < sample) return false;
+  }
+  return true;
+}
+
+/// A factor in single precision that agrees; 0 when none is found.
 float SingleFactor(double scaleFactor, std::int64_t bound) {
   if (!(scaleFactor > 1e-6 && scaleFactor < 1e6) || bound >= 1 << 24) return 0;
-  const auto agrees = [&](float factor) {
-    for (int sample = 1; sample < 256; ++sample) {
-      std::int64_t below = 0, from = bound + 1;
-      while (from - below > 1) {
-        const std::int64_t middle = (below + from) / 2;
-        (Scaled(double(middle) * scaleFactor) >= sample ? from : below) = middle;
-      }
-      if (Scaled(double(float(below) * factor)) >= sample) return false;
-      if (from > bound) return true;
-      if (Scaled(double(float(from) * factor)) < sample) return false;
-    }
-    return true;
-  };
   const float nearest = float(scaleFactor);
   for (const float factor : {nearest, std::nextafter(nearest, 2 * nearest)})
-    if (agrees(factor)) return factor;
+    if (Agrees(scaleFactor, bound, [&](std::int64_t sum) { return Scaled(double(float(sum) * factor)); }))
+      return factor;
+  return 0;
+}
+/// One of 16 bits behind the point.
+std::uint16_t WholeFactor(double scaleFactor, std::int64_t bound) {
+  if (!(scaleFactor > 0 && scaleFactor < 0.9999) || bound > std::numeric_limits<std::int16_t>::max())
+    return 0;
+  const auto down = std::int64_t(scaleFactor * 65536);
+  for (const std::int64_t factor : {down, down + 1})
+    if (Agrees(scaleFactor, bound,
+               [&](std::int64_t sum) { return std::min<std::int64_t>(sum * factor >> 16, 255); }))
+      return std::uint16_t(factor);
   return 0;
 }
 
@@ -111,7 +134,10 @@ std::optional<bool> ConvolveRows(const FilterCall& call, const Matrix& matrix) {
   PackedBand band(call.Source, packing, half, std::max(dimension - 1 - half, 0), half);
   const Buffer result = NewBuffer(std::size_t(packing.Samples()));
   if (!band || !result) return std::nullopt;
-  const float single = SingleFactor(matrix.ScaleFactor, matrix.Bound());
+  const std::uint16_t whole = sizeof(Sum) == 2 ? WholeFactor(matrix.ScaleFactor, matrix.Bound()) : 0;
+  const auto most = std::int16_t(
+      std::min(((256 << 16) - 1) / std::max(int{whole}, 1), int{std::numeric_limits<std::int16_t>::max()}));
+  const float single = whole > 0 ? 0 : SingleFactor(matrix.ScaleFactor, matrix.Bound());
   alignas(64) Sum sums[Stretch];
   const auto convolve = [&](std::int32_t y, std::ptrdiff_t first, std::ptrdiff_t count) {
     std::fill_n(sums, count, Sum(matrix.Delta));
@@ -142,6 +168,14 @@ std::optional<bool> ConvolveRows(const FilterCall& call, const Matrix& matrix) {
       }
     add();
   };
+  const auto clamp = [&](Sample* out, std::ptrdiff_t count) {
+    const Sum* const of = sums;
+    if (matrix.ScaleFactor == 1.0) return OnBestTarget<ClampSums<Sum>>(of, out, count);
+    if constexpr (sizeof(Sum) == 2)
+      if (whole > 0) return OnBestTarget<ScaleSumsWhole>(of, out, count, whole, most);
+    single > 0 ? OnBestTarget<ScaleSums<Sum, float>>(of, out, count, single)
+               : OnBestTarget<ScaleSums<Sum, double>>(of, out, count, matrix.ScaleFactor);
+  };
   bool reached = true;
   for (std::int32_t y = 0; reached && y < call.Source.Height; ++y)
     reached = band.MoveTo(y) && WithRow(call.Dest, y, [&](Sample* row) {
@@ -149,14 +183,7 @@ std::optional<bool> ConvolveRows(const FilterCall& call, const Matrix& matrix) {
                   for (std::ptrdiff_t first = 0; first < packing.Samples(); first += Stretch) {
                     const std::ptrdiff_t count = std::min(Stretch, packing.Samples() - first);
                     convolve(y, first, count);
-                    if (matrix.ScaleFactor == 1.0)
-                      OnBestTarget<ClampSums<Sum>>(static_cast<const Sum*>(sums), out + first, count);
-                    else if (single > 0)
-                      OnBestTarget<ScaleSums<Sum, float>>(static_cast<const Sum*>(sums), out + first, count,
-                                                          single);
-                    else
-                      OnBestTarget<ScaleSums<Sum, double>>(static_cast<const Sum*>(sums), out + first, count,
-                                                           matrix.ScaleFactor);
+                    clamp(out + first, count);
                   }
                 });
               });
