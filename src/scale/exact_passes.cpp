@@ -116,12 +116,9 @@ void SumRows(const RowsInHand* rows) {
 }
 constexpr auto SumPlanes = SumRows<1>, SumLuma = SumRows<3>;
 
-template <class Value>
-void AddScaled(double* sums, const Value* row, int count, double weight) {
+void AddScaled(double* sums, const Sample* row, int count, double weight) {
   for (int i = 0; i < count; ++i) sums[i] += weight * double(row[i]);
 }
-constexpr auto AddSamples = AddScaled<Sample>;
-constexpr auto AddFloats = AddScaled<float>;
 
 void StoreQuotients(const double* sums, double divisor, int count, Sample* into) {
   for (int i = 0; i < count; ++i) {
@@ -151,10 +148,7 @@ void ExactHorizontal(const Sample* const* from, Sample* const* into, int rows, c
 }
 
 void ExactSums::Add(const Sample* row, float weight) {
-  OnBestTarget<AddSamples>(&Sums[0], row, Count, double(weight));
-}
-void ExactSums::Add(const float* row, float weight) {
-  OnBestTarget<AddFloats>(&Sums[0], row, Count, double(weight));
+  OnBestTarget<AddScaled>(&Sums[0], row, Count, double(weight));
 }
 void ExactSums::Store(float divisor, Sample* into) const {
   OnBestTarget<StoreQuotients>(static_cast<const double*>(Sums), double(divisor), Count, into);

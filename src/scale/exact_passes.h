@@ -30,7 +30,6 @@ class ExactSums {
  public:
   explicit ExactSums(int count) : Count(count) {}
   void Add(const Sample* row, float weight);
-  void Add(const float* row, float weight);
   void Store(float divisor, Sample* into) const;
 
  private:

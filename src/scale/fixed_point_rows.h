@@ -23,10 +23,8 @@ class FixedPointRows {
   /// Columns are made in groups of so many pixels; a run of columns begins with a group.
   int GroupPixels() const { return Pixels; }
   /// Makes some columns of up to RowsTogether rows, out of as many rows of the source. into[r] is where
-  /// the first pixel goes; as floats, 16 of them have to fit from each group's first on.
+  /// the first pixel goes.
   void Run(const Sample* const* from, Sample* const* into, int rows, const PixelOrder& order,
-           Columns columns) const;
-  void Run(const Sample* const* from, float* const* into, int rows, const PixelOrder& order,
            Columns columns) const;
 
  private:

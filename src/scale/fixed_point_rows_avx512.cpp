@@ -1,6 +1,5 @@
 #include <algorithm>
 #include <bit>
-#include <type_traits>
 
 #include "scale/fixed_point_groups.h"
 #include "scale/quotients.h"
@@ -28,8 +27,6 @@ constexpr __mmask64 Lowest(std::int64_t count) {
 
 /// Stores bytes: of each lane the lowest, in the order that a pixel has.
 struct ByteWriter {
-  using Value = Sample;
-
   ZOR_VNNI_INLINE ByteWriter(const PixelOrder& order, int channels, int pixels) : Count(order.Count) {
     alignas(VectorBytes) std::uint8_t index[VectorBytes] = {};
     for (int p = 0; p < pixels; ++p)
@@ -52,18 +49,6 @@ struct ByteWriter {
   int Count;
   __m512i Index;
   __mmask64 Shown = 0;
-};
-
-/// Stores floats, a lane each: the channels are numbered as dest has them.
-struct FloatWriter {
-  using Value = float;
-
-  FloatWriter(const PixelOrder& order, int, int) : Count(order.Count) {}
-  ZOR_VNNI_INLINE void Write(__m512i lanes, float* into, int, std::int64_t) const {
-    _mm512_storeu_ps(into, _mm512_cvtepi32_ps(lanes));
-  }
-
-  int Count;
 };
 
 }
@@ -89,11 +74,11 @@ struct GroupRunner {
     return all;
   }
 
-  template <int Rows, int Digits, class Writer>
-  ZOR_VNNI static void Run(const FixedPointRows& plan, const Sample* const* from,
-                           typename Writer::Value* const* into, const PixelOrder& order, Columns columns) {
+  template <int Rows, int Digits>
+  ZOR_VNNI static void Run(const FixedPointRows& plan, const Sample* const* from, Sample* const* into,
+                           const PixelOrder& order, Columns columns) {
     const int channels = plan.Pair.Channels, lanesOfPart = plan.Pixels * channels;
-    const Writer writer(order, channels, plan.Pixels);
+    const ByteWriter writer(order, channels, plan.Pixels);
     const __m512i fraction = _mm512_set1_epi32((1 << FixedPointLine::Bits) - 1),
                   zero = _mm512_setzero_si512();
     const __m512i half = _mm512_set1_epi32(1 << (FixedPointLine::Bits - 1)), white = _mm512_set1_epi32(255);
@@ -153,10 +138,9 @@ struct GroupRunner {
   }
 
   /// Makes the samples in doubt by the plain form.
-  template <class Value>
   [[gnu::noinline, gnu::cold]] static void Settle(const FixedPointRows& plan,
                                                   const FixedPointRows::ColumnGroup& group,
-                                                  std::uint32_t doubt, const Sample* from, Value* into,
+                                                  std::uint32_t doubt, const Sample* from, Sample* into,
                                                   const PixelOrder& order) {
     const PlaneList& planes = plan.Pair.Source;
     for (; doubt != 0; doubt &= doubt - 1) {
@@ -174,33 +158,21 @@ struct GroupRunner {
     }
   }
 
-  template <int Rows, class Writer, class Value = typename Writer::Value>
-  static void RunDigits(const FixedPointRows& plan, const Sample* const* from, Value* const* into,
+  template <int Rows>
+  static void RunDigits(const FixedPointRows& plan, const Sample* const* from, Sample* const* into,
                         const PixelOrder& order, Columns columns) {
     switch (plan.Digits) {
-      case 1: return Run<Rows, 1, Writer>(plan, from, into, order, columns);
-      case 2: return Run<Rows, 2, Writer>(plan, from, into, order, columns);
-      default: return Run<Rows, 3, Writer>(plan, from, into, order, columns);
+      case 1: return Run<Rows, 1>(plan, from, into, order, columns);
+      case 2: return Run<Rows, 2>(plan, from, into, order, columns);
+      default: return Run<Rows, 3>(plan, from, into, order, columns);
     }
-  }
-
-  template <class Writer, class Value = typename Writer::Value>
-  static void RunRows(const FixedPointRows& plan, const Sample* const* from, Value* const* into, int rows,
-                      const PixelOrder& order, Columns columns) {
-    if (rows == FixedPointRows::RowsTogether)
-      return RunDigits<FixedPointRows::RowsTogether, Writer>(plan, from, into, order, columns);
-    for (int r = 0; r < rows; ++r) RunDigits<1, Writer>(plan, from + r, into + r, order, columns);
   }
 };
 
 void FixedPointRows::Run(const Sample* const* from, Sample* const* into, int rows, const PixelOrder& order,
                          Columns columns) const {
-  GroupRunner::RunRows<ByteWriter>(*this, from, into, rows, order, columns);
-}
-
-void FixedPointRows::Run(const Sample* const* from, float* const* into, int rows, const PixelOrder& order,
-                         Columns columns) const {
-  GroupRunner::RunRows<FloatWriter>(*this, from, into, rows, order, columns);
+  if (rows == RowsTogether) return GroupRunner::RunDigits<RowsTogether>(*this, from, into, order, columns);
+  for (int r = 0; r < rows; ++r) GroupRunner::RunDigits<1>(*this, from + r, into + r, order, columns);
 }
 
 }
@@ -211,7 +183,6 @@ namespace zor {
 
 // No other processor has such a form, so none is ever built.
 void FixedPointRows::Run(const Sample* const*, Sample* const*, int, const PixelOrder&, Columns) const {}
-void FixedPointRows::Run(const Sample* const*, float* const*, int, const PixelOrder&, Columns) const {}
 
 }
 

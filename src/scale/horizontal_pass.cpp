@@ -10,33 +10,28 @@ HorizontalPass::HorizontalPass(const ScaleContext& context, const ContributionTa
     : Context(context),
       Table(table),
       Fixed(context.Pair, table, context.Source->Width),
-      Single(Fixed ? FloatRows() : FloatRows(context.Pair, table, context.Source->Width)),
+      Turned(Fixed ? TurnedRows() : TurnedRows(context.Pair, table, context.Source->Width)),
       Together(BestTogether()) {}
 
 int HorizontalPass::BestTogether() const {
   const int best = Fixed    ? FixedPointRows::RowsTogether
-                   : Single ? FloatRows::RowsTogether
-                            : zor::RowsTogether(Context.Pair.Channels);
+                   : Turned ? Turned.RowsTogether()
+                            : RowsTogether(Context.Pair.Channels);
   const std::int32_t inHand = Context.Temp ? std::min(RowsAtOnce(*Context.Source), RowsAtOnce(*Context.Temp))
                                            : RowsAtOnce(*Context.Source);
   return std::clamp(inHand, 1, best);
 }
 
-void HorizontalPass::MakeSamples(const RowRun& from, const RowRun& into, int rows, Sample* scratch) const {
-  const Columns all{0, Context.ResultWidth};
-  const PixelOrder& order = Context.Pair.Temp;
+void HorizontalPass::MakeSamples(const RowRun& from, Sample* const* into, int rows, const PixelOrder& order,
+                                 Columns columns, Sample* scratch) const {
   const Sample* read[MostRowsTogether];
-  Sample* written[MostRowsTogether];
-  for (int r = 0; r < rows; ++r) {
-    read[r] = from[r];
-    written[r] = into[r];
-  }
+  for (int r = 0; r < rows; ++r) read[r] = from[r];
   if (Fixed)
-    Fixed.Run(read, written, rows, order, all);
-  else if (Single)
-    Single.Run(read, written, rows, order, all, scratch);
+    Fixed.Run(read, into, rows, order, columns);
+  else if (Turned)
+    Turned.Run(read, into, rows, order, columns, scratch);
   else
-    ExactHorizontal(read, written, rows, Context.Pair, order, Table, all);
+    ExactHorizontal(read, into, rows, Context.Pair, order, Table, columns);
 }
 
 bool HorizontalPass::Run(std::int32_t first, std::int32_t last, PictureData* yields) const {
@@ -45,7 +40,9 @@ bool HorizontalPass::Run(std::int32_t first, std::int32_t last, PictureData* yie
   for (std::int32_t y = first; y <= last;) {
     int rows = std::min(Together, last - y + 1);
     const auto make = [&](const RowRun& from, const RowRun& into) {
-      MakeSamples(from, into, rows, scratch.get());
+      Sample* written[MostRowsTogether];
+      for (int r = 0; r < rows; ++r) written[r] = into[r];
+      MakeSamples(from, written, rows, Context.Pair.Temp, {0, Context.ResultWidth}, scratch.get());
     };
     const auto made = [&] { return WithRows({*Context.Source, y, rows}, {*Context.Temp, y, rows}, make); };
     if (!made() && rows > 1) {
@@ -60,34 +57,20 @@ bool HorizontalPass::Run(std::int32_t first, std::int32_t last, PictureData* yie
   return true;
 }
 
-bool HorizontalPass::MakeFloats(std::int32_t first, int count, const PixelOrder& order, Columns columns,
-                                float* const* into, Sample* scratch) const {
-  RowRun run;
-  if (!RowSpan{*Context.Source, first, count}.Fetch(run)) {
-    bool all = count > 1;
-    for (int r = 0; r < count && all; ++r) all = MakeFloats(first + r, 1, order, columns, into + r, scratch);
-    return all;
-  }
-  const Sample* from[MostRowsTogether];
-  for (int r = 0; r < count; ++r) from[r] = run[r];
-  if (Fixed) {
-    Fixed.Run(from, into, count, order, columns);
-    return true;
-  }
-  if (Single) {
-    Single.Run(from, into, count, order, columns, scratch);
-    return true;
-  }
-  constexpr std::int32_t Tile = 512, MostRows = 8;
-  Sample samples[MostRows][Tile * 5];
-  Sample* tiles[MostRows];
-  for (int r = 0; r < count; ++r) tiles[r] = samples[r];
-  for (std::int64_t x = columns.First; x < columns.End; x += Tile) {
-    const Columns tile{std::int32_t(x), std::int32_t(std::min<std::int64_t>(x + Tile, columns.End))};
-    ExactHorizontal(from, tiles, count, Context.Pair, order, Table, tile);
-    for (int r = 0; r < count; ++r)
-      std::copy_n(samples[r], tile.Count() * order.Count,
-                  into[r] + std::ptrdiff_t(x - columns.First) * order.Count);
+bool HorizontalPass::MakeRows(std::int32_t first, int count, const PixelOrder& order, Columns columns,
+                              Sample* const* into, Sample* scratch) const {
+  for (int made = 0; made < count;) {
+    int rows = std::min(Together, count - made);
+    const auto make = [&](const RowRun& from) {
+      MakeSamples(from, into + made, rows, order, columns, scratch);
+    };
+    const auto reached = [&] { return WithRows({*Context.Source, first + made, rows}, make); };
+    if (!reached()) {
+      // Perhaps they can be reached one by one.
+      rows = 1;
+      if (!reached()) return false;
+    }
+    made += rows;
   }
   return true;
 }

@@ -1,8 +1,8 @@
 #pragma once
 #include "scale/contributions.h"
 #include "scale/fixed_point_rows.h"
-#include "scale/float_rows.h"
 #include "scale/scale_context.h"
+#include "scale/turned_rows.h"
 
 namespace zor {
 
@@ -14,28 +14,28 @@ class HorizontalPass {
   /// the source can't be reached, and without memory.
   bool Run(std::int32_t first, std::int32_t last, PictureData* yields) const;
 
-  /// How many rows are made best together.
-  int RowsTogether() const { return Together; }
   /// A run of columns begins with a multiple of this.
   int ColumnUnit() const { return Fixed ? Fixed.GroupPixels() : 1; }
-  /// What MakeFloats needs to work in.
-  std::size_t ScratchBytes() const { return Fixed ? 0 : Single.ScratchBytes(); }
-  /// Makes some columns of `count` rows from `first` on, as floats, at most RowsTogether of them; into[r] has
-  /// room for 64 floats more. False when a row of the source can't be reached.
-  bool MakeFloats(std::int32_t first, int count, const PixelOrder& order, Columns columns, float* const* into,
-                  Sample* scratch) const;
+  /// What MakeRows needs to work in.
+  std::size_t ScratchBytes() const { return Fixed ? 0 : Turned.ScratchBytes(); }
+  /// Makes some columns of `count` rows from `first` on; into[r] is where the first pixel of a row goes.
+  /// False when a row of the source can't be reached.
+  bool MakeRows(std::int32_t first, int count, const PixelOrder& order, Columns columns, Sample* const* into,
+                Sample* scratch) const;
 
  private:
-  static constexpr int MostRowsTogether = FloatRows::RowsTogether;
+  static constexpr int MostRowsTogether = SlotLoops::MostWidth;
 
   int BestTogether() const;
-  void MakeSamples(const RowRun& from, const RowRun& into, int rows, Sample* scratch) const;
+  void MakeSamples(const RowRun& from, Sample* const* into, int rows, const PixelOrder& order,
+                   Columns columns, Sample* scratch) const;
 
   const ScaleContext& Context;
   const ContributionTable& Table;
   FixedPointRows Fixed;
   /// Where the other form isn't served.
-  FloatRows Single;
+  TurnedRows Turned;
+  /// How many rows are made best together.
   int Together;
 };
 

@@ -2,6 +2,7 @@
 #include <cstdint>
 
 #include "scale/contributions.h"
+#include "scale/slot_lines.h"
 
 namespace zor {
 
@@ -25,6 +26,18 @@ namespace zor {
 // such numbers across a whole one. If 0 <= q' - q < 1/N, the whole number below q' is that below q, and
 // nothing is ever in doubt. Weights that ought to be 0 and came out as some 2^-54 disturb a lattice; as long
 // as they are positive, they only add to q, and their part counts in the bound of q' - q.
+
+// There are three kinds of numbers that q' is made of: 22 bits after the point on processors that multiply
+// bytes, single precision, and two digits of 16 bits. With digits, the largest share of a line decides how
+// many bits after the point the first one has, so that D + E is near 1/100, and nothing is in doubt on most
+// lattices. A sample that is in doubt is made again with both digits, for which D + E is about a millionth:
+// the rest of a share, times 2^15 and rounded, is the second digit; its sum, cut off to the right, is less
+// than one unit too small.
+//
+// A flat run, whose samples all have the value v, has the quotient v W / S with W the sum of the weights,
+// which is so close to v that it is always in doubt. Whether W is less than S decides between v - 1 and v for
+// all v above 0, provided that the two differ by more than the plain form rounds, or that nothing is rounded
+// in it.
 
 /// The lattice of a line: N, and what its disturbing weights may add to a quotient; N is 0 off any lattice.
 struct Lattice {
@@ -52,14 +65,9 @@ struct FixedPointLine {
 /// The shares of a line, one an entry. False where they don't fit, or the line is always in doubt.
 bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLine& made);
 
-/// A line in single precision: q' = Start + sum of share s, in the order of the entries.
-struct FloatLine {
-  /// Off a lattice the sums are q' - E and Gap is E + D, so the sample is in doubt if adding Gap makes
-  /// another byte. On a lattice they are no less than q, and Gap is 0.
-  float Start, Gap;
-};
-/// Puts the share of each entry at its row's place: that of row `firstRow` at shares[0], the next one's
-/// `stride` further. False where the line is always in doubt.
-bool MakeFloat(const Contribution& line, float* shares, std::int32_t firstRow, int stride, FloatLine& made);
+/// A line in 16-bit numbers, or in single precision: one for each of its slots, 0 before. The line is 0
+/// before too; its slots are left alone.
+void MakeDigits(const Contribution& line, SlotLine::Digits* digits, SlotLine& made);
+void MakeSingle(const Contribution& line, float* shares, SlotLine& made);
 
 }

@@ -26,10 +26,10 @@ void PlainLine(const ScaleContext& context, const Contribution& line, std::int32
 
 }
 
-bool VerticalPass::MakeLines(std::int32_t y, int count, Columns stripe, FloatColumns& columns) const {
+bool VerticalPass::MakeLines(std::int32_t y, int count, Columns stripe, SlotColumns& columns) const {
   const PixelScatter& scatter = Plan->Samples;
-  Sample* into[LineSums::Most] = {};
-  bool direct[LineSums::Most];
+  Sample* into[ColumnPlan::MostTogether] = {};
+  bool direct[ColumnPlan::MostTogether];
   for (int i = 0; i < count; ++i) {
     // Rows of a mapped picture aren't in hand together, and none while others are fetched.
     Sample* row = scatter.Direct && !Context.Dest->IsMapping ? FetchRow(*Context.Dest, y + i) : nullptr;
@@ -52,7 +52,7 @@ void VerticalPass::MakePlainLines(std::int32_t first, std::int32_t last, Picture
 }
 
 bool VerticalPass::Run(std::int32_t first, std::int32_t last, PictureData* yields) const {
-  std::optional<FloatColumns> columns;
+  std::optional<SlotColumns> columns;
   if (Plan) columns.emplace(*Plan);
   if (!columns || !*columns) {
     if (!Context.Temp) return false;

@@ -1,5 +1,5 @@
 #pragma once
-#include "scale/float_columns.h"
+#include "scale/slot_columns.h"
 
 namespace zor {
 
@@ -18,7 +18,7 @@ class VerticalPass {
 
  private:
   /// Makes the lines from y on that are made together, in one stripe.
-  bool MakeLines(std::int32_t y, int count, Columns stripe, FloatColumns& columns) const;
+  bool MakeLines(std::int32_t y, int count, Columns stripe, SlotColumns& columns) const;
   void MakePlainLines(std::int32_t first, std::int32_t last, PictureData* yields) const;
 
   const ScaleContext& Context;

@@ -1,0 +1,245 @@
+// The loops of slot_loops.h for vectors of VectorBytes bytes and, where FLOATS is defined, single precision;
+// included by a file for each instruction set, which says what that is and marks each function with LOOP or
+// LOOP_INLINE.
+
+#include "scale/slot_vectors.h"
+
+#ifdef FLOATS
+#include "scale/slot_floats.h"
+#else
+#include "scale/slot_pairs.h"
+#endif
+
+namespace zor {
+namespace {
+
+constexpr int GroupSlots = GroupPixels / LinesInSlot;
+
+/// The source lines of a line, counted from the first one in its first slot.
+struct LineRows {
+  const SlotSums& Of;
+  std::ptrdiff_t Unit;
+
+  LOOP_INLINE std::int32_t First() const { return Of.Of->First % LinesInSlot; }
+  LOOP_INLINE std::int32_t End() const { return First() + Of.Of->Last() - Of.Of->First + 1; }
+  LOOP_INLINE std::int32_t RowOf(std::int32_t entry) const { return First() + Of.Of->Entries[entry].Pixel; }
+  LOOP_INLINE const Sample* UnitOf(std::int32_t row) const {
+    return Of.Slots[row / LinesInSlot] + Unit * UnitBytes;
+  }
+};
+
+LOOP_INLINE void StoreUnit(const SlotSums& sums, std::ptrdiff_t unit, Bytes samples) {
+  const std::ptrdiff_t left = sums.Samples - unit * Width;
+  if (left >= Width)
+    Store(sums.Into + unit * Width, samples);
+  else
+    std::memcpy(sums.Into + unit * Width, &samples, std::size_t(left));
+}
+
+LOOP_INLINE Sample ExactSample(const SlotSums& sums, std::ptrdiff_t unit, int sample) {
+  const LineRows rows{sums, unit};
+  double sum = 0.0;
+  for (std::int32_t i = 0; i < sums.Of->Count; ++i) {
+    const std::int32_t row = rows.RowOf(i);
+    sum += double(sums.Of->Entries[i].Weight) * SampleIn(rows.UnitOf(row), sample, row % LinesInSlot);
+  }
+  return ExactQuotient(sum, sums.Of->Sum);
+}
+
+/// Makes what is in doubt of a unit without more numbers: flat runs, and the others by the plain form.
+NOINLINE LOOP void SettleUnitPlainly(const SlotSums& sums, std::ptrdiff_t unit, std::uint32_t doubts) {
+  constexpr int few = 2;
+  if (sums.Line->OfFlat != Flat::Unknown && __builtin_popcount(doubts) > few) {
+    const LineRows rows{sums, unit};
+    const Bytes samples = Narrowed(rows.UnitOf(rows.First()), rows.First());
+    Bytes differ{};
+    for (std::int32_t row = rows.First() + 1; row < rows.End(); ++row)
+      differ |= samples ^ Narrowed(rows.UnitOf(row), row % LinesInSlot);
+    const std::uint32_t flat = doubts & ~Difference(differ, Bytes{});
+    const int less = sums.Line->OfFlat == Flat::Falls ? 1 : 0;
+    Sample values[Width];
+    Store(values, samples);
+    for (std::uint32_t left = flat; left != 0; left &= left - 1) {
+      const int sample = __builtin_ctz(left);
+      if (const std::ptrdiff_t at = unit * Width + sample; at < sums.Samples)
+        sums.Into[at] = Clamp(values[sample] - less);
+    }
+    doubts &= ~flat;
+  }
+  for (; doubts != 0; doubts &= doubts - 1) {
+    const int sample = __builtin_ctz(doubts);
+    if (const std::ptrdiff_t at = unit * Width + sample; at < sums.Samples)
+      sums.Into[at] = ExactSample(sums, unit, sample);
+  }
+}
+
+/// Makes units by the plain form.
+NOINLINE LOOP void SumPlain(const SlotSums& sums) {
+  const LineRows rows{sums, sums.FirstUnit};
+  Sample samples[SlotLoops::MostUnits * Width];
+  ExactSums exact(int(sums.UnitCount) * Width);
+  for (std::int32_t i = 0; i < sums.Of->Count; ++i) {
+    const std::int32_t row = rows.RowOf(i);
+    for (std::ptrdiff_t u = 0; u < sums.UnitCount; ++u)
+      Store(samples + u * Width, Narrowed(rows.UnitOf(row) + u * UnitBytes, row % LinesInSlot));
+    exact.Add(samples, sums.Of->Entries[i].Weight);
+  }
+  exact.Store(sums.Of->Sum, samples);
+  for (std::ptrdiff_t u = 0; u < sums.UnitCount; ++u)
+    StoreUnit(sums, sums.FirstUnit + u, Load<Bytes>(samples + u * Width));
+}
+
+LOOP void Sum(const SlotSums& sums) {
+  if (sums.Line->Plain) return SumPlain(sums);
+  std::uint32_t doubts[SlotLoops::MostUnits];
+  std::ptrdiff_t done = 0;
+  for (; done + 2 <= sums.UnitCount; done += 2) SumUnits<2>(sums, sums.FirstUnit + done, doubts + done);
+  if (done < sums.UnitCount) SumUnits<1>(sums, sums.FirstUnit + done, doubts + done);
+  if (!HasDoubts(*sums.Line)) return;
+  for (std::ptrdiff_t u = 0; u < sums.UnitCount; ++u)
+    if (doubts[u] != 0) Settle(sums, sums.FirstUnit + u, doubts[u]);
+}
+
+LOOP void Widen(const Sample* even, const Sample* odd, std::ptrdiff_t units, Sample* slot) {
+  for (std::ptrdiff_t u = 0; u < units; ++u)
+    StoreWidened(Load<Bytes>(even + u * Width), Load<Bytes>(odd + u * Width), slot + u * UnitBytes);
+}
+
+/// Transposes squares of 16 x 16 bytes, one in each part of the vectors.
+LOOP_INLINE void Transpose(Bytes (&rows)[16]) {
+  for (int stage = 0; stage < 4; ++stage) {
+    Bytes mixed[16];
+    for (int i = 0; i < 8; ++i) {
+      mixed[2 * i] = LowInterleaved(rows[i], rows[i + 8]);
+      mixed[2 * i + 1] = HighInterleaved(rows[i], rows[i + 8]);
+    }
+    // One by one, so that they stay in registers.
+    for (int i = 0; i < 16; ++i) rows[i] = mixed[i];
+  }
+}
+
+using Block16 [[gnu::vector_size(16)]] = std::uint8_t;
+/// 16 bytes each of rows that lie 16 apart.
+LOOP_INLINE Bytes LoadParts(const Sample* const* rows, std::int64_t at) {
+#if VectorBytes == 32
+  return __builtin_shufflevector(Load<Block16>(rows[0] + at), Load<Block16>(rows[16] + at), 0, 1, 2, 3, 4, 5,
+                                 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20, 21, 22, 23, 24, 25,
+                                 26, 27, 28, 29, 30, 31);
+#else
+  return Load<Bytes>(rows[0] + at);
+#endif
+}
+LOOP_INLINE Block16 PartOf(Bytes bytes, int part) {
+#if VectorBytes == 32
+  if (part == 1)
+    return __builtin_shufflevector(bytes, bytes, 16, 17, 18, 19, 20, 21, 22, 23, 24, 25, 26, 27, 28, 29, 30,
+                                   31);
+  return __builtin_shufflevector(bytes, bytes, 0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15);
+#else
+  return part == 0 ? bytes : Block16{};
+#endif
+}
+
+/// Turns a group of columns of Width rows, `at` bytes from their start, and makes slots of them.
+NOINLINE LOOP void TurnGroup(const RowsToMake& rows, const Sample* const* from, std::int64_t at,
+                             Sample* into) {
+  Bytes columns[16 * MostStep];
+  for (int chunk = 0; chunk < rows.Step; ++chunk) {
+    Bytes square[16];
+    for (int r = 0; r < 16; ++r) square[r] = LoadParts(from + r, at + chunk * 16);
+    Transpose(square);
+    for (int j = 0; j < 16; ++j) columns[chunk * 16 + j] = square[j];
+  }
+  for (int x = 0; x < GroupPixels; x += LinesInSlot)
+    for (int c = 0; c < rows.Channels; ++c, into += UnitBytes) {
+      const Bytes* even = columns + x * rows.Step + rows.Offset[c];
+      StoreWidened(*even, even[LinesInSlot == 2 ? rows.Step : 0], into);
+    }
+}
+
+/// Stores pixels of Width rows: `places` samples of each, those of all rows at from[place].
+NOINLINE LOOP void StoreTurned(const RowsToMake& rows, const Sample* const* from, std::ptrdiff_t places,
+                               std::ptrdiff_t at) {
+  for (std::ptrdiff_t k = 0; k < places; k += 16) {
+    Bytes square[16];
+    for (int j = 0; j < 16; ++j) square[j] = Load<Bytes>(from[k + j]);
+    Transpose(square);
+    const auto count = std::size_t(places - k < 16 ? places - k : 16);
+    for (int r = 0; r < 16; ++r)
+      for (int part = 0; part < Parts; ++part) {
+        if (r + part * 16 >= rows.Rows) continue;
+        const Block16 made = PartOf(square[r], part);
+        Sample* into = rows.Into[r + part * 16] + at + k;
+        count == 16 ? Store(into, made) : void(std::memcpy(into, &made, count));
+      }
+  }
+}
+
+/// The columns that lines look at.
+struct TurnedColumns {
+  LOOP TurnedColumns(const RowsToMake& rows)
+      : Of(rows), SlotBytes(std::ptrdiff_t{rows.Channels} * UnitBytes), SlotCount(rows.Kept * GroupSlots) {
+    for (int r = 0; r < Width; ++r) From[r] = rows.From[r < rows.Rows ? r : rows.Rows - 1];
+    const auto address = reinterpret_cast<Word>(rows.Scratch);
+    Ring = rows.Scratch + (64 - address % 64) % 64;
+    Slots = reinterpret_cast<const Sample**>(Ring + SlotCount * SlotBytes);
+    for (std::int32_t s = 0; s < 2 * SlotCount; ++s) Slots[s] = Ring + s % SlotCount * SlotBytes;
+  }
+  /// Makes sure of the columns that a line looks at.
+  LOOP_INLINE void Need(const SlotLine& line) {
+    const std::int32_t end = (line.First + line.Count + GroupSlots - 1) / GroupSlots;
+    if (end <= End) return;
+    if (End < line.Least / GroupSlots) End = line.Least / GroupSlots;
+    for (; End < end; ++End) Fill(End);
+  }
+  LOOP void Fill(std::int32_t group) {
+    const std::int64_t at = std::int64_t{group} * GroupPixels * Of.Step;
+    const std::int64_t left = Of.RowBytes - at;
+    Sample* into = Ring + group % Of.Kept * GroupSlots * SlotBytes;
+    if (left >= GroupPixels * Of.Step) return TurnGroup(Of, From, at, into);
+    // Nothing is read beyond the end of a row.
+    Sample rest[Width][GroupPixels * MostStep] = {};
+    const Sample* ends[Width];
+    for (int r = 0; r < Width; ++r) {
+      if (left > 0) std::memcpy(rest[r], From[r] + at, std::size_t(left));
+      ends[r] = rest[r];
+    }
+    TurnGroup(Of, ends, 0, into);
+  }
+  LOOP_INLINE const Sample* const* SlotsOf(const SlotLine& line) const {
+    return Slots + line.First % SlotCount;
+  }
+
+  const RowsToMake& Of;
+  std::ptrdiff_t SlotBytes;
+  std::int32_t SlotCount, End = 0;
+  Sample* Ring;
+  const Sample** Slots;
+  const Sample* From[Width];
+};
+
+LOOP void MakeRows(const RowsToMake& rows) {
+  static constexpr Sample zeros[Width] = {};
+  TurnedColumns columns(rows);
+  alignas(64) Sample made[GroupPixels][5 * Width];
+  const Sample* from[GroupPixels * 5 + 16];
+  for (const Sample*& place : from) place = zeros;
+  for (std::int64_t x = rows.Of.First; x < rows.Of.End; x += GroupPixels) {
+    const int pixels = int(rows.Of.End - x < GroupPixels ? rows.Of.End - x : GroupPixels);
+    for (int p = 0; p < pixels; ++p) {
+      const auto at = std::int32_t(x) + p;
+      const SlotLine& line = rows.Lines[at];
+      if (line.Count > 0) columns.Need(line);
+      Sum({&line, &rows.Table[at], columns.SlotsOf(line), 0, rows.Channels,
+           std::ptrdiff_t{rows.Channels} * Width, made[p]});
+      for (int b = 0; b < rows.Order.Count; ++b)
+        if (const int channel = rows.Order.Channel[b]; channel != PixelOrder::Zero)
+          from[p * rows.Order.Count + b] = made[p] + channel * Width;
+    }
+    StoreTurned(rows, from, std::ptrdiff_t{pixels} * rows.Order.Count,
+                std::ptrdiff_t(x - rows.Of.First) * rows.Order.Count);
+  }
+}
+
+}
+}
