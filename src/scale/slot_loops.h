@@ -1,5 +1,6 @@
 #pragma once
 #include "image/arithmetic.h"
+#include "image/byte_blocks.h"
 #include "scale/exact_passes.h"
 #include "scale/slot_lines.h"
 
