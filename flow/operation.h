@@ -56,6 +56,8 @@ class Operation {
   virtual Dependence DependsOn(const Shape&) const { return {}; }
   /// The pictures of the source's size that the work takes at a time, source and result included.
   virtual int Pictures() const { return 2; }
+  /// The part of the source that the result is, where the work is nothing else: a reader may read that alone.
+  virtual std::optional<Rect> Cuts() const { return std::nullopt; }
   /// The result of a whole picture, or of a band of rows with those in reach. In place where that can be: the
   /// source may come back changed, and is lost otherwise. The source may be a view. Throws files::Failure
   /// where it can't be done.

@@ -1,0 +1,29 @@
+#include "filter_operation.h"
+
+namespace picturezor::steps {
+
+const Step Gain{.Name = "filter gain",
+                .Help = "More or less contrast in the middle, and a lift of it",
+                .More = "",
+                .Examples = {},
+                .Options = {{.Name = "gain",
+                             .Of = Kind::Number,
+                             .Help = "0.5 leaves all as it is, more is steeper; 0 to 1",
+                             .Least = 0,
+                             .Most = 1,
+                             .Default = "0.5"},
+                            {.Name = "bias",
+                             .Of = Kind::Number,
+                             .Help = "0.5 leaves all as it is, more is brighter; up to 1",
+                             .Least = 1e-6,
+                             .Most = 1,
+                             .Default = "0.5"}},
+                .Make = [](const Values& values, const Surroundings&) {
+                  return MakeFilter(
+                      {.Name = "gain", .Groups = Serves::GrayAndRGB},
+                      [gain = values.Number("gain"), bias = values.Number("bias")](const Picture& colours) {
+                        return colours.GainFilter(colours, gain, bias);
+                      });
+                }};
+
+}

@@ -1,0 +1,17 @@
+#include "filter_operation.h"
+
+namespace picturezor::steps {
+
+const Step Invert{.Name = "filter invert",
+                  .Help = "The complement of every colour",
+                  .More = "",
+                  .Examples = {},
+                  .Options = {},
+                  .Make = [](const Values&, const Surroundings&) {
+                    return MakeFilter({.Name = "invert"}, [](const Picture& colours) {
+                      colours.Invert();
+                      return colours;
+                    });
+                  }};
+
+}

@@ -1,0 +1,48 @@
+#include <cmath>
+
+#include "filter_operation.h"
+
+namespace picturezor::steps {
+
+const Step Matrix{
+    .Name = "filter matrix",
+    .Help = "Weigh the samples around each one",
+    .More = "",
+    .Examples = {},
+    .Options = {{.Name = "weights",
+                 .Of = Kind::IntegersOrFile,
+                 .Help =
+                     "A square of weights, row by row, in the option or in a file; from 255 on a place is\n"
+                     "left out",
+                 .Required = true},
+                {.Name = "delta",
+                 .Of = Kind::Integer,
+                 .Help = "Added to the sum",
+                 .Least = -1000000,
+                 .Most = 1000000,
+                 .Default = "0"},
+                {.Name = "scale",
+                 .Of = Kind::Number,
+                 .Help = "Then multiplied by this; 1 divided by the sum of the weights by default",
+                 .Least = -1e6,
+                 .Most = 1e6}},
+    .Make = [](const Values& values, const Surroundings&) {
+      const Integers& numbers = values.Get<Integers>("weights");
+      const std::vector<std::int32_t> weights(numbers.begin(), numbers.end());
+      const int side = int(std::lround(std::sqrt(double(weights.size()))));
+      if (std::size_t(side) * std::size_t(side) != weights.size() || side > 50)
+        throw files::UsageFailure("--weights: " + std::to_string(weights.size()) +
+                                  " numbers are no square of at most 50 x 50");
+      double sum = 0;
+      for (const std::int32_t weight : weights) sum += weight < 255 ? weight : 0;
+      double scale = values.Has("scale") ? values.Number("scale") : 0;
+      if (scale == 0) scale = sum != 0 ? 1 / sum : 1;
+      return MakeFilter({.Name = "matrix",
+                         .Needs = {.Of = flow::Dependence::Kind::Bands, .Reach = side / 2},
+                         .Pictures = 2},
+                        [=, delta = values.Integer("delta")](const Picture& colours) {
+                          return colours.ApplyMatrix({}, side, IntegerArray(weights), delta, scale);
+                        });
+    }};
+
+}

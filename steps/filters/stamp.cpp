@@ -1,0 +1,48 @@
+#include <cmath>
+
+#include "filter_operation.h"
+
+namespace picturezor::steps {
+
+const Step Stamp{
+    .Name = "filter stamp",
+    .Help = "Every channel to one of two colours, with a soft edge",
+    .More = "",
+    .Examples = {},
+    .Options =
+        {{.Name = "radius",
+          .Of = Kind::Number,
+          .Help = "Of the blur before it",
+          .Least = 0,
+          .Most = 1e6,
+          .Default = "9"},
+         {.Name = "threshold",
+          .Of = Kind::Number,
+          .Help = "Where the edge lies",
+          .Least = -10,
+          .Most = 10,
+          .Default = "0.5"},
+         {.Name = "softness",
+          .Of = Kind::Number,
+          .Help = "How wide it is",
+          .Least = 0,
+          .Most = 10,
+          .Default = "0.2"},
+         {.Name = "black", .Of = Kind::Colour, .Help = "The dark colour, as 202060", .Default = "000000"},
+         {.Name = "white", .Of = Kind::Colour, .Help = "The bright colour", .Default = "ffffff"}},
+    .Make = [](const Values& values, const Surroundings&) {
+      const double radius = values.Number("radius"), threshold = values.Number("threshold"),
+                   softness = values.Number("softness");
+      // Three blurs by a third.
+      const std::int32_t reach = 3 * Rows(std::trunc(radius / 3));
+      return MakeFilter({.Name = "stamp",
+                         .Groups = Serves::GrayAndRGB,
+                         .Needs = {.Of = flow::Dependence::Kind::Bands, .Reach = reach},
+                         .Pictures = 4},
+                        [=, black = values.Get<Color>("black"),
+                         white = values.Get<Color>("white")](const Picture& colours) {
+                          return colours.StampFilter({}, radius, threshold, softness, black, white);
+                        });
+    }};
+
+}

@@ -1,0 +1,45 @@
+#include "filter_operation.h"
+
+namespace picturezor::steps {
+
+namespace {
+
+std::vector<std::int32_t> TableOf(const char* name, const Values& values) {
+  const Integers& numbers = values.Get<Integers>(name);
+  if (numbers.size() > 256)
+    throw files::UsageFailure(std::string("--") + name + ": a table has 256 numbers at most");
+  return {numbers.begin(), numbers.end()};
+}
+
+}
+
+const Step Transfer{
+    .Name = "filter transfer",
+    .Help = "Send the samples through tables of numbers",
+    .More = "",
+    .Examples = {},
+    .Options =
+        {{.Name = "table",
+          .Of = Kind::IntegersOrFile,
+          .Help = "What becomes of the samples 0 to 255, in the option or in a file; what is missing is 0"},
+         {.Name = "red", .Of = Kind::IntegersOrFile, .Help = "The same for one channel"},
+         {.Name = "green", .Of = Kind::IntegersOrFile, .Help = "The same for one channel"},
+         {.Name = "blue", .Of = Kind::IntegersOrFile, .Help = "The same for one channel"}},
+    .Make = [](const Values& values, const Surroundings&) {
+      const int channels = values.Has("red") + values.Has("green") + values.Has("blue");
+      if (values.Has("table") == (channels > 0))
+        throw files::UsageFailure("give --table, or --red, --green and --blue");
+      if (channels % 3 != 0) throw files::UsageFailure("--red, --green and --blue go together");
+      const FilterRules rules{.Name = "transfer", .Groups = Serves::GrayAndRGB};
+      if (channels == 0)
+        return MakeFilter(rules, [table = TableOf("table", values)](const Picture& colours) {
+          return colours.TransferFilter(colours, IntegerArray(table));
+        });
+      return MakeFilter(rules, [red = TableOf("red", values), green = TableOf("green", values),
+                                blue = TableOf("blue", values)](const Picture& colours) {
+        if (colours.IsGray()) throw files::UsageFailure("a gray image has one --table");
+        return colours.TransferFilter(colours, IntegerArray(red), IntegerArray(green), IntegerArray(blue));
+      });
+    }};
+
+}

@@ -1,0 +1,114 @@
+#include <algorithm>
+#include <cmath>
+#include <map>
+
+#include "all_steps.h"
+
+namespace picturezor::steps {
+
+namespace {
+
+const std::map<std::string, Kernel> Kernels{{"triangle", Kernel::Triangle}, {"box", Kernel::Box},
+                                            {"lanczos3", Kernel::Lanczos3}, {"lanczos8", Kernel::Lanczos8},
+                                            {"mitchell", Kernel::Mitchell}, {"poly3", Kernel::Poly3},
+                                            {"cubic", Kernel::Cubic}};
+constexpr double MostSide = 4e8;
+
+class Scaling final : public flow::Operation {
+ public:
+  explicit Scaling(const Values& values) {
+    if (values.Has("width")) Width = values.Integer("width");
+    if (values.Has("height")) Height = values.Integer("height");
+    if (values.Has("fit")) Fit = values.Get<Integers>("fit");
+    if (values.Has("percent")) Percent = values.Number("percent");
+    Fast = values.Flag("fast");
+    By = Kernels.at(values.Text("kernel"));
+  }
+
+  flow::Shape Result(const flow::Shape& source) const override {
+    if (Fast && source.Of == Format::CMYK) throw Unserved("--fast has no way for CMYK");
+    double width = Width, height = Height;
+    if (!Fit.empty()) {
+      const double factor = std::min(double(Fit[0]) / source.Width, double(Fit[1]) / source.Height);
+      width = source.Width * factor;
+      height = source.Height * factor;
+    } else if (Percent > 0) {
+      width = source.Width * Percent / 100;
+      height = source.Height * Percent / 100;
+    } else if (Height == 0) {
+      height = width * source.Height / source.Width;
+    } else if (Width == 0) {
+      width = height * source.Width / source.Height;
+    }
+    if (width > MostSide || height > MostSide) throw files::UsageFailure("the size asked for is too large");
+    flow::Shape result = source;
+    result.Width = std::max(1, int(std::lround(width)));
+    result.Height = std::max(1, int(std::lround(height)));
+    return result;
+  }
+  flow::Dependence DependsOn(const flow::Shape&) const override {
+    return {.Of = flow::Dependence::Kind::InOrder};
+  }
+  Picture Apply(Picture source, const flow::Workplace& at) const override {
+    const flow::Shape size = Result({source.Width(), source.Height(), source.ImageFormat(), {}});
+    const Picture scaled = files::MakePictures(at.Stores, {{size.Width, size.Height, size.Of}})[0];
+    const bool done =
+        Fast ? scaled.ScaleFast(source, size.Width, size.Height)
+             : scaled.ScaleMT(at.Threads > 1 ? at.Threads : -1, source, {}, By, size.Width, size.Height);
+    if (!done) throw Unserved("it can't be scaled");
+    return scaled;
+  }
+
+ private:
+  double Width = 0, Height = 0, Percent = 0;
+  Integers Fit;
+  bool Fast = false;
+  Kernel By = Kernel::Lanczos3;
+};
+
+}
+
+const Step Scale{
+    .Name = "scale",
+    .Help = "Scale an image",
+    .More = "",
+    .Examples = {"scale photo.jpg --width 800 -o small.jpg",
+                 "scale photo.png --fit 1920x1080 --kernel mitchell -o screen.png",
+                 "scale map.tif --percent 12.5 --memory-limit 256M -o overview.tif"},
+    .Options = {{.Name = "width",
+                 .Of = Kind::Integer,
+                 .Help = "Columns; without --height it follows",
+                 .Least = 1,
+                 .Most = MostSide},
+                {.Name = "height",
+                 .Of = Kind::Integer,
+                 .Help = "Rows; without --width it follows",
+                 .Least = 1,
+                 .Most = MostSide},
+                {.Name = "fit",
+                 .Of = Kind::Size,
+                 .Help = "The largest size within this, as 1920x1080; enlarges too",
+                 .Excludes = {"width", "height", "percent"}},
+                {.Name = "percent",
+                 .Of = Kind::Number,
+                 .Help = "Of both sides",
+                 .Placeholder = "P",
+                 .Least = 1e-6,
+                 .Most = 1e9,
+                 .Excludes = {"width", "height"}},
+                {.Name = "kernel",
+                 .Of = Kind::Choice,
+                 .Help = "How pixels are weighed",
+                 .Default = "lanczos3",
+                 .Choices = {"triangle", "box", "lanczos3", "lanczos8", "mitchell", "poly3", "cubic"}},
+                {.Name = "fast",
+                 .Of = Kind::Flag,
+                 .Help = "Take the nearest pixels: quick and rough, without a kernel",
+                 .Excludes = {"kernel"}}},
+    .Make = [](const Values& values, const Surroundings&) -> std::unique_ptr<const flow::Operation> {
+      if (!values.Has("width") && !values.Has("height") && !values.Has("fit") && !values.Has("percent"))
+        throw files::UsageFailure("give --width, --height, --fit or --percent");
+      return std::make_unique<Scaling>(values);
+    }};
+
+}
