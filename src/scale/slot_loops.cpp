@@ -1,6 +1,7 @@
 #include "scale/slot_loops.h"
 
 #include <cstring>
+#include <limits>
 
 #include "image/targets.h"
 

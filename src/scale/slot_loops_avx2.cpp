@@ -3,6 +3,7 @@
 #if defined(__x86_64__) || defined(__i386__)
 
 #include <cstring>
+#include <limits>
 
 #define VectorBytes 32
 #define LOOP [[gnu::target("avx2,fma")]]

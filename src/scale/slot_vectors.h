@@ -1,6 +1,7 @@
 // Vectors of VectorBytes bytes for slot_loops_body.h.
 
 #include <cstring>
+#include <limits>
 
 namespace zor {
 namespace {
@@ -97,7 +98,7 @@ LOOP_INLINE Numbers Less(Numbers a, Numbers b) {
   return Numbers(vqsubq_s16(int16x8_t(a), int16x8_t(b)));
 #else
   // What is taken away is no more than what a byte holds.
-  const Numbers least = b - 32768;
+  const Numbers least = b + std::numeric_limits<std::int16_t>::min();
   return (a < least ? least : a) - b;
 #endif
 }
