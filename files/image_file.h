@@ -44,7 +44,7 @@ class ImageReader {
   virtual const FileType& Type() const = 0;
   /// Before the first row: a type that can give the picture smaller for less work (JPEG by its transform, a
   /// file with smaller copies of itself) does so, as long as it stays at least this large; the proportions
-  /// stay to within a pixel. Info() tells what comes then. Other types change nothing.
+  /// stay to within a pixel. Info() has the new size then. Other types change nothing.
   virtual void Reduce(std::int32_t /*leastWidth*/, std::int32_t /*leastHeight*/) {}
   /// From now on ReadRow gives the rows of this part, counted in pixels as they are stored; Info() has its
   /// size. False where the type reads only whole rows from the top; `PartOf` serves those too.
