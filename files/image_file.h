@@ -99,7 +99,8 @@ struct WriteOptions {
   /// For TIFF: offsets of 64 bits however small the file is; smaller copies of the picture, each half as
   /// large as the one before, down to a tile.
   bool Big = false, Pyramid = false;
-  /// Threads that may encode beside the caller's; 0 stands for one a processor. The bytes don't depend on it.
+  /// Threads that may encode, the caller's among them; 0 stands for one a processor. The bytes don't depend
+  /// on it.
   int Threads = 0;
 };
 

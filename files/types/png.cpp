@@ -7,6 +7,7 @@
 #include "exif.h"
 #include "failure.h"
 #include "file_types.h"
+#include "png_blocks.h"
 #include "stream.h"
 
 namespace picturezor::files {
@@ -151,7 +152,8 @@ class PNGReader : public ImageReader, PNGFile {
 
 class PNGWriter : public ImageWriter, PNGFile {
  public:
-  PNGWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info)
+  PNGWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info,
+            const WriteOptions& options)
       : PNGFile(target), File(StreamOn(descriptor, target)) {
     Png = png_create_write_struct(PNG_LIBPNG_VER_STRING, static_cast<PNGFile*>(this), OnError, OnWarning);
     Header = Png ? png_create_info_struct(Png) : nullptr;
@@ -160,7 +162,13 @@ class PNGWriter : public ImageWriter, PNGFile {
       throw Failure(target, "not enough memory");
     }
     try {
+      if (options.Packing != Compression::Usual)
+        throw UsageFailure(target, "PNG has --compression 0 to 9 only");
       Start(info);
+      const int channels = ChannelsOf(info.Pixels);
+      Samples = std::make_unique<PNGBlocks>(
+          std::size_t(info.Width) * std::size_t(channels), channels, info.Height, options.Level,
+          options.Threads, [this](std::span<const std::uint8_t> piece) { WriteData(piece); });
     } catch (...) {
       png_destroy_write_struct(&Png, &Header);
       throw;
@@ -168,12 +176,10 @@ class PNGWriter : public ImageWriter, PNGFile {
   }
   ~PNGWriter() override { png_destroy_write_struct(&Png, &Header); }
 
-  void WriteRow(const std::uint8_t* row) override {
-    Try([&] { png_write_row(Png, row); });
-  }
+  void WriteRow(const std::uint8_t* row) override { Samples->Add(row); }
 
   void Finish() override {
-    Try([&] { png_write_end(Png, Header); });
+    Try([&] { png_write_chunk(Png, reinterpret_cast<png_const_bytep>("IEND"), nullptr, 0); });
     Flush(File, Path);
   }
 
@@ -183,6 +189,15 @@ class PNGWriter : public ImageWriter, PNGFile {
     if (std::fwrite(data, 1, size, self.File.get()) != size) self.SystemError(std::strerror(errno));
   }
   static void OnFlush(png_structp) {}
+
+  void WriteData(std::span<const std::uint8_t> piece) {
+    constexpr std::size_t most = 1 << 30;
+    for (; !piece.empty(); piece = piece.subspan(std::min(most, piece.size())))
+      Try([&] {
+        png_write_chunk(Png, reinterpret_cast<png_const_bytep>("IDAT"), piece.data(),
+                        std::min(most, piece.size()));
+      });
+  }
 
   void Start(const ImageInfo& info) {
     int type = WithoutAlpha(info.Pixels) == Format::RGB ? PNG_COLOR_TYPE_RGB : PNG_COLOR_TYPE_GRAY;
@@ -205,6 +220,7 @@ class PNGWriter : public ImageWriter, PNGFile {
   }
 
   Stream File;
+  std::unique_ptr<PNGBlocks> Samples;
 };
 
 }
@@ -218,8 +234,8 @@ const FileType PNGType{
     .Open = [](const std::filesystem::path& file, const ReadOptions& options)
         -> std::unique_ptr<ImageReader> { return std::make_unique<PNGReader>(file, options.MemoryLimit); },
     .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-                 const WriteOptions&) -> std::unique_ptr<ImageWriter> {
-      return std::make_unique<PNGWriter>(descriptor, target, info);
+                 const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
+      return std::make_unique<PNGWriter>(descriptor, target, info, options);
     },
 };
 
