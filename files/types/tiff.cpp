@@ -9,6 +9,7 @@
 #include "file_types.h"
 #include "stream.h"
 #include "tiff_handle.h"
+#include "tiff_writer.h"
 
 namespace picturezor::files {
 
@@ -392,63 +393,6 @@ class TIFFReader : public ImageReader {
   std::int64_t NextRow = 0, Left = 0;
 };
 
-class TIFFWriter : public ImageWriter {
- public:
-  TIFFWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info) {
-    const int channels = ChannelsOf(info.Pixels);
-    const bool alpha = HasAlpha(info.Pixels);
-    // LZW makes noise longer by half at most.
-    const double worst = 1.5 * info.Width * double(info.Height) * channels;
-    File = TIFFHandle::Create(descriptor, target, worst > 4e9);
-    const Format colour = WithoutAlpha(info.Pixels);
-    File->Set(TIFFTAG_IMAGEWIDTH, std::uint32_t(info.Width));
-    File->Set(TIFFTAG_IMAGELENGTH, std::uint32_t(info.Height));
-    File->Set(TIFFTAG_BITSPERSAMPLE, 8);
-    File->Set(TIFFTAG_SAMPLESPERPIXEL, channels);
-    File->Set(TIFFTAG_PHOTOMETRIC, colour == Format::G     ? PHOTOMETRIC_MINISBLACK
-                                   : colour == Format::RGB ? PHOTOMETRIC_RGB
-                                                           : PHOTOMETRIC_SEPARATED);
-    File->Set(TIFFTAG_PLANARCONFIG, PLANARCONFIG_CONTIG);
-    File->Set(TIFFTAG_ORIENTATION, ORIENTATION_TOPLEFT);
-    File->Set(TIFFTAG_COMPRESSION, COMPRESSION_LZW);
-    File->Set(TIFFTAG_PREDICTOR, PREDICTOR_HORIZONTAL);
-    if (alpha) {
-      std::uint16_t kind = EXTRASAMPLE_UNASSALPHA;
-      File->Set(TIFFTAG_EXTRASAMPLES, 1, &kind);
-    }
-    if (info.Density) {
-      File->Set(TIFFTAG_XRESOLUTION, info.Density->X);
-      File->Set(TIFFTAG_YRESOLUTION, info.Density->Y);
-      File->Set(TIFFTAG_RESOLUTIONUNIT, RESUNIT_INCH);
-    }
-    if (!info.Profile.empty())
-      File->Set(TIFFTAG_ICCPROFILE, std::uint32_t(info.Profile.size()), info.Profile.data());
-    // About 64 KB a strip.
-    const std::int64_t rows = std::max<std::int64_t>(1, 65536 / (std::int64_t{info.Width} * channels));
-    File->Set(TIFFTAG_ROWSPERSTRIP, std::uint32_t(std::min<std::int64_t>(rows, info.Height)));
-    // The predictor works in the row that it is given.
-    Line.resize(std::size_t(info.Width) * std::size_t(channels));
-  }
-
-  void WriteRow(const std::uint8_t* row) override {
-    std::memcpy(Line.data(), row, Line.size());
-    errno = 0;
-    File->Check(TIFFWriteScanline(*File, Line.data(), NextRow++, 0) == 1);
-  }
-
-  void Finish() override {
-    errno = 0;
-    File->Check(TIFFFlush(*File) == 1);
-    File->Close();
-    File->Check();
-  }
-
- private:
-  std::unique_ptr<TIFFHandle> File;
-  Bytes Line;
-  std::uint32_t NextRow = 0;
-};
-
 }
 
 const FileType TIFFType{
@@ -466,8 +410,8 @@ const FileType TIFFType{
     .Open = [](const std::filesystem::path& file, const ReadOptions& options)
         -> std::unique_ptr<ImageReader> { return std::make_unique<TIFFReader>(file, options.MemoryLimit); },
     .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-                 const WriteOptions&) -> std::unique_ptr<ImageWriter> {
-      return std::make_unique<TIFFWriter>(descriptor, target, info);
+                 const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
+      return WriteTIFF(descriptor, target, info, options);
     },
 };
 

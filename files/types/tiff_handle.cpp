@@ -75,6 +75,32 @@ std::unique_ptr<TIFFHandle> TIFFHandle::Create(int descriptor, const std::filesy
   return handle;
 }
 
+std::unique_ptr<TIFFHandle> TIFFHandle::CreateInMemory(const std::filesystem::path& target, Bytes& written) {
+  std::unique_ptr<TIFFHandle> handle(new TIFFHandle(target));
+  handle->Writing = true;
+  const auto write = [](thandle_t user, void* data, tmsize_t size) {
+    auto& bytes = *static_cast<Bytes*>(user);
+    const auto* start = static_cast<const std::uint8_t*>(data);
+    bytes.insert(bytes.end(), start, start + size);
+    return size;
+  };
+  const auto read = [](thandle_t, void*, tmsize_t) -> tmsize_t { return 0; };
+  const auto seek = [](thandle_t, toff_t place, int from) -> toff_t {
+    constexpr toff_t end = 64;
+    return from == SEEK_END ? end : place;
+  };
+  TIFFOpenOptions* options = TIFFOpenOptionsAlloc();
+  TIFFOpenOptionsSetErrorHandlerExtR(options, OnError, handle.get());
+  TIFFOpenOptionsSetWarningHandlerExtR(options, OnWarning, handle.get());
+  errno = 0;
+  handle->File = TIFFClientOpenExt(
+      target.c_str(), "w8m", &written, read, write, seek, [](thandle_t) { return 0; },
+      [](thandle_t) -> toff_t { return 0; }, nullptr, nullptr, options);
+  TIFFOpenOptionsFree(options);
+  handle->Check(handle->File);
+  return handle;
+}
+
 void TIFFHandle::Check(bool good) const {
   if (good && Report.empty()) return;
   if (Writing) throw Failure(Path, SystemError ? std::strerror(SystemError) : Report);

@@ -6,6 +6,8 @@
 #include <memory>
 #include <string>
 
+#include "picturezor/picture.h"
+
 namespace picturezor::files {
 
 /// An open TIFF with what libtiff has to say of it, which becomes Failures.
@@ -15,6 +17,8 @@ class TIFFHandle {
   static std::unique_ptr<TIFFHandle> Open(const std::filesystem::path& file, std::int64_t memoryLimit);
   /// Into an open file, whose descriptor stays the caller's.
   static std::unique_ptr<TIFFHandle> Create(int descriptor, const std::filesystem::path& target, bool big);
+  /// What would be written to a file is appended to `written`, whatever the place.
+  static std::unique_ptr<TIFFHandle> CreateInMemory(const std::filesystem::path& target, Bytes& written);
   TIFFHandle(const TIFFHandle&) = delete;
   ~TIFFHandle() { Close(); }
 
