@@ -69,7 +69,7 @@ std::vector<Traces> CallEveryRow(StoredPicture::Kind kind, Format format) {
       const Picture& self = row.LowerName == "constructor" ? UnbuiltPicture() : with.Self();
       void* const object = rows == &pictures.Methods ? self.Address() : nullptr;
       const std::vector<Value> arguments = with.Ordinary(row);
-      const Outcome outcome = CallRow(row, object, arguments);
+      const Outcome outcome = object ? CallRow(row, object, arguments) : CallShared(row, arguments);
       Traces traces{row.Record->Declaration, outcome.Raised, 0, {}, {}};
       const bool random = row.LowerName == "fillrectrandom" || row.LowerName == "diffusefilter";
       if (!outcome.Result.Address) traces.Whole = outcome.Result.Whole;
