@@ -1,10 +1,27 @@
 #include "picturezor/object.h"
 
+#include <sys/mman.h>
+
 #include "object_model.h"
 
 namespace picturezor {
 
 using namespace model;
+
+Pages::Pages(std::size_t size) : Size(size) {
+  if (size == 0) return;
+  void* start = mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+  if (start == MAP_FAILED) throw std::bad_alloc();
+  Start = static_cast<std::uint8_t*>(start);
+#ifdef MADV_HUGEPAGE
+  // Filling many small pages takes several times as long; where there are no large ones, small ones do.
+  madvise(start, size, MADV_HUGEPAGE);
+#endif
+}
+
+Pages::~Pages() {
+  if (Start) munmap(Start, Size);
+}
 
 Object::Object(const Object& other) : At(other.At) { Lock(At); }
 
@@ -32,6 +49,10 @@ MemoryBlock MemoryBlock::Over(std::span<std::uint8_t> memory) {
   MemoryBlock block{Adopt(NewBlock(static_cast<void*>(memory.data())))};
   block.Limit(memory.size());
   return block;
+}
+
+MemoryBlock MemoryBlock::OfPages(std::size_t size) {
+  return MemoryBlock(Object::Adopt(NewBlock(Pages(size))));
 }
 
 std::span<std::uint8_t> MemoryBlock::Data() const {

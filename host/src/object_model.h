@@ -119,11 +119,23 @@ void* NewObject(const Class& of, std::unique_ptr<Payload> holds = nullptr);
 void Lock(void* object);
 void Unlock(void* object);
 
+/// Zeroed memory of the system's, in whole pages.
+struct Pages {
+  std::uint8_t* Start = nullptr;
+  std::size_t Size;
+  explicit Pages(std::size_t size);
+  Pages(Pages&& other) noexcept : Start(std::exchange(other.Start, nullptr)), Size(other.Size) {}
+  ~Pages();
+};
+
 struct BlockPayload : Payload {
   Bytes Own;
+  Pages OwnPages{0};
   std::uint8_t* Start;
   std::size_t Size;
   explicit BlockPayload(Bytes bytes) : Own(std::move(bytes)), Start(Own.data()), Size(Own.size()) {}
+  explicit BlockPayload(Pages pages)
+      : OwnPages(std::move(pages)), Start(OwnPages.Start), Size(OwnPages.Size) {}
   /// Over memory of the module, whose size isn't known.
   explicit BlockPayload(void* start) : Start(static_cast<std::uint8_t*>(start)), Size(0) {}
 };

@@ -87,6 +87,18 @@ Picture::Picture(const MemoryBlock& block, std::int32_t width, std::int32_t heig
   Invoke<void>(*this, "Constructor", block, width, height, Code(format), rowSize);
 }
 
+Picture Picture::InBlock(std::int32_t width, std::int32_t height, Format format) {
+  const std::int64_t bytes = CalculateMemory(width, height, format);
+  MemoryBlock block;
+  try {
+    if (bytes > 0 && bytes <= std::numeric_limits<std::uint32_t>::max())
+      block = MemoryBlock::OfPages(std::size_t(bytes));
+  } catch (const std::bad_alloc&) {
+    // The constructor refuses nil.
+  }
+  return Picture(block, width, height, format, block ? std::int32_t(bytes / height) : 0);
+}
+
 Picture::Picture(const HostPicture& picture, bool useAlpha) : Object(NewPictureObject()) {
   Invoke<void>(*this, "Constructor", picture, useAlpha);
 }

@@ -65,10 +65,10 @@ struct Tile {
 
 constexpr TileSize OnePixel{1, 1};
 
-/// The largest tiles whose rows are in both windows. Where the pictures share samples the order counts, and
-/// tiles are squares that fit in the smaller window.
+/// The largest tiles whose rows are in the address space together. Where the pictures share samples the order
+/// counts, and tiles are squares that fit in the smaller window.
 TileSize LargestTiles(const FilterCall& call) {
-  if (!call.SharesPixels) return {RowsAtOnce(call.Source), RowsAtOnce(call.Dest)};
+  if (!call.SharesPixels) return {MostRowsTogether(call.Source), MostRowsTogether(call.Dest)};
   const std::int32_t edge = std::min(call.Source.RowsPerBlock, call.Dest.RowsPerBlock) - 2;
   return edge < 1 ? OnePixel : TileSize{edge, edge};
 }
@@ -78,13 +78,22 @@ PictureZOR* Turn(PictureZOR* self, PictureZOR* dest, Direction way, SizeOfTiles&
   return RunFilter(self, dest, {.InPlace = false, .Turned = true}, [&](const FilterCall& call) {
     const std::int32_t width = call.Source.Width, height = call.Source.Height;
     const TileSize most = sizeOfTiles(call);
-    for (std::int32_t y = 0, rows; y < height; y += rows) {
-      rows = std::min(most.Rows, height - y);
-      for (std::int32_t x = 0, columns; x < width; x += columns) {
-        columns = std::min(most.Columns, width - x);
-        if (!Tile{call, way, {x, y, columns, rows}}.Turn()) return false;
-      }
+    const auto turn = [&](std::int64_t x, std::int64_t y) {
+      const std::int32_t left = std::int32_t(x), top = std::int32_t(y);
+      return Tile{
+          call, way, {left, top, std::min(most.Columns, width - left), std::min(most.Rows, height - top)}}
+          .Turn();
+    };
+    if (call.SharesPixels || most.Columns == 1) {
+      for (std::int64_t y = 0; y < height; y += most.Rows)
+        for (std::int64_t x = 0; x < width; x += most.Columns)
+          if (!turn(x, y)) return false;
+      return true;
     }
+    // All tiles of the same written rows first: a page is read again for less than it is written again.
+    for (std::int64_t x = 0; x < width; x += most.Columns)
+      for (std::int64_t y = 0; y < height; y += most.Rows)
+        if (!turn(x, y)) return false;
     return true;
   });
 }

@@ -253,9 +253,9 @@ template <class Work>
 bool ForPieces(const Shear& shear, const Shift* shifts, Work&& work) {
   // In memory the caches bound a piece, on a file the windows do: the source's rows spread with the columns.
   const bool mapped = shear.From.IsMapping || shear.Into.IsMapping;
-  const std::int32_t atOnce = RowsAtOnce(shear.From);
+  const std::int32_t atOnce = MostRowsTogether(shear.From);
   const std::int32_t rows =
-      std::min({mapped ? std::max(atOnce / 2, 1) : 128, atOnce, RowsAtOnce(shear.Into)});
+      std::min({mapped ? std::max(atOnce / 2, 1) : 128, atOnce, MostRowsTogether(shear.Into)});
   const std::int32_t mostColumns = mapped ? shear.From.Width : 2048 / shear.In.Step;
   Piece piece{};
   for (std::int32_t y = 0; y < shear.Into.Height; y = piece.Bottom) {

@@ -14,6 +14,7 @@ using Sample = std::uint8_t;
 using SampleTable = std::array<Sample, 256>;
 
 struct Store;
+struct FileRegions;
 
 /// The instance data of a PictureZOR. The host allocates it zero-filled; a constructor fills it, and after
 /// that its size, format and layout never change.
@@ -74,6 +75,8 @@ struct PictureData {
   /// The first row of the store, or of the window on a mapped store.
   Sample* PixelBase;
   bool WindowMapped, IsMapping;
+  /// What is mapped of a file; null when nothing was.
+  FileRegions* Regions;
   /// Bytes of a window.
   std::int32_t MappingBlockSize;
   RowFunction RowGetter;

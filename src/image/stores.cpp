@@ -15,6 +15,7 @@
 #include <utility>
 
 #include "frame/host_services.h"
+#include "image/file_regions.h"
 #include "image/formats.h"
 
 namespace zor {
@@ -126,9 +127,9 @@ bool ReserveFile(int fileDescriptor, std::int64_t total) {
 }
 
 void DropWindow(PictureData& data) {
+  DropRegions(data);
   if (!data.WindowMapped) return;
   data.WindowMapped = false;
-  if (data.PixelBase) munmap(data.PixelBase, std::size_t(data.MappingBlockSize));
   data.PixelBase = nullptr;
   data.WindowFirstRow = data.WindowLastRow = -1;
 }
@@ -138,13 +139,12 @@ void DropWindow(PictureData& data) {
 void PlaceWindow(PictureData& data, std::int64_t storeRow) {
   const std::int64_t limit = data.TotalSize / data.RowSize - data.RowsPerBlock;
   const std::int64_t first = std::min(storeRow > 1 ? storeRow - 2 : storeRow, limit);
-  DropWindow(data);
-  data.PixelBase = nullptr;
-  if (first < 0) return;
-  void* window = mmap(nullptr, std::size_t(data.MappingBlockSize), PROT_READ | PROT_WRITE, MAP_SHARED,
-                      data.Samples->FileDescriptor, off_t(first * data.RowSize));
-  if (window == MAP_FAILED) return;
-  data.PixelBase = static_cast<Sample*>(window);
+  const std::int64_t block = data.MappingBlockSize, from = first * data.RowSize;
+  const bool upwards = data.WindowMapped && storeRow < data.WindowFirstRow;
+  data.WindowMapped = false;
+  data.WindowFirstRow = data.WindowLastRow = -1;
+  data.PixelBase = first < 0 ? nullptr : WindowBytes(data, from, from + block, upwards ? block : 0);
+  if (!data.PixelBase) return;
   data.WindowMapped = true;
   data.WindowFirstRow = std::int32_t(first);
   data.WindowLastRow = std::int32_t(first + data.RowsPerBlock - 1);
@@ -215,12 +215,25 @@ bool IsMirrored(const PictureData& picture) {
   return picture.RowGetter == PlainRowMirrored || picture.RowGetter == MappedRowMirrored;
 }
 
-bool HoldTogether(PictureData& data, std::int32_t first, std::int32_t last) {
-  if (!data.RowGetter || !data.IsMapping) return data.RowGetter != nullptr;
-  const std::int64_t top = IsMirrored(data) ? MirroredStoreRow(data, last) : StoreRow(data, first);
-  const std::int64_t bottom = top + last - first;
-  if (!InWindow(data, top) || !InWindow(data, bottom)) PlaceWindow(data, top);
-  return InWindow(data, top) && InWindow(data, bottom);
+std::int32_t MostRowsTogether(const PictureData& data) {
+  if (!data.IsMapping) return data.Height;
+  // Those of the window but the two above the one that it was placed for.
+  return std::max(data.RowsPerBlock - 2, std::int32_t(MostBytesBeside(data) / data.RowSize));
+}
+
+Sample* RowsTogether(PictureData& data, std::int32_t first, std::int32_t last) {
+  if (!data.RowGetter) return nullptr;
+  if (!data.IsMapping) return data.RowGetter(&data, first);
+  const bool mirrored = IsMirrored(data);
+  const std::int64_t top = mirrored ? MirroredStoreRow(data, last) : StoreRow(data, first);
+  const std::int64_t bottom = top + last - first, size = data.RowSize;
+  const auto held = [&] { return InWindow(data, top) && InWindow(data, bottom); };
+  if (!held() && bottom - top < data.RowsPerBlock - 2) PlaceWindow(data, top);
+  Sample* at = held() ? data.PixelBase + (top - data.WindowFirstRow) * size
+               : (bottom - top + 1) * size > MostBytesBeside(data)
+                   ? nullptr
+                   : BytesBeside(data, top * size, (bottom + 1) * size);
+  return at && mirrored ? at + (bottom - top) * size : at;
 }
 
 std::int32_t RoundedRowSize(const PictureData& data, std::int32_t unit) {

@@ -67,9 +67,12 @@ PictureData::RowFunction Mirrored(PictureData::RowFunction getter);
 /// Whether the rows of a picture stand in its store from the bottom up.
 bool IsMirrored(const PictureData& picture);
 
-/// Moves the window of a mapped store, if it has to, so that rows first .. last are all in it. False where
-/// they can't be, and on a closed picture.
-bool HoldTogether(PictureData& data, std::int32_t first, std::int32_t last);
+/// How many rows from any one on can be in the address space together.
+std::int32_t MostRowsTogether(const PictureData& data);
+
+/// The address of row `first` with all rows to `last` in the address space, on a mapped store until the next
+/// row is asked for. Null where they can't be, and on a closed picture.
+Sample* RowsTogether(PictureData& data, std::int32_t first, std::int32_t last);
 
 /// The getter of every memory store.
 Sample* PlainRow(PictureData* data, std::int32_t row);

@@ -99,6 +99,27 @@ TEST(Turns, GoFromFileToFile) {
     }
 }
 
+// Catches a row taken from elsewhere where more rows are asked for together than a window has.
+TEST(Turns, TakeMoreRowsThanAWindow) {
+  constexpr int width = 7, height = 26000;
+  const Picture plain(width, height, Format::G);
+  plain.SetDataStringInFormat(Format::G, Noise(59).Many(std::size_t{width} * height));
+  const auto pixels = [](const Picture& picture) { return picture.DataStringInFormat(Format::G); };
+  const TemporaryFile tallFile, wideFile;
+  const Picture tall = Picture::Mapped(tallFile.Path(), width, height, Format::G);
+  const Picture wide = Picture::Mapped(wideFile.Path(), height, width, Format::G);
+  tall.SetDataStringInFormat(Format::G, pixels(plain));
+  EXPECT_TRUE(tall.Rotate90(wide));
+  EXPECT_EQ(pixels(wide), pixels(plain.Rotate90()));
+  tall.VMirror();
+  EXPECT_EQ(pixels(tall), pixels(plain.MirroredView()));
+  EXPECT_TRUE(wide.MirroredView().Rotate90(tall.MirroredView()));
+  EXPECT_EQ(pixels(tall), pixels(plain));
+  tall.VMirror();
+  EXPECT_TRUE(wide.Rotate270(tall));
+  EXPECT_EQ(pixels(tall), pixels(plain));
+}
+
 TEST(Turns, WriteOtherOrdersAndLargerPictures) {
   for (const Way& way : Ways())
     for (const Format format : {Format::BGRA, Format::XRGB, Format::BGR, Format::RGB}) {

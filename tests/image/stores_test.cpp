@@ -1,6 +1,7 @@
 #include "image/stores.h"
 
 #include <gmock/gmock.h>
+#include <sys/mman.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -187,6 +188,79 @@ TEST(MemoryStore, SharesNothingButItsPixels) {
       EXPECT_EQ(SharePixels(DataOf(byte), DataOf(picture)), inRow) << rowSize << " apart, byte " << at;
     }
   }
+}
+
+/// Two pictures as far apart from row to row as a block below 4 GiB allows, of which only the pixels take
+/// memory.
+class FarRows {
+ public:
+  static constexpr std::size_t Bytes = 0xFFFFFFFF;
+  static constexpr int RowSize = Bytes / RowArguments::Height / 64 * 64;
+
+  explicit FarRows(Format format) {
+    for (int i = 0; i < 2; ++i) {
+      Memory[i] =
+          mmap(nullptr, Bytes, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS | MAP_NORESERVE, -1, 0);
+      MemoryBlock block(Object::Adopt(model::NewBlock(Memory[i])));
+      block.Limit(Bytes);
+      Of[i] = Picture(block, RowArguments::Width, RowArguments::Height, format, RowSize);
+    }
+  }
+  ~FarRows() {
+    for (void* memory : Memory) munmap(memory, Bytes);
+  }
+  FarRows(const FarRows&) = delete;
+  Picture Of[2];
+
+ private:
+  void* Memory[2];
+};
+
+/// What a row makes of the first of two pictures, and of the second if it takes one.
+std::vector<Samples> Made(const model::MethodEntry& row, const Picture (&pictures)[2], Format format) {
+  const RowArguments with(StoredPicture::Memory, format);
+  const std::size_t bytes = std::size_t(RowArguments::Width * RowArguments::Height * BytesPerPixel(format));
+  for (unsigned i = 0; i < 2; ++i) pictures[i].SetDataStringInFormat(format, Noise(i).Many(bytes));
+  std::vector<Value> arguments = with.Ordinary(row);
+  for (std::size_t i = 0; i < arguments.size(); ++i)
+    if (row.Of.Parameters[i].Type == "picturezor") arguments[i] = {.Address = pictures[1].Address()};
+  const Outcome outcome = CallRow(row, pictures[0].Address(), arguments);
+  std::vector<Samples> made{Samples(outcome.Raised.begin(), outcome.Raised.end())};
+  if (row.Of.Result == "picturezor" && outcome.Result.Address)
+    made.push_back(Picture(Object::Share(outcome.Result.Address)).DataStringInFormat(format));
+  if (row.Of.Result == "boolean") made.push_back({std::uint8_t(outcome.Result.Whole)});
+  for (const Picture& picture : pictures) made.push_back(picture.DataStringInFormat(format));
+  GiveBack(row.Of.Result, outcome.Result);
+  return made;
+}
+
+// Catches a place in a picture that is worked out in 32 bits.
+TEST(MemoryStore, ReachesRowsBeyond2GiB) {
+  if (sizeof(void*) < 8) GTEST_SKIP();
+  // These copy whole rows, or a picture whole, or have their own random numbers.
+  const char* others[] = {"constructor", "row", "clone", "fillrectrandom", "diffusefilter"};
+  for (const Format format : {Format::RGBA, Format::G, Format::KYMCA})
+    for (const model::MethodEntry& row : model::ClassNamed("PictureZOR").Methods) {
+      if (std::ranges::find(others, row.LowerName) != std::end(others)) continue;
+      const Picture near[] = {Picture(RowArguments::Width, RowArguments::Height, format),
+                              Picture(RowArguments::Width, RowArguments::Height, format)};
+      const FarRows far(format);
+      ASSERT_TRUE(far.Of[0].Valid() && far.Of[1].Valid());
+      EXPECT_EQ(Made(row, far.Of, format), Made(row, near, format)) << row.Record->Declaration << int(format);
+    }
+}
+
+TEST(MemoryStore, MayBeABlockOf4GiB) {
+  if (sizeof(void*) < 8) GTEST_SKIP();
+  EXPECT_FALSE(Picture(40000, 20000, Format::RGB).Valid());
+  const Picture picture = Picture::InBlock(40000, 20000, Format::RGB);
+  ASSERT_TRUE(picture.Valid());
+  EXPECT_EQ(picture.TotalSize(), 2400000000);
+  picture.ClipImage({39999, 19998, 1, 2}).FillRectRGB(1, 2, 3);
+  EXPECT_EQ(picture.ClipImage({39998, 19999, 2, 1}).DataStringInFormat(Format::RGB),
+            (Samples{0, 0, 0, 1, 2, 3}));
+  EXPECT_FALSE(Picture::InBlock(65536, 65536, Format::G).Valid()) << "2^32 bytes";
+  EXPECT_FALSE(Picture::InBlock(0, 5, Format::G).Valid());
 }
 
 TEST(MemoryStore, TakesABlockSizeToo) {

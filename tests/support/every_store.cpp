@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <atomic>
 
+#include "image/file_regions.h"
 #include "image/picture_data.h"
 #include "object_model.h"
 
@@ -33,7 +34,10 @@ zor::PictureData& DataOf(const Picture& picture) {
 
 void MakeWindowSmall(const Picture& picture) {
   auto& data = DataOf(picture);
-  munmap(data.PixelBase, std::size_t(data.MappingBlockSize));
+  for (zor::FileRegion* region : {&data.Regions->Window, &data.Regions->Other}) {
+    if (region->Start) munmap(region->Start, std::size_t(region->End - region->First));
+    *region = {};
+  }
   data.RowsPerBlock = 5;
   data.MappingBlockSize = 5 * data.RowSize;
   data.PixelBase = nullptr;

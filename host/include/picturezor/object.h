@@ -49,6 +49,9 @@ class MemoryBlock : public Object {
   explicit MemoryBlock(std::span<const std::uint8_t> bytes);
   /// Over somebody else's memory, which outlives it.
   static MemoryBlock Over(std::span<std::uint8_t> memory);
+  /// A zeroed block of any size, which takes memory where it is touched, a page at a time. Throws
+  /// std::bad_alloc for what is plainly more than there is.
+  static MemoryBlock OfPages(std::size_t size);
 
   /// The bytes of the block. One over memory of the module knows no size of its own: 0 unless `Limit` has
   /// told it.

@@ -120,6 +120,10 @@ class Picture : public Object {
   /// too small for it.
   Picture(const MemoryBlock& block, std::int32_t width, std::int32_t height, Format format,
           std::int32_t rowSize);
+  /// Zeroed samples in a block of the host's: in memory too, but below 4 GiB where addresses have 64 bits.
+  /// Memory is taken as rows are touched. Not `Valid` where there plainly isn't as much. `Clone` gives nil
+  /// from 2 GiB on.
+  static Picture InBlock(std::int32_t width, std::int32_t height, Format format);
   /// Over the pixels of a host picture; see Constructor in the module. Alpha only `useAlpha`.
   explicit Picture(const HostPicture& picture, bool useAlpha = false);
   /// In a temporary file, which is created or overwritten and goes away with the last picture using it. About
