@@ -226,8 +226,10 @@ std::vector<Samples> Made(const model::MethodEntry& row, const Picture (&picture
     if (row.Of.Parameters[i].Type == "picturezor") arguments[i] = {.Address = pictures[1].Address()};
   const Outcome outcome = CallRow(row, pictures[0].Address(), arguments);
   std::vector<Samples> made{Samples(outcome.Raised.begin(), outcome.Raised.end())};
-  if (row.Of.Result == "picturezor" && outcome.Result.Address)
-    made.push_back(Picture(Object::Share(outcome.Result.Address)).DataStringInFormat(format));
+  if (row.Of.Result == "picturezor" && outcome.Result.Address) {
+    const Picture result(Object::Share(outcome.Result.Address));
+    made.push_back(result.DataStringInFormat(result.ImageFormat()));
+  }
   if (row.Of.Result == "boolean") made.push_back({std::uint8_t(outcome.Result.Whole)});
   for (const Picture& picture : pictures) made.push_back(picture.DataStringInFormat(format));
   GiveBack(row.Of.Result, outcome.Result);
