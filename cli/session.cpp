@@ -53,9 +53,9 @@ OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
 }
 
 void OpenedImage::Limit(const Rect& part) {
-  const Rect stored = Stored(part, Reader->Info());
-  Reader = PartOf(std::move(Reader), stored);
-  Upright = files::Upright(Reader->Info());
+  Part = Stored(part, Reader->Info());
+  Upright.Width = part.Width;
+  Upright.Height = part.Height;
 }
 
 Target::Target(const std::filesystem::path& file) : File(file), Type(TypeByExtension(file)) {}
@@ -72,17 +72,49 @@ void Target::Start(std::int64_t width, std::int64_t height) {
   Output = std::make_unique<OutputFile>(File);
 }
 
+std::unique_ptr<ImageWriter> Target::Writer(Session& session, Format format, ImageInfo info) {
+  info.Pixels = format;
+  if (!ProfileFits(info.Profile, format)) info.Profile.clear();
+  return Type.Create(Output->Descriptor(), File, info, session.Writing);
+}
+
 void Target::Write(Session& session, const Picture& picture, Format format, ImageInfo info) {
   info.Width = picture.Width();
   info.Height = picture.Height();
-  info.Pixels = format;
-  if (!ProfileFits(info.Profile, format)) info.Profile.clear();
-  const auto writer = Type.Create(Output->Descriptor(), File, info, session.Writing);
+  const auto writer = Writer(session, format, std::move(info));
   WriteFrom(picture, *writer, format, session.Bar);
   writer->Finish();
 }
 
+void Target::Carry(Session& session, OpenedImage& source, const flow::Chain& chain, Format format,
+                   int threads) {
+  ImageInfo info = source.Upright;
+  const flow::Shape result = flow::ResultOf({info.Width, info.Height, info.Pixels, info.Density}, chain);
+  info.Width = result.Width;
+  info.Height = result.Height;
+  info.Density = result.Density;
+  const auto writer = Writer(session, format, std::move(info));
+  const auto again = [file = source.File, limit = session.Stores.MemoryLimit] {
+    return OpenImage(file, {.MemoryLimit = limit});
+  };
+  flow::Run({std::move(source.Reader), again, source.Part}, chain, format, *writer, {session.Stores, threads},
+            session.Bar);
+}
+
 void Target::Commit() { Output->Commit(); }
+
+flow::Shape Work::Result(const flow::Shape& source) const {
+  flow::Shape result = source;
+  if (Reshape) Reshape(result);
+  return result;
+}
+
+flow::Chain ChainOf(flow::Dependence needs, int pictures, Work::Function function,
+                    std::function<void(flow::Shape&)> reshape) {
+  flow::Chain chain;
+  chain.push_back(std::make_unique<Work>(needs, pictures, std::move(function), std::move(reshape)));
+  return chain;
+}
 
 std::int64_t ParseBytes(const std::string& text) {
   double number = 0;

@@ -9,6 +9,7 @@
 #include "image_file.h"
 #include "pictures.h"
 #include "progress_bar.h"
+#include "run.h"
 #include "temporary_files.h"
 
 namespace CLI {
@@ -47,6 +48,8 @@ struct OpenedImage {
   std::unique_ptr<ImageReader> Reader;
   /// With the orientation applied.
   ImageInfo Upright;
+  /// What alone counts of the picture as it is stored.
+  std::optional<Rect> Part;
 
   OpenedImage(Session& session, const std::filesystem::path& file);
   PictureSize Size() const { return {Upright.Width, Upright.Height, Upright.Pixels}; }
@@ -65,17 +68,44 @@ class Target {
   Format Storable(Session& session, Format pixels) const;
   /// Refuses a size that the file can't hold, and starts the file.
   void Start(std::int64_t width, std::int64_t height);
-  /// Writes and completes the file. `info` tells what else goes into it: a profile only where its colours
-  /// fit.
+  /// Carries an image through operations into the file, in another format of files at the end, and completes
+  /// it. A profile goes along only where its colours fit.
+  void Carry(Session& session, OpenedImage& source, const flow::Chain& chain, Format format, int threads = 0);
+  /// Writes and completes the file. `info` tells what else goes into it.
   void Write(Session& session, const Picture& picture, Format format, ImageInfo info);
   /// The file stands under its name from now on.
   void Commit();
 
  private:
+  std::unique_ptr<ImageWriter> Writer(Session& session, Format format, ImageInfo info);
+
   std::filesystem::path File;
   const FileType& Type;
   std::unique_ptr<OutputFile> Output;
 };
+
+/// An operation that a command puts together.
+class Work final : public flow::Operation {
+ public:
+  using Function = std::function<Picture(const Picture& source, const flow::Workplace& at)>;
+  Work(flow::Dependence needs, int pictures, Function function,
+       std::function<void(flow::Shape&)> reshape = {})
+      : Needs(needs), AtATime(pictures), Of(std::move(function)), Reshape(std::move(reshape)) {}
+  flow::Shape Result(const flow::Shape& source) const override;
+  flow::Dependence DependsOn(const flow::Shape&) const override { return Needs; }
+  int Pictures() const override { return AtATime; }
+  Picture Apply(Picture source, const flow::Workplace& at) const override { return Of(source, at); }
+
+ private:
+  flow::Dependence Needs;
+  int AtATime;
+  Function Of;
+  std::function<void(flow::Shape&)> Reshape;
+};
+
+/// A chain of one.
+flow::Chain ChainOf(flow::Dependence needs, int pictures, Work::Function function,
+                    std::function<void(flow::Shape&)> reshape = {});
 
 /// "256M", "1.5G" or a plain number of bytes. Throws UsageFailure.
 std::int64_t ParseBytes(const std::string& text);

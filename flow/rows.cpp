@@ -12,15 +12,18 @@ namespace {
 
 class RowsOfFile final : public Rows {
  public:
-  RowsOfFile(std::unique_ptr<files::ImageReader> reader, std::int64_t first)
-      : Rows(ShapeOf(reader->Info())), Reader(std::move(reader)) {
+  RowsOfFile(std::unique_ptr<files::ImageReader> reader, const Shape& shape, const Rect& part)
+      : Rows(shape), Reader(std::move(reader)) {
     const files::ImageInfo& info = Reader->Info();
-    const auto y = std::int32_t(first);
-    if (y > 0 && Reader->StartsAnywhere() && Reader->Select({0, y, info.Width, info.Height - y})) {
-      Done = y;
-    } else {
+    const bool toTheEnd = part.Width == info.Width && part.Y + part.Height == info.Height;
+    Left = part.Height;
+    if (toTheEnd && (part.Y == 0 || !Reader->StartsAnywhere())) {
+      // Its end is looked at, too.
+      Finishes = true;
       Bytes dropped(RowBytes());
-      while (Done < y) Next(dropped.data(), 0, 1);
+      for (std::int32_t y = 0; y < part.Y; ++y) Reader->ReadRow(dropped.data());
+    } else {
+      Reader = files::PartOf(std::move(Reader), part);
     }
   }
 
@@ -28,8 +31,8 @@ class RowsOfFile final : public Rows {
     Reader->ReadRows(room, stride, most);
     if (Reader->Info().Orientation == 2)
       for (std::int32_t y = 0; y < most; ++y) Mirror(room + y * stride);
-    Done += most;
-    if (Done == About().Height) Reader->Finish();
+    Left -= most;
+    if (Left == 0 && Finishes) Reader->Finish();
     return {room, stride, most};
   }
 
@@ -42,7 +45,8 @@ class RowsOfFile final : public Rows {
   }
 
   std::unique_ptr<files::ImageReader> Reader;
-  std::int32_t Done = 0;
+  std::int32_t Left;
+  bool Finishes = false;
 };
 
 class RowsOfPicture final : public Rows {
@@ -88,9 +92,14 @@ void ReadRows(Rows& rows, std::uint8_t* room, std::ptrdiff_t stride, std::int32_
   }
 }
 
-Shape ShapeOf(const files::ImageInfo& info) {
-  const files::ImageInfo upright = files::Upright(info);
-  return {upright.Width, upright.Height, upright.Pixels, upright.Density};
+Shape ShapeOf(const OpenFile& file) {
+  files::ImageInfo info = file.Reader->Info();
+  if (file.Part) {
+    info.Width = file.Part->Width;
+    info.Height = file.Part->Height;
+  }
+  info = files::Upright(info);
+  return {info.Width, info.Height, info.Pixels, info.Density};
 }
 
 RowSource RowsOf(OpenFile file) {
@@ -98,11 +107,13 @@ RowSource RowsOf(OpenFile file) {
     std::mutex Access;
     OpenFile File;
   };
-  const Shape shape = ShapeOf(file.Reader->Info());
+  const Shape shape = ShapeOf(file);
+  const files::ImageInfo& info = file.Reader->Info();
+  const Rect part = file.Part.value_or(Rect{0, 0, info.Width, info.Height});
   const bool anywhere = file.Reader->StartsAnywhere() && file.Again;
   auto opened = std::make_shared<Opened>();
   opened->File = std::move(file);
-  const auto from = [opened](std::int64_t first) -> std::unique_ptr<Rows> {
+  const auto from = [opened, shape, part](std::int64_t first) -> std::unique_ptr<Rows> {
     std::unique_ptr<files::ImageReader> reader;
     {
       const std::lock_guard lock(opened->Access);
@@ -111,7 +122,9 @@ RowSource RowsOf(OpenFile file) {
         throw files::Failure("the input would have to be read twice, which can't be done with this one");
       if (!reader) reader = opened->File.Again();
     }
-    return std::make_unique<RowsOfFile>(std::move(reader), first);
+    const auto y = std::int32_t(first);
+    const Rect rest{part.X, part.Y + y, part.Width, part.Height - y};
+    return std::make_unique<RowsOfFile>(std::move(reader), shape, rest);
   };
   return {.Of = shape, .From = from, .Anywhere = anywhere};
 }

@@ -49,10 +49,12 @@ struct OpenFile {
   std::unique_ptr<files::ImageReader> Reader;
   /// Opens it once more; empty where that can't be.
   std::function<std::unique_ptr<files::ImageReader>()> Again;
+  /// What alone counts, in pixels as they are stored; all without it.
+  std::optional<Rect> Part{};
 };
+/// What its picture is once it stands upright.
+Shape ShapeOf(const OpenFile& file);
 
-/// What a file's picture is once it stands upright.
-Shape ShapeOf(const files::ImageInfo& info);
 /// The rows of a file, whose orientation is 1 or 2, upright. Behind the last row the file is read to its end.
 RowSource RowsOf(OpenFile file);
 /// The rows of a picture in one of the formats of files. One thread at a time reads them.

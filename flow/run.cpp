@@ -27,12 +27,13 @@ int ThreadsOf(const RunOptions& options) { return options.Threads > 0 ? options.
 class Stream {
  public:
   Stream(OpenFile file, const RunOptions& options, files::Progress& progress)
-      : Of(ShapeOf(file.Reader->Info())), Options(options), Report(progress) {
+      : Of(ShapeOf(file)), Options(options), Report(progress) {
     const bool asItComes = file.Reader->Info().Orientation <= 2 && options.Stores.Kind == files::Store::Auto;
     if (asItComes) {
       Coming = RowsOf(std::move(file));
     } else {
       Whole = files::MakePictures(options.Stores, {{Of.Width, Of.Height, Of.Of}})[0];
+      if (file.Part) file.Reader = files::PartOf(std::move(file.Reader), *file.Part);
       files::ReadInto(Whole, *file.Reader, progress);
     }
   }

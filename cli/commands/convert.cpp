@@ -30,9 +30,7 @@ int Convert(Session& session, const ConvertOptions& options) {
   if (WithoutAlpha(from) == Format::CMYK && WithoutAlpha(format) == Format::G)
     session.Note(options.In, "gray is made of the black ink alone");
   target.Start(source.Upright.Width, source.Upright.Height);
-  const auto pictures = MakePictures(session.Stores, {source.Size()});
-  source.ReadInto(session, pictures[0]);
-  target.Write(session, pictures[0], format, source.Upright);
+  target.Carry(session, source, {}, format);
   target.Commit();
   return Done;
 }

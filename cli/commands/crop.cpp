@@ -25,9 +25,7 @@ int Crop(Session& session, const CropOptions& options) {
   const Format format = target.Storable(session, size.Of);
   target.Start(width, height);
   source.Limit({std::int32_t(x), std::int32_t(y), std::int32_t(width), std::int32_t(height)});
-  const auto pictures = MakePictures(session.Stores, {source.Size()});
-  source.ReadInto(session, pictures[0]);
-  target.Write(session, pictures[0], format, source.Upright);
+  target.Carry(session, source, {}, format);
   target.Commit();
   return Done;
 }

@@ -81,11 +81,23 @@ CLI::Validator Between(double least, double most) {
 
 enum class Serves { All, GrayAndRGB, RGB };
 
+/// How the rows that a filter makes come from those of the image.
+using Needs = flow::Dependence (*)(const FilterOptions& options);
+constexpr auto OnBands = flow::Dependence::Kind::Bands;
+
+flow::Dependence Everything(const FilterOptions&) { return {}; }
+flow::Dependence Row(const FilterOptions&) { return {.Of = OnBands}; }
+flow::Dependence Around(double rows) {
+  constexpr double most = 1e9;
+  return {.Of = OnBands, .Reach = std::int32_t(std::min(rows, most))};
+}
+
 /// A filter of the command. `Run` gets the colours of the image and gives them back filtered, in place where
 /// that is possible.
 struct FilterCommand {
   const char *Name, *Help;
   Serves Groups;
+  Needs DependsOn;
   /// The pictures of the image's size that it needs at a time.
   int Pictures;
   void (*AddOptions)(CLI::App& command, FilterOptions& options);
@@ -132,10 +144,12 @@ Picture Transfer(const Picture& colours, const FilterOptions& options) {
                                 TableOf("--blue", options.Blue));
 }
 
+constexpr int MostMatrixRows = 50;
+
 Picture Matrix(const Picture& colours, const FilterOptions& options) {
   const std::vector<std::int32_t> weights = Numbers("--weights", options.Matrix);
   const int side = int(std::lround(std::sqrt(double(weights.size()))));
-  if (std::size_t(side) * std::size_t(side) != weights.size() || side > 50)
+  if (std::size_t(side) * std::size_t(side) != weights.size() || side > MostMatrixRows)
     throw UsageFailure("--weights: " + std::to_string(weights.size()) +
                        " numbers are no square of at most 50 x 50");
   double sum = 0;
@@ -157,16 +171,16 @@ Picture Unsharp(const Picture& colours, const FilterOptions& options) {
 }
 
 const FilterCommand Filters[] = {
-    {"invert", "The complement of every colour", Serves::All, 1, NoOptions,
+    {"invert", "The complement of every colour", Serves::All, Row, 1, NoOptions,
      [](const Picture& colours, const FilterOptions&) {
        colours.Invert();
        return colours;
      }},
-    {"auto-level", "Stretch the levels from black to white", Serves::RGB, 1, NoOptions,
+    {"auto-level", "Stretch the levels from black to white", Serves::RGB, Everything, 1, NoOptions,
      [](const Picture& colours, const FilterOptions&) { return colours.AutoLevel() ? colours : Picture(); }},
-    {"solarize", "Dark and bright become bright, the middle dark", Serves::All, 1, NoOptions,
+    {"solarize", "Dark and bright become bright, the middle dark", Serves::All, Row, 1, NoOptions,
      [](const Picture& colours, const FilterOptions&) { return colours.SolarizeFilter(colours); }},
-    {"gamma", "Brighten with more than 1, darken with less", Serves::GrayAndRGB, 1,
+    {"gamma", "Brighten with more than 1, darken with less", Serves::GrayAndRGB, Row, 1,
      [](CLI::App& command, FilterOptions& options) {
        command
            .add_option("--gamma", options.Gamma, "One gamma, or those of red, green and blue, as 2.2,1.8,2")
@@ -174,7 +188,7 @@ const FilterCommand Filters[] = {
            ->type_name("G");
      },
      Gamma},
-    {"gain", "More or less contrast in the middle, and a lift of it", Serves::GrayAndRGB, 1,
+    {"gain", "More or less contrast in the middle, and a lift of it", Serves::GrayAndRGB, Row, 1,
      [](CLI::App& command, FilterOptions& options) {
        Number(command, "--gain", options.Gain, 0, 1, "0.5 leaves all as it is, more is steeper; 0 to 1");
        Number(command, "--bias", options.Bias, 1e-6, 1, "0.5 leaves all as it is, more is brighter; up to 1");
@@ -182,7 +196,7 @@ const FilterCommand Filters[] = {
      [](const Picture& colours, const FilterOptions& options) {
        return colours.GainFilter(colours, options.Gain, options.Bias);
      }},
-    {"transfer", "Send the samples through tables of numbers", Serves::GrayAndRGB, 1,
+    {"transfer", "Send the samples through tables of numbers", Serves::GrayAndRGB, Row, 1,
      [](CLI::App& command, FilterOptions& options) {
        const auto add = [&](const char* name, std::string& text, const char* help) {
          command.add_option(name, text, help)->type_name("N,N,..|@FILE");
@@ -194,7 +208,8 @@ const FilterCommand Filters[] = {
        add("--blue", options.Blue, "The same for one channel");
      },
      Transfer},
-    {"matrix", "Weigh the samples around each one", Serves::All, 2,
+    {"matrix", "Weigh the samples around each one", Serves::All,
+     [](const FilterOptions&) { return Around(MostMatrixRows / 2); }, 2,
      [](CLI::App& command, FilterOptions& options) {
        command
            .add_option("--weights", options.Matrix,
@@ -207,7 +222,11 @@ const FilterCommand Filters[] = {
               "Then multiplied by this; 1 divided by the sum of the weights by default");
      },
      Matrix},
-    {"blur", "The mean of a square around each sample", Serves::All, 3,
+    {"blur", "The mean of a square around each sample", Serves::All,
+     [](const FilterOptions& options) {
+       return Around(options.NoVertical ? 0 : std::floor(options.Radius) * options.Iterations);
+     },
+     3,
      [](CLI::App& command, FilterOptions& options) {
        Number(command, "--radius", options.Radius, 1, 1e6, "In whole pixels; 3 by default");
        Count(command, "--iterations", options.Iterations, 1, 1000, "3 are nearly a bell; 1 by default");
@@ -215,7 +234,8 @@ const FilterCommand Filters[] = {
        command.add_flag("--only-vertical", options.NoHorizontal, "Along columns alone")->excludes(rows);
      },
      Blur},
-    {"soft-blur", "A blur by less than a pixel", Serves::All, 1,
+    {"soft-blur", "A blur by less than a pixel", Serves::All, [](const FilterOptions&) { return Around(1); },
+     1,
      [](CLI::App& command, FilterOptions& options) {
        options.Radius = 0.5;
        Number(command, "--radius", options.Radius, 0, 0.999, "A fraction of a pixel; 0.5 by default");
@@ -223,7 +243,8 @@ const FilterCommand Filters[] = {
      [](const Picture& colours, const FilterOptions& options) {
        return colours.BoxBlurFractionalFilter(colours, options.Radius);
      }},
-    {"stamp", "Every channel to one of two colours, with a soft edge", Serves::GrayAndRGB, 4,
+    {"stamp", "Every channel to one of two colours, with a soft edge", Serves::GrayAndRGB,
+     [](const FilterOptions& options) { return Around(std::floor(options.Radius / 3) * 3); }, 4,
      [](CLI::App& command, FilterOptions& options) {
        options.Radius = 9;
        Number(command, "--radius", options.Radius, 0, 1e6, "Of the blur before it; 9 by default");
@@ -236,7 +257,8 @@ const FilterCommand Filters[] = {
        return colours.StampFilter({}, options.Radius, options.Threshold, options.Softness,
                                   ParseColor("--black", options.Black), ParseColor("--white", options.White));
      }},
-    {"unsharp", "Sharpen by the difference to a blurred copy", Serves::All, 3,
+    {"unsharp", "Sharpen by the difference to a blurred copy", Serves::All,
+     [](const FilterOptions& options) { return Around(std::floor(options.Radius) * 3); }, 3,
      [](CLI::App& command, FilterOptions& options) {
        Number(command, "--radius", options.Radius, 1, 1e6, "Of the blur, in whole pixels; 3 by default");
        Number(command, "--amount", options.Amount, -1, 1000,
@@ -245,7 +267,8 @@ const FilterCommand Filters[] = {
              "Differences below it stay as they are; 0 by default");
      },
      Unsharp},
-    {"oil", "Strokes of the most frequent colour around", Serves::All, 2,
+    {"oil", "Strokes of the most frequent colour around", Serves::All,
+     [](const FilterOptions& options) { return Around(options.Range); }, 2,
      [](CLI::App& command, FilterOptions& options) {
        options.Levels = 32;
        Count(command, "--range", options.Range, 0, 100, "Pixels around each one; 3 by default");
@@ -254,7 +277,7 @@ const FilterCommand Filters[] = {
      [](const Picture& colours, const FilterOptions& options) {
        return colours.OilFilter({}, options.Levels, options.Range);
      }},
-    {"diffuse", "Scatter the pixels", Serves::GrayAndRGB, 2,
+    {"diffuse", "Scatter the pixels", Serves::GrayAndRGB, Everything, 2,
      [](CLI::App& command, FilterOptions& options) {
        options.Level = 4;
        Count(command, "--level", options.Level, 0, 10000, "How far, in pixels; 4 by default");
@@ -262,16 +285,22 @@ const FilterCommand Filters[] = {
      [](const Picture& colours, const FilterOptions& options) {
        return colours.DiffuseFilter({}, options.Level);
      }},
-    {"engrave", "Gray relief of the edges", Serves::GrayAndRGB, 2,
+    {"engrave", "Gray relief of the edges", Serves::GrayAndRGB,
+     [](const FilterOptions& options) { return Around(std::abs(options.Level)); }, 2,
      [](CLI::App& command, FilterOptions& options) {
        Count(command, "--level", options.Level, -10000, 10000, "How deep, in pixels; 1 by default");
      },
      [](const Picture& colours, const FilterOptions& options) {
        return colours.EngraveFilter({}, options.Level);
      }},
-    {"neon", "Bright edges on black", Serves::All, 1, NoOptions,
-     [](const Picture& colours, const FilterOptions&) { return colours.NeonFilter(colours); }},
-    {"dither", "A few levels a channel, by a pattern of thresholds", Serves::GrayAndRGB, 1,
+    {"neon", "Bright edges on black", Serves::All, [](const FilterOptions&) { return Around(1); }, 1,
+     NoOptions, [](const Picture& colours, const FilterOptions&) { return colours.NeonFilter(colours); }},
+    {"dither", "A few levels a channel, by a pattern of thresholds", Serves::GrayAndRGB,
+     [](const FilterOptions&) {
+       // Of patterns of 2, 4, 6, 8 and 16 rows.
+       return flow::Dependence{.Of = OnBands, .Period = 48};
+     },
+     1,
      [](CLI::App& command, FilterOptions& options) {
        options.Levels = 2;
        command
@@ -310,6 +339,17 @@ void TakeColours(const Picture& colours, const Picture& result, Format format) {
     colours.SetRowInFormat(y, format, result.RowInFormat(y, format));
 }
 
+/// In the image, or in a new one.
+Picture Filtered(const Picture& picture, const FilterCommand& filter, const FilterOptions& options) {
+  const Picture colours = ColoursOf(picture);
+  const Picture result = filter.Run(colours, options);
+  if (!result) throw Failure(options.In, "it can't be filtered");
+  if (result == colours) return picture;
+  if (!picture.HasAlpha()) return result;
+  TakeColours(colours, result, WithoutAlpha(picture.ImageFormat()));
+  return picture;
+}
+
 int Filter(Session& session, const FilterCommand& filter, const FilterOptions& options) {
   Target target(options.Out);
   OpenedImage source(session, options.In);
@@ -317,23 +357,12 @@ int Filter(Session& session, const FilterCommand& filter, const FilterOptions& o
   RequireServed(filter, options.In, size.Of);
   const Format format = target.Storable(session, size.Of);
   target.Start(size.Width, size.Height);
-  StoreOptions stores = session.Stores;
-  stores.MemoryLimit /= filter.Pictures;
-  Picture picture = MakePictures(stores, {size})[0];
-  source.ReadInto(session, picture);
-  session.Bar.Begin("filtering");
-  Picture colours = ColoursOf(picture);
-  {
-    const PicturesLike made(stores);
-    Picture result = filter.Run(colours, options);
-    if (!result) throw Failure(options.In, "it can't be filtered");
-    if (result != colours && HasAlpha(size.Of))
-      TakeColours(colours, result, WithoutAlpha(size.Of));
-    else if (result != colours)
-      picture = std::move(result);
-  }
-  colours = Picture();
-  target.Write(session, picture, format, source.Upright);
+  const auto work = [&](const Picture& picture, const flow::Workplace& at) {
+    if (at.Stores.Kind == Store::Memory) return Filtered(picture, filter, options);
+    const PicturesLike made(at.Stores);
+    return Filtered(picture, filter, options);
+  };
+  target.Carry(session, source, ChainOf(filter.DependsOn(options), filter.Pictures, work), format);
   target.Commit();
   return Done;
 }

@@ -49,13 +49,6 @@ PictureSize ResultSize(const ScaleOptions& options, const ImageInfo& source, For
   return {std::max(1, int(std::lround(width))), std::max(1, int(std::lround(height))), format};
 }
 
-/// Scales by the way that the options name.
-bool ScaleInto(const Picture& dest, const Picture& source, const ScaleOptions& options) {
-  if (options.Fast) return dest.ScaleFast(source, dest.Width(), dest.Height());
-  return dest.ScaleMT(options.Threads, source, {}, Kernels.at(options.KernelName), dest.Width(),
-                      dest.Height());
-}
-
 int Scale(Session& session, const ScaleOptions& options) {
   if (options.Width == 0 && options.Height == 0 && options.Fit.empty() && options.Percent == 0)
     throw UsageFailure("scale: give --width, --height, --fit or --percent");
@@ -65,18 +58,22 @@ int Scale(Session& session, const ScaleOptions& options) {
   if (options.Fast && format == Format::CMYK) throw Failure(options.In, "--fast has no way for CMYK");
   const PictureSize size = ResultSize(options, source.Upright, format);
   target.Start(size.Width, size.Height);
-  auto pictures = MakePictures(session.Stores, {source.Size(), size});
-  source.ReadInto(session, pictures[0]);
-  session.Bar.Begin("scaling");
-  if (session.Bar.Shown()) {
-    Host::OnYield([&session] { session.Bar.Tick(); });
-    pictures[1].SetYieldTicks(6);
-  }
-  const bool scaled = ScaleInto(pictures[1], pictures[0], options);
-  Host::OnYield({});
-  if (!scaled) throw Failure(options.In, "it can't be scaled");
-  pictures[0] = Picture();
-  target.Write(session, pictures[1], format, source.Upright);
+  const auto scale = [&](const Picture& picture, const flow::Workplace& at) {
+    const Picture scaled = MakePictures(at.Stores, {size})[0];
+    if (session.Bar.Shown()) scaled.SetYieldTicks(6);
+    const bool done = options.Fast ? scaled.ScaleFast(picture, size.Width, size.Height)
+                                   : scaled.ScaleMT(at.Threads > 1 ? at.Threads : -1, picture, {},
+                                                    Kernels.at(options.KernelName), size.Width, size.Height);
+    if (!done) throw Failure(options.In, "it can't be scaled");
+    return scaled;
+  };
+  const auto reshape = [&](flow::Shape& shape) {
+    shape.Width = size.Width;
+    shape.Height = size.Height;
+    shape.Of = size.Of;
+  };
+  target.Carry(session, source, ChainOf({.Of = flow::Dependence::Kind::InOrder}, 2, scale, reshape), format,
+               options.Threads);
   target.Commit();
   return Done;
 }

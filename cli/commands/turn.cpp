@@ -23,11 +23,14 @@ int Mirror(Session& session, const TurnOptions& options) {
   const PictureSize size = source.Size();
   const Format format = target.Storable(session, size.Of);
   target.Start(size.Width, size.Height);
-  const Picture picture = MakePictures(session.Stores, {size})[0];
-  source.ReadInto(session, picture);
-  if (options.Horizontal) picture.HMirror();
-  if (options.Vertical) picture.VMirror();
-  target.Write(session, picture, format, source.Upright);
+  // Top and bottom change places only in a whole picture.
+  const auto kind = options.Vertical ? flow::Dependence::Kind::Whole : flow::Dependence::Kind::Bands;
+  const auto mirror = [&](const Picture& picture, const flow::Workplace&) {
+    if (options.Horizontal) picture.HMirror();
+    if (options.Vertical) picture.VMirror();
+    return picture;
+  };
+  target.Carry(session, source, ChainOf({.Of = kind}, 1, mirror), format);
   target.Commit();
   return Done;
 }

@@ -52,7 +52,7 @@ Shape Made::Result(const Shape& source) const {
 
 Bytes Result(const MadeFile& file, const Chain& chain, const RunOptions& options) {
   const OpenFile opened = file.Open();
-  const Shape result = ResultOf(ShapeOf(opened.Reader->Info()), chain);
+  const Shape result = ResultOf(ShapeOf(opened), chain);
   KeptRows rows(std::size_t(result.Width) * std::size_t(BytesPerPixel(result.Of)));
   files::Silence silence;
   Run(file.Open(), chain, result.Of, rows, options, silence);
