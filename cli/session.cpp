@@ -37,17 +37,22 @@ void AddStoreOptions(CLI::App& command, Session& session) {
       ->type_name("DIR");
 }
 
-void AddQualityOption(CLI::App& command, Session& session) {
+void AddWriteOptions(CLI::App& command, Session& session) {
   command
       .add_option("--quality", session.Writing.Quality,
                   "JPEG quality, 1 to 100, 90 by default; from 90 on colours keep their full resolution")
       ->type_name("N")
       ->check(CLI::Range(1, 100));
+  command
+      .add_option("--type", session.TypeName,
+                  "Type of the image that is written, like png; what the name ends in otherwise")
+      ->type_name("NAME");
 }
 
 OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
     : File(file),
-      Reader(OpenImage(file, {.MemoryLimit = session.Stores.MemoryLimit})),
+      Reader(OpenNamed(
+          file, {.MemoryLimit = session.Stores.MemoryLimit, .TempDirectory = session.Stores.TempDirectory})),
       Upright(files::Upright(Reader->Info())) {
   for (const std::string& note : Upright.Notes) session.Note(file, note);
 }
@@ -58,7 +63,8 @@ void OpenedImage::Limit(const Rect& part) {
   Upright.Height = part.Height;
 }
 
-Target::Target(const std::filesystem::path& file) : File(file), Type(TypeByExtension(file)) {}
+Target::Target(Session& session, const std::filesystem::path& file)
+    : File(file), Spool(session.Stores.TempDirectory), Type(TypeToWrite(file, session.TypeName)) {}
 Target::~Target() = default;
 
 Format Target::Storable(Session& session, Format pixels) const {
@@ -69,7 +75,7 @@ Format Target::Storable(Session& session, Format pixels) const {
 
 void Target::Start(std::int64_t width, std::int64_t height) {
   RequireStorableSize(File, Type, width, height);
-  Output = std::make_unique<OutputFile>(File);
+  Output = OutputNamed(File, Type, Spool);
 }
 
 std::unique_ptr<ImageWriter> Target::Writer(Session& session, Format format, ImageInfo info) {

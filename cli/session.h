@@ -7,6 +7,7 @@
 
 #include "failure.h"
 #include "image_file.h"
+#include "named.h"
 #include "pictures.h"
 #include "progress_bar.h"
 #include "run.h"
@@ -29,6 +30,8 @@ struct Session {
   bool Quiet = false;
   StoreOptions Stores;
   WriteOptions Writing;
+  /// Of images that are written; empty where their names tell it.
+  std::string TypeName;
   ProgressBar Bar;
   /// What the chosen command does; gives its exit code.
   std::function<int()> Work;
@@ -39,8 +42,8 @@ struct Session {
 
 /// -q, and the options of where pictures live.
 void AddStoreOptions(CLI::App& command, Session& session);
-/// --quality.
-void AddQualityOption(CLI::App& command, Session& session);
+/// --quality, --type.
+void AddWriteOptions(CLI::App& command, Session& session);
 
 /// An image file that is open, its notes told.
 struct OpenedImage {
@@ -62,7 +65,7 @@ struct OpenedImage {
 /// The file that a command writes. Made before the work, so that one that can't be written shows early.
 class Target {
  public:
-  explicit Target(const std::filesystem::path& file);
+  Target(Session& session, const std::filesystem::path& file);
   ~Target();
   /// What of `pixels` the file can hold; says so where alpha is lost.
   Format Storable(Session& session, Format pixels) const;
@@ -79,9 +82,9 @@ class Target {
  private:
   std::unique_ptr<ImageWriter> Writer(Session& session, Format format, ImageInfo info);
 
-  std::filesystem::path File;
+  std::filesystem::path File, Spool;
   const FileType& Type;
-  std::unique_ptr<OutputFile> Output;
+  std::unique_ptr<files::Output> Output;
 };
 
 /// An operation that a command puts together.

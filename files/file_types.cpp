@@ -5,7 +5,7 @@
 namespace picturezor::files {
 
 std::span<const FileType* const> FileTypes() {
-  static constexpr std::array all{&PNGType, &JPEGType, &TIFFType};
+  static constexpr std::array all{&PNGType, &JPEGType, &TIFFType, &PNMType};
   return all;
 }
 

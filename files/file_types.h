@@ -4,6 +4,7 @@
 namespace picturezor::files {
 
 // Each stands in the file of its name under types/.
-extern const FileType PNGType, JPEGType, TIFFType;
+extern const FileType PNGType, JPEGType, TIFFType, PNMType, WebPType, JPEGXLType, AVIFType, HEICType,
+    JPEG2000Type, SlideType;
 
 }

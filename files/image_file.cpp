@@ -1,12 +1,10 @@
 #include "image_file.h"
 
 #include <algorithm>
-#include <cerrno>
-#include <cstdio>
 #include <cstring>
 
 #include "failure.h"
-#include "stream.h"
+#include "temporary_files.h"
 
 namespace picturezor::files {
 
@@ -20,6 +18,19 @@ std::string Listed(const std::vector<std::string>& words) {
   for (std::size_t i = 0; i < words.size(); ++i)
     text += (i == 0 ? "" : i + 1 == words.size() ? " or " : ", ") + words[i];
   return text;
+}
+
+/// Null where no type has the ending, and then all that there are.
+const FileType* TypeOfEnding(std::string extension, std::vector<std::string>& endings) {
+  std::ranges::transform(extension, extension.begin(),
+                         [](unsigned char c) { return c >= 'A' && c <= 'Z' ? c + 32 : c; });
+  for (const FileType* type : FileTypes())
+    for (const std::string_view ending : type->Extensions) {
+      if (!type->Create) continue;
+      if (extension == ending) return type;
+      endings.emplace_back(ending);
+    }
+  return nullptr;
 }
 
 }
@@ -36,37 +47,40 @@ void ImageWriter::WriteRows(const std::uint8_t* rows, std::ptrdiff_t stride, std
   for (std::int32_t i = 0; i < count; ++i, rows += stride) WriteRow(rows);
 }
 
-std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, const ReadOptions& options) {
-  Bytes start(64);
-  {
-    const Stream stream = OpenForReading(file);
-    start.resize(std::fread(start.data(), 1, start.size(), stream.get()));
-    if (std::ferror(stream.get())) throw Failure(file, std::strerror(errno));
-  }
-  if (start.empty()) throw Failure(file, "the file is empty");
+std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& options) {
+  const Bytes start = input.Start(64);
+  if (start.empty()) throw Failure(input.Name(), "the file is empty");
   std::vector<std::string> names;
   for (const FileType* type : FileTypes()) {
-    if (type->Begins(start)) return type->Open(file, options);
+    if (type->Begins(start)) {
+      if (type->InOrder || input.Seekable()) return type->Open(input, options);
+      return type->Open(
+          input.Spooled(options.TempDirectory.empty() ? DefaultTempDirectory() : options.TempDirectory),
+          options);
+    }
     names.emplace_back(type->Name);
   }
-  throw Failure(file, "not a " + Listed(names) + " image");
+  throw Failure(input.Name(), "not a " + Listed(names) + " image");
 }
 
 const FileType& TypeByExtension(const std::filesystem::path& file) {
-  std::string extension = file.extension().string();
-  std::ranges::transform(extension, extension.begin(),
-                         [](unsigned char c) { return c >= 'A' && c <= 'Z' ? c + 32 : c; });
   std::vector<std::string> endings;
-  for (const FileType* type : FileTypes())
-    for (const std::string_view ending : type->Extensions) {
-      if (extension == ending) return *type;
-      endings.emplace_back(ending);
-    }
+  if (const FileType* type = TypeOfEnding(file.extension().string(), endings)) return *type;
   throw UsageFailure(file, "the name must end in " + Listed(endings));
 }
 
+const FileType& TypeByName(const std::string& name) {
+  std::vector<std::string> endings;
+  if (const FileType* type = TypeOfEnding('.' + name, endings)) return *type;
+  for (std::string& ending : endings) ending.erase(0, 1);
+  throw UsageFailure("--type: " + name + " isn't " + Listed(endings));
+}
+
 Format StorableFormat(const std::filesystem::path& file, const FileType& type, Format pixels) {
-  for (const Format format : {pixels, WithoutAlpha(pixels)})
+  // Gray is RGB without loss.
+  const Format colour = WithoutAlpha(pixels);
+  const Format wider = colour == Format::G ? Format::RGB : colour;
+  for (const Format format : {pixels, HasAlpha(pixels) ? WithAlpha(wider) : wider, colour, wider})
     if (std::ranges::find(type.Holds, format) != type.Holds.end()) return format;
   throw Failure(file, std::string(type.Name) + " can't hold " + Describe(pixels) + "; write a .tif or .jpg");
 }
@@ -125,6 +139,12 @@ void RequirePlausible(const std::filesystem::path& file, std::int64_t width, std
   if (double(width) * double(height) > double(fileSize) * pixelsPerByte)
     throw Failure(file,
                   "corrupt: it claims " + size + ", which " + std::to_string(fileSize) + " bytes can't hold");
+}
+
+void RequirePage(const Input& input, const ReadOptions& options, int pages) {
+  if (options.Page < 0 || options.Page >= pages)
+    throw Failure(input.Name(), pages == 1 ? std::string("there is only one picture in it")
+                                           : "there are " + std::to_string(pages) + " pictures in it");
 }
 
 void RequireWithinLimit(const std::filesystem::path& file, std::int64_t bytes, std::int64_t memoryLimit,

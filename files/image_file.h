@@ -8,6 +8,7 @@
 #include <string_view>
 #include <vector>
 
+#include "input.h"
 #include "picturezor/picture.h"
 
 namespace picturezor::files {
@@ -17,6 +18,11 @@ struct FileType;
 /// Pixels per inch.
 struct Resolution {
   double X = 0, Y = 0;
+};
+
+/// Pixels across and down.
+struct Extent {
+  std::int32_t Width = 0, Height = 0;
 };
 
 /// What goes with the pixels of a file.
@@ -32,6 +38,12 @@ struct ImageInfo {
   int Orientation = 1;
   Bytes Profile;
   std::optional<Resolution> Density;
+  /// Notes of cameras and programs: EXIF from its byte order mark on, XMP as text, IPTC as its records.
+  Bytes Exif, Xmp, Iptc;
+  /// Pictures in the file; ReadOptions chooses one.
+  int Pages = 1;
+  /// Smaller copies of the picture in the file, largest first.
+  std::vector<Extent> Levels;
   /// What the reader had to change or leave out.
   std::vector<std::string> Notes;
 };
@@ -81,6 +93,9 @@ struct ReadOptions {
   /// Threads that may decode beside the caller's; 0 stands for one a processor. The pixels don't depend on
   /// it.
   int Threads = 0;
+  /// Where bytes go that come through a pipe, and belong to a type that doesn't read in order;
+  /// DefaultTempDirectory where it is empty.
+  std::filesystem::path TempDirectory = {};
   /// Which picture of a file with several, from 0 on.
   int Page = 0;
 };
@@ -109,14 +124,18 @@ struct FileType {
   const char* Name;
   /// Endings of names, in small letters, the usual one first.
   std::vector<std::string_view> Extensions;
-  /// The pixel formats that its files hold, and the most pixels in each direction.
+  /// The pixel formats that can be written, and the most pixels in each direction.
   std::vector<Format> Holds;
   std::int64_t MostEdge;
   /// Told by the first bytes of a file, as many of them as there are, 64 at most.
   bool (*Begins)(std::span<const std::uint8_t> start);
-  std::unique_ptr<ImageReader> (*Open)(const std::filesystem::path& file, const ReadOptions& options);
+  /// Whether files are read in order, from the first byte to the last, and written so; others get an input
+  /// and an output in which they can move about.
+  bool InOrder;
+  std::unique_ptr<ImageReader> (*Open)(const Input& input, const ReadOptions& options);
   /// Starts a file at the beginning of `descriptor`, which stays the caller's. Of `info` the size, pixels,
-  /// profile and density count; the orientation is written as upright. `target` names it in failures.
+  /// profile and density count, and of the notes those that the type has a place for; the orientation is
+  /// written as upright. `target` names it in failures. Null where a type can only be read.
   std::unique_ptr<ImageWriter> (*Create)(int descriptor, const std::filesystem::path& target,
                                          const ImageInfo& info, const WriteOptions& options);
 };
@@ -124,15 +143,17 @@ struct FileType {
 /// All types. What they begin with is tried in this order.
 std::span<const FileType* const> FileTypes();
 
-/// Opens an image file of any of the types, told by its first bytes. A file whose size can't hold the pixels
-/// that it claims is refused before anything of their size is allocated.
-std::unique_ptr<ImageReader> OpenImage(const std::filesystem::path& file, const ReadOptions& options);
+/// Opens an image of any of the types, told by its first bytes. One whose size can't hold the pixels that it
+/// claims is refused before anything of their size is allocated.
+std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& options);
 
 /// Reads a part of a picture, which must lie within it. What lies below the part isn't looked at.
 std::unique_ptr<ImageReader> PartOf(std::unique_ptr<ImageReader> reader, const Rect& part);
 
 /// The type that the file's extension stands for. Throws UsageFailure.
 const FileType& TypeByExtension(const std::filesystem::path& file);
+/// The type of a name like "png", "JPEG" or "tif". Throws UsageFailure.
+const FileType& TypeByName(const std::string& name);
 /// The format nearest to `pixels` that a file of the type holds: JPEG has no alpha. Throws Failure where
 /// there is none, as for CMYK in PNG, or where the type can't hold a picture of that size.
 Format StorableFormat(const std::filesystem::path& file, const FileType& type, Format pixels);
@@ -156,6 +177,8 @@ void RequirePlausible(const std::filesystem::path& file, std::int64_t width, std
                       std::int64_t fileSize, double pixelsPerByte);
 void RequireWithinLimit(const std::filesystem::path& file, std::int64_t bytes, std::int64_t memoryLimit,
                         const std::string& what);
+/// Refuses a page that isn't there.
+void RequirePage(const Input& input, const ReadOptions& options, int pages);
 bool StartsWith(std::span<const std::uint8_t> bytes, std::string_view magic);
 
 }

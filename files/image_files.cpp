@@ -19,16 +19,39 @@ Format FileFormatOf(const std::filesystem::path& file, const Picture& picture) {
   return picture.HasAlpha() ? WithAlpha(colours) : colours;
 }
 
-}
-
-Picture LoadImage(const std::filesystem::path& file) {
+Picture Load(const Input& input) {
   const StoreOptions stores{Store::Auto, DefaultMemoryLimit(), DefaultTempDirectory()};
-  const auto reader = OpenImage(file, {.MemoryLimit = stores.MemoryLimit});
+  const auto reader = OpenImage(input, {.MemoryLimit = stores.MemoryLimit});
   const ImageInfo upright = Upright(reader->Info());
   Picture picture = MakePictures(stores, {{upright.Width, upright.Height, upright.Pixels}})[0];
   Silence silent;
   ReadInto(picture, *reader, silent);
   return picture;
+}
+
+void Save(Output& output, const FileType& type, const Picture& picture) {
+  const std::filesystem::path& file = output.Target();
+  ImageInfo info;
+  info.Width = picture.Width();
+  info.Height = picture.Height();
+  info.Pixels = StorableFormat(file, type, FileFormatOf(file, picture));
+  RequireStorableSize(file, type, info.Width, info.Height);
+  const auto writer = type.Create(output.Descriptor(), file, info, {});
+  for (std::int32_t y = 0; y < info.Height; ++y) {
+    const Bytes row = picture.RowInFormat(y, info.Pixels);
+    if (row.empty()) throw Failure(file, "a row of the picture can't be reached");
+    writer->WriteRow(row.data());
+  }
+  writer->Finish();
+  output.Commit();
+}
+
+}
+
+Picture LoadImage(const std::filesystem::path& file) { return Load(file); }
+
+Picture DecodeImage(std::span<const std::uint8_t> bytes, const std::string& name) {
+  return Load(Input::Memory(bytes, name));
 }
 
 HostPicture LoadHostPicture(const std::filesystem::path& file) {
@@ -40,20 +63,15 @@ HostPicture LoadHostPicture(const std::filesystem::path& file) {
 void SaveImage(const std::filesystem::path& file, const Picture& picture) {
   if (!picture.Valid()) throw Failure(file, "there is no picture to write");
   const FileType& type = TypeByExtension(file);
-  ImageInfo info;
-  info.Width = picture.Width();
-  info.Height = picture.Height();
-  info.Pixels = StorableFormat(file, type, FileFormatOf(file, picture));
-  RequireStorableSize(file, type, info.Width, info.Height);
   OutputFile output(file);
-  const auto writer = type.Create(output.Descriptor(), file, info, {});
-  for (std::int32_t y = 0; y < info.Height; ++y) {
-    const Bytes row = picture.RowInFormat(y, info.Pixels);
-    if (row.empty()) throw Failure(file, "a row of the picture can't be reached");
-    writer->WriteRow(row.data());
-  }
-  writer->Finish();
-  output.Commit();
+  Save(output, type, picture);
+}
+
+Bytes EncodeImage(const std::string& type, const Picture& picture) {
+  if (!picture.Valid()) throw Failure("there is no picture to write");
+  OutputBytes output(type);
+  Save(output, TypeByName(type), picture);
+  return std::move(output.Result);
 }
 
 void SaveImage(const std::filesystem::path& file, const HostPicture& picture) {

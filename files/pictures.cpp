@@ -12,7 +12,6 @@
 #include <numeric>
 
 #include "failure.h"
-#include "temporary_files.h"
 
 namespace picturezor::files {
 
@@ -145,11 +144,6 @@ void ReadUpright(const Picture& picture, ImageReader& reader, Progress& progress
 }
 
 std::int64_t DefaultMemoryLimit() { return FreeMemory() / 2; }
-
-std::filesystem::path DefaultTempDirectory() {
-  const char* named = std::getenv("TMPDIR");
-  return named && *named ? named : "/var/tmp";
-}
 
 std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector<PictureSize>& sizes) {
   // The module keeps pictures in memory below this, and needs this many rows for a mapped one.

@@ -6,6 +6,7 @@
 #include "image_file.h"
 #include "picturezor/picture.h"
 #include "progress.h"
+#include "temporary_files.h"
 
 namespace picturezor::files {
 
@@ -21,8 +22,6 @@ struct StoreOptions {
 
 /// Half of the memory that is free.
 std::int64_t DefaultMemoryLimit();
-/// $TMPDIR, or /var/tmp, which lies on a disk where /tmp may lie in memory.
-std::filesystem::path DefaultTempDirectory();
 
 struct PictureSize {
   std::int32_t Width = 0, Height = 0;

@@ -1,5 +1,4 @@
 #pragma once
-#include <cstdint>
 #include <cstdio>
 #include <filesystem>
 #include <memory>
@@ -11,9 +10,6 @@ struct CloseStream {
 };
 using Stream = std::unique_ptr<std::FILE, CloseStream>;
 
-/// A regular file, open; throws Failure with the reason otherwise.
-Stream OpenForReading(const std::filesystem::path& file);
-std::int64_t SizeOf(const Stream& stream);
 /// A stream on a copy of a descriptor, which stays the caller's.
 Stream StreamOn(int descriptor, const std::filesystem::path& target);
 /// Writes out what is buffered. Throws Failure.

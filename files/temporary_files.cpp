@@ -107,7 +107,12 @@ void KeepOnDeath(const std::filesystem::path& file) {
     if (entry.Used && path == entry.Path) entry.Used = false;
 }
 
-OutputFile::OutputFile(const std::filesystem::path& target) : Name(target), Real(target) {
+std::filesystem::path DefaultTempDirectory() {
+  const char* named = std::getenv("TMPDIR");
+  return named && *named ? named : "/var/tmp";
+}
+
+OutputFile::OutputFile(const std::filesystem::path& target) : Output(target), Real(target) {
   std::error_code failed;
   // What a link points to is replaced, not the link.
   if (std::filesystem::is_symlink(target, failed)) {
@@ -134,7 +139,6 @@ OutputFile::OutputFile(const std::filesystem::path& target) : Name(target), Real
 }
 
 OutputFile::~OutputFile() {
-  if (File >= 0) close(File);
   if (Temporary.empty()) return;
   unlink(Temporary.c_str());
   KeepOnDeath(Temporary);
@@ -146,6 +150,25 @@ void OutputFile::Commit() {
   if (rename(Temporary.c_str(), Real.c_str()) != 0) throw Failure(Name, std::strerror(errno));
   KeepOnDeath(Temporary);
   Temporary.clear();
+}
+
+int NamelessFile(const std::filesystem::path& directory) {
+  std::string name = (directory / "picturezor-XXXXXX").string();
+  const SignalsHeldBack held;
+  const int file = mkostemp(name.data(), O_CLOEXEC);
+  if (file < 0)
+    throw Failure(directory, std::string("no temporary file can be made there: ") + std::strerror(errno));
+  unlink(name.c_str());
+  return file;
+}
+
+void WriteAll(int descriptor, std::span<const std::uint8_t> bytes, const std::filesystem::path& target) {
+  while (!bytes.empty()) {
+    const ssize_t count = write(descriptor, bytes.data(), bytes.size());
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) throw Failure(target, std::strerror(errno));
+    bytes = bytes.subspan(std::size_t(count));
+  }
 }
 
 PrivateDirectory::PrivateDirectory(const std::filesystem::path& parent) {

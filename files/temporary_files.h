@@ -1,6 +1,9 @@
 #pragma once
+#include <cstdint>
 #include <filesystem>
-#include <string>
+#include <span>
+
+#include "output.h"
 
 namespace picturezor::files {
 
@@ -11,23 +14,26 @@ void CatchSignals(int exitCode);
 void RemoveOnDeath(const std::filesystem::path& file, bool directory = false);
 void KeepOnDeath(const std::filesystem::path& file);
 
+/// $TMPDIR, or /var/tmp, which lies on a disk where /tmp may lie in memory.
+std::filesystem::path DefaultTempDirectory();
+
 /// A file that comes to stand under its target's name when it is complete, and not before. Until then it is
 /// beside it under a name of its own, and goes away with this object.
-class OutputFile {
+class OutputFile final : public Output {
  public:
   /// Throws Failure where the target can't be written.
   explicit OutputFile(const std::filesystem::path& target);
-  OutputFile(const OutputFile&) = delete;
-  ~OutputFile();
-
-  int Descriptor() const { return File; }
-  const std::filesystem::path& Target() const { return Name; }
-  void Commit();
+  ~OutputFile() override;
+  void Commit() override;
 
  private:
-  std::filesystem::path Name, Real, Temporary;
-  int File = -1;
+  std::filesystem::path Real, Temporary;
 };
+
+/// A new file in a directory, without a name, to read and write. Throws Failure where there can't be one.
+int NamelessFile(const std::filesystem::path& directory);
+/// Throws Failure with the target's name.
+void WriteAll(int descriptor, std::span<const std::uint8_t> bytes, const std::filesystem::path& target);
 
 /// A directory that only this process sees, gone with this object.
 class PrivateDirectory {

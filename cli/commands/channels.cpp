@@ -27,14 +27,14 @@ int Channels(Session& session, const ChannelsOptions& options) {
   const auto place = options.Pattern.find("{}");
   if (place == std::string::npos)
     throw UsageFailure("-o: " + options.Pattern + " has no {} for the name of the channel");
-  TypeByExtension(options.Pattern);
+  TypeToWrite(options.Pattern, session.TypeName);
   OpenedImage source(session, options.In);
   const PictureSize size = source.Size();
   std::vector<std::unique_ptr<Target>> targets;
   for (const std::string& name : ChannelNames(size.Of)) {
     std::string file = options.Pattern;
     file.replace(place, 2, name);
-    targets.push_back(std::make_unique<Target>(file));
+    targets.push_back(std::make_unique<Target>(session, file));
     targets.back()->Start(size.Width, size.Height);
   }
   const auto pictures = MakePictures(session.Stores, {size});
@@ -59,7 +59,7 @@ void AddChannels(CLI::App& app, Session& session) {
   command->add_option("-o,--output", options->Pattern, "Images to write; {} becomes the name of the channel")
       ->required()
       ->type_name("PATTERN");
-  AddQualityOption(*command, session);
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
   command->callback(
       [&session, options] { session.Work = [&session, options] { return Channels(session, *options); }; });

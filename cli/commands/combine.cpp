@@ -36,7 +36,7 @@ int Combine(Session& session, const CombineCommand& command) {
   how.UseColours = true;
   if (!command.Fore.empty()) how.ForeColour = ParseColor("--fore", command.Fore);
   if (!command.MaskColour.empty()) how.MaskColour = ParseColor("--mask-colour", command.MaskColour);
-  Target target(command.Out);
+  Target target(session, command.Out);
   OpenedImage base(session, command.Base), overlay(session, command.Overlay);
   std::vector<PictureSize> sizes{base.Size(), overlay.Size()};
 
@@ -109,7 +109,7 @@ void AddCombine(CLI::App& app, Session& session) {
   command->add_option("-o,--output", options->Out, "Image to write; the name's ending says its type")
       ->required()
       ->type_name("OUT");
-  AddQualityOption(*command, session);
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
   command->callback(
       [&session, options] { session.Work = [&session, options] { return Combine(session, *options); }; });

@@ -20,7 +20,7 @@ const std::map<std::string, Format> Formats{{"gray", Format::G},
                                             {"cmyk", Format::CMYK}};
 
 int Convert(Session& session, const ConvertOptions& options) {
-  Target target(options.Out);
+  Target target(session, options.Out);
   OpenedImage source(session, options.In);
   const Format from = source.Upright.Pixels;
   const Format asked = options.FormatName.empty() ? from : Formats.at(options.FormatName);
@@ -55,7 +55,7 @@ void AddConvert(CLI::App& app, Session& session) {
                    "gray, graya, rgb, rgba or cmyk; as in the input by default")
       ->type_name("NAME")
       ->check(CLI::IsMember(Formats));
-  AddQualityOption(*command, session);
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
   command->callback(
       [&session, options] { session.Work = [&session, options] { return Convert(session, *options); }; });

@@ -16,7 +16,7 @@ int Crop(Session& session, const CropOptions& options) {
   const auto numbers = ParseNumbers("--rect", options.Rectangle, ',', 4);
   const std::int64_t x = numbers[0], y = numbers[1], width = numbers[2], height = numbers[3];
   if (width < 1 || height < 1) throw UsageFailure("--rect: a size is 1 or more");
-  Target target(options.Out);
+  Target target(session, options.Out);
   OpenedImage source(session, options.In);
   const PictureSize size = source.Size();
   if (x < 0 || y < 0 || x > size.Width - width || y > size.Height - height)
@@ -43,7 +43,7 @@ void AddCrop(CLI::App& app, Session& session) {
   command->add_option("-o,--output", options->Out, "Image to write; the name's ending says its type")
       ->required()
       ->type_name("OUT");
-  AddQualityOption(*command, session);
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
   command->callback(
       [&session, options] { session.Work = [&session, options] { return Crop(session, *options); }; });

@@ -351,7 +351,7 @@ Picture Filtered(const Picture& picture, const FilterCommand& filter, const Filt
 }
 
 int Filter(Session& session, const FilterCommand& filter, const FilterOptions& options) {
-  Target target(options.Out);
+  Target target(session, options.Out);
   OpenedImage source(session, options.In);
   const PictureSize size = source.Size();
   RequireServed(filter, options.In, size.Of);
@@ -380,7 +380,7 @@ void AddOne(CLI::App& parent, Session& session, const FilterCommand& filter) {
   command->add_option("-o,--output", options->Out, "Image to write; the name's ending says its type")
       ->required()
       ->type_name("OUT");
-  AddQualityOption(*command, session);
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
   command->callback([&session, &filter, options] {
     session.Work = [&session, &filter, options] { return Filter(session, filter, *options); };

@@ -16,7 +16,8 @@ std::string ProfileText(const Bytes& profile) {
 }
 
 int Info(Session& session, const std::filesystem::path& file) {
-  const auto reader = OpenImage(file, {.MemoryLimit = session.Stores.MemoryLimit});
+  const auto reader = OpenNamed(
+      file, {.MemoryLimit = session.Stores.MemoryLimit, .TempDirectory = session.Stores.TempDirectory});
   const ImageInfo& stored = reader->Info();
   const ImageInfo upright = Upright(stored);
   std::printf("file:        %s\n", file.c_str());

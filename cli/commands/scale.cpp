@@ -52,7 +52,7 @@ PictureSize ResultSize(const ScaleOptions& options, const ImageInfo& source, For
 int Scale(Session& session, const ScaleOptions& options) {
   if (options.Width == 0 && options.Height == 0 && options.Fit.empty() && options.Percent == 0)
     throw UsageFailure("scale: give --width, --height, --fit or --percent");
-  Target target(options.Out);
+  Target target(session, options.Out);
   OpenedImage source(session, options.In);
   const Format format = target.Storable(session, source.Upright.Pixels);
   if (options.Fast && format == Format::CMYK) throw Failure(options.In, "--fast has no way for CMYK");
@@ -124,7 +124,7 @@ void AddScale(CLI::App& app, Session& session) {
       ->check(CLI::Range(0, 32));
   command->add_flag("--fast", options->Fast, "Take the nearest pixels: quick and rough, without a kernel")
       ->excludes(kernel);
-  AddQualityOption(*command, session);
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
   command->callback(
       [&session, options] { session.Work = [&session, options] { return Scale(session, *options); }; });

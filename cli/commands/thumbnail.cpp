@@ -39,7 +39,7 @@ void MakeThumbnail(Session& session, const path& in, const path& out, std::int32
   OpenedImage image(session, in);
   const double most = std::min(side, std::max(image.Upright.Width, image.Upright.Height));
   const PictureSize size = SizeWithin(image.Size(), most, most);
-  Target target(out);
+  Target target(session, out);
   target.Start(size.Width, size.Height);
   const HostPicture small = SmallPicture(session, image, size.Width, size.Height);
   const Format format = small.Mask() ? Format::RGBA : Format::RGB;

@@ -18,7 +18,7 @@ struct TurnOptions {
 };
 
 int Mirror(Session& session, const TurnOptions& options) {
-  Target target(options.Out);
+  Target target(session, options.Out);
   OpenedImage source(session, options.In);
   const PictureSize size = source.Size();
   const Format format = target.Storable(session, size.Of);
@@ -45,7 +45,7 @@ Picture::Background BackgroundOf(const TurnOptions& options) {
 
 int Rotate(Session& session, const TurnOptions& options) {
   const Picture::Background background = BackgroundOf(options);
-  Target target(options.Out);
+  Target target(session, options.Out);
   OpenedImage source(session, options.In);
   const PictureSize size = source.Size();
   const Format format = target.Storable(session, size.Of);
@@ -87,7 +87,7 @@ void AddMirror(CLI::App& app, Session& session) {
   AddFiles(*command, *options);
   command->add_flag("--horizontal", options->Horizontal, "Left for right");
   command->add_flag("--vertical", options->Vertical, "Top for bottom");
-  AddQualityOption(*command, session);
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
   command->callback([&session, options] {
     if (!options->Horizontal && !options->Vertical)
@@ -118,7 +118,7 @@ void AddRotate(CLI::App& app, Session& session) {
   command
       ->add_option("--background", options->Background, "Colour of the corners, as ffffff; black by default")
       ->type_name("COLOUR");
-  AddQualityOption(*command, session);
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
   command->callback(
       [&session, options] { session.Work = [&session, options] { return Rotate(session, *options); }; });

@@ -70,8 +70,8 @@ struct JPEGErrors {
 
 class JPEGReader : public ImageReader {
  public:
-  JPEGReader(const std::filesystem::path& file, std::int64_t memoryLimit)
-      : Path(file), File(OpenForReading(file)) {
+  JPEGReader(const Input& input, std::int64_t memoryLimit)
+      : Path(input.Name()), FileSize(input.Size()), File(input.Open()) {
     Jpeg.err = &Errors.Manager;
     try {
       Try([&] { jpeg_create_decompress(&Jpeg); });
@@ -129,7 +129,7 @@ class JPEGReader : public ImageReader {
       jpeg_save_markers(&Jpeg, ProfileMarker, 0xFFFF);
       jpeg_read_header(&Jpeg, TRUE);
     });
-    RequirePlausible(Path, Jpeg.image_width, Jpeg.image_height, SizeOf(File),
+    RequirePlausible(Path, Jpeg.image_width, Jpeg.image_height, FileSize,
                      Jpeg.arith_code ? 64 * MostPixelsPerByte : MostPixelsPerByte);
     About.Width = std::int32_t(Jpeg.image_width);
     About.Height = std::int32_t(Jpeg.image_height);
@@ -178,6 +178,7 @@ class JPEGReader : public ImageReader {
   }
 
   std::filesystem::path Path;
+  std::int64_t FileSize;
   Stream File;
   JPEGErrors Errors;
   jpeg_decompress_struct Jpeg{};
@@ -281,8 +282,10 @@ const FileType JPEGType{
     .Holds = {Format::G, Format::RGB, Format::CMYK},
     .MostEdge = 65500,
     .Begins = [](std::span<const std::uint8_t> start) { return StartsWith(start, "\xFF\xD8"); },
-    .Open = [](const std::filesystem::path& file, const ReadOptions& options)
-        -> std::unique_ptr<ImageReader> { return std::make_unique<JPEGReader>(file, options.MemoryLimit); },
+    .InOrder = true,
+    .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
+      return std::make_unique<JPEGReader>(input, options.MemoryLimit);
+    },
     .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
                  const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
       return std::make_unique<JPEGWriter>(descriptor, target, info, options);

@@ -53,13 +53,13 @@ class PNGFile {
 
 class PNGReader : public ImageReader, PNGFile {
  public:
-  PNGReader(const std::filesystem::path& file, std::int64_t memoryLimit)
-      : PNGFile(file), File(OpenForReading(file)) {
+  PNGReader(const Input& input, std::int64_t memoryLimit)
+      : PNGFile(input.Name()), FileSize(input.Size()), File(input.Open()) {
     Png = png_create_read_struct(PNG_LIBPNG_VER_STRING, static_cast<PNGFile*>(this), OnError, OnWarning);
     Header = Png ? png_create_info_struct(Png) : nullptr;
     if (!Header) {
       png_destroy_read_struct(&Png, nullptr, nullptr);
-      throw Failure(file, "not enough memory");
+      throw Failure(Path, "not enough memory");
     }
     try {
       Start(memoryLimit);
@@ -102,7 +102,7 @@ class PNGReader : public ImageReader, PNGFile {
     const int type = png_get_color_type(Png, Header);
     About.Bits = png_get_bit_depth(Png, Header);
     const int bits = About.Bits * png_get_channels(Png, Header);
-    RequirePlausible(Path, width, height, SizeOf(File), MostInflation * 8 / bits);
+    RequirePlausible(Path, width, height, FileSize, MostInflation * 8 / bits);
     About.Width = std::int32_t(width);
     About.Height = std::int32_t(height);
     if (About.Bits == 16) About.Notes.push_back("16 bits a sample reduced to 8");
@@ -145,6 +145,7 @@ class PNGReader : public ImageReader, PNGFile {
     });
   }
 
+  std::int64_t FileSize;
   Stream File;
   Bytes Whole;
   std::size_t NextRow = 0;
@@ -231,8 +232,10 @@ const FileType PNGType{
     .Holds = {Format::G, Format::GA, Format::RGB, Format::RGBA},
     .MostEdge = INT32_MAX,
     .Begins = [](std::span<const std::uint8_t> start) { return StartsWith(start, "\x89PNG"); },
-    .Open = [](const std::filesystem::path& file, const ReadOptions& options)
-        -> std::unique_ptr<ImageReader> { return std::make_unique<PNGReader>(file, options.MemoryLimit); },
+    .InOrder = true,
+    .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
+      return std::make_unique<PNGReader>(input, options.MemoryLimit);
+    },
     .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
                  const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
       return std::make_unique<PNGWriter>(descriptor, target, info, options);

@@ -1,13 +1,9 @@
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <cerrno>
 #include <cstring>
 
 #include "exif.h"
 #include "failure.h"
 #include "file_types.h"
-#include "stream.h"
 #include "tiff_handle.h"
 #include "tiff_writer.h"
 
@@ -57,14 +53,14 @@ class PlaneSource {
 /// Strips of any compression. libtiff holds one strip as it is compressed.
 class DecodedStrips : public PlaneSource {
  public:
-  DecodedStrips(const std::filesystem::path& file, int plane, std::int64_t memoryLimit)
-      : File(TIFFHandle::Open(file, memoryLimit)), Plane(std::uint16_t(plane)) {
+  DecodedStrips(const Input& input, int plane, std::int64_t memoryLimit)
+      : File(TIFFHandle::Open(input, memoryLimit)), Plane(std::uint16_t(plane)) {
     if (File->Get<std::uint16_t>(TIFFTAG_COMPRESSION, 1) == COMPRESSION_JPEG)
       File->Set(TIFFTAG_JPEGCOLORMODE, JPEGCOLORMODE_RGB);
     File->ReadingPixels();
     // By the number of its samples a pixel, a row can be far larger than the picture made of it.
     const std::uint64_t rowBytes = TIFFScanlineSize64(*File);
-    RequireWithinLimit(file, std::int64_t(rowBytes), memoryLimit, "a row of this TIFF");
+    RequireWithinLimit(input.Name(), std::int64_t(rowBytes), memoryLimit, "a row of this TIFF");
     Line.resize(std::size_t(rowBytes));
   }
 
@@ -82,8 +78,8 @@ class DecodedStrips : public PlaneSource {
 /// Strips without compression are read row by row, however large they are.
 class PlainStrips : public PlaneSource {
  public:
-  PlainStrips(const std::filesystem::path& path, const TIFFHandle& file, const Layout& layout, int plane)
-      : Path(path), File(OpenForReading(path)), Header(file), Of(layout) {
+  PlainStrips(const Input& input, const TIFFHandle& file, const Layout& layout, int plane)
+      : From(input), Header(file), Of(layout) {
     RowsPerStrip =
         std::min<std::int64_t>(file.Get<std::uint32_t>(TIFFTAG_ROWSPERSTRIP, UINT32_MAX), layout.Height);
     FirstStrip = plane * ((layout.Height + RowsPerStrip - 1) / RowsPerStrip);
@@ -97,15 +93,10 @@ class PlainStrips : public PlaneSource {
     const std::uint64_t start = TIFFGetStrileOffset(Header, strip);
     const std::uint64_t size = TIFFGetStrileByteCount(Header, strip);
     Header.Check();
-    if (at + Line.size() > size || start > std::uint64_t(SizeOf(File)))
-      throw Failure(Path, "corrupt TIFF: a strip is too short for its rows");
-    for (std::size_t done = 0; done < Line.size();) {
-      const ssize_t got =
-          pread(fileno(File.get()), Line.data() + done, Line.size() - done, off_t(start + at + done));
-      if (got < 0) throw Failure(Path, std::strerror(errno));
-      if (got == 0) throw Failure(Path, "the TIFF file is cut off");
-      done += std::size_t(got);
-    }
+    if (at + Line.size() > size || start > std::uint64_t(From.Size()))
+      throw Failure(From.Name(), "corrupt TIFF: a strip is too short for its rows");
+    if (From.ReadAt(std::int64_t(start + at), Line) < Line.size())
+      throw Failure(From.Name(), "the TIFF file is cut off");
     if (Reversed) TIFFReverseBits(Line.data(), tmsize_t(Line.size()));
     if (Of.Bits == 16 && TIFFIsByteSwapped(Header))
       TIFFSwabArrayOfShort(reinterpret_cast<std::uint16_t*>(Line.data()), tmsize_t(Line.size() / 2));
@@ -113,8 +104,7 @@ class PlainStrips : public PlaneSource {
   }
 
  private:
-  std::filesystem::path Path;
-  Stream File;
+  Input From;
   const TIFFHandle& Header;
   Layout Of;
   std::int64_t RowsPerStrip, FirstStrip;
@@ -125,25 +115,25 @@ class PlainStrips : public PlaneSource {
 /// A row of tiles at a time.
 class TileBand : public PlaneSource {
  public:
-  TileBand(const std::filesystem::path& path, const Layout& layout, int plane, std::int64_t memoryLimit)
-      : File(TIFFHandle::Open(path, memoryLimit)), Of(layout), Plane(std::uint16_t(plane)) {
+  TileBand(const Input& input, const Layout& layout, int plane, std::int64_t memoryLimit)
+      : File(TIFFHandle::Open(input, memoryLimit)), Of(layout), Plane(std::uint16_t(plane)) {
     if (layout.Compression == COMPRESSION_JPEG) File->Set(TIFFTAG_JPEGCOLORMODE, JPEGCOLORMODE_RGB);
     File->ReadingPixels();
     TileWidth = File->Get<std::uint32_t>(TIFFTAG_TILEWIDTH, 0);
     TileHeight = File->Get<std::uint32_t>(TIFFTAG_TILELENGTH, 0);
     if (TileWidth < 1 || TileHeight < 1 || layout.Bits * layout.Interleaved() * TileWidth % 8 != 0)
-      throw Failure(path, "corrupt TIFF: tiles of a size that can't be");
+      throw Failure(input.Name(), "corrupt TIFF: tiles of a size that can't be");
     TileRow = layout.RowBytes(TileWidth);
     Across = (layout.Width + TileWidth - 1) / TileWidth;
     // Short pictures don't fill their tiles.
     const std::int64_t rows = std::min(TileHeight, layout.Height);
-    RequireWithinLimit(path, std::int64_t(TileRow) * (Across * rows + TileHeight), memoryLimit,
+    RequireWithinLimit(input.Name(), std::int64_t(TileRow) * (Across * rows + TileHeight), memoryLimit,
                        "a TIFF with tiles of this size");
     BandRow = TileRow * std::size_t(Across);
     Band.resize(BandRow * std::size_t(rows));
     Tile.resize(std::size_t(TIFFTileSize64(*File)));
     if (Tile.size() < TileRow * std::size_t(TileHeight))
-      throw Failure(path, "corrupt TIFF: tiles of a size that can't be");
+      throw Failure(input.Name(), "corrupt TIFF: tiles of a size that can't be");
   }
 
   const std::uint8_t* Row(std::int64_t y) override {
@@ -178,12 +168,11 @@ class TileBand : public PlaneSource {
 
 class TIFFReader : public ImageReader {
  public:
-  TIFFReader(const std::filesystem::path& file, std::int64_t memoryLimit)
-      : Path(file), File(TIFFHandle::Open(file, memoryLimit)) {
-    const std::int64_t fileSize = SizeOf(OpenForReading(file));
-    RequireWholeDirectory(fileSize);
+  TIFFReader(const Input& input, std::int64_t memoryLimit)
+      : From(input), Path(input.Name()), File(TIFFHandle::Open(input, memoryLimit)) {
+    RequireWholeDirectory();
     ReadLayout();
-    RequirePlausible(file, Of.Width, Of.Height, fileSize,
+    RequirePlausible(Path, Of.Width, Of.Height, input.Size(),
                      MostPixelsPerByte(Of.Compression, Of.Width, double(Of.Bits) * Of.Samples));
     About.Width = std::int32_t(Of.Width);
     About.Height = std::int32_t(Of.Height);
@@ -195,11 +184,11 @@ class TIFFReader : public ImageReader {
       if (Of.Planar && plane >= Of.Colours && plane != Of.AlphaAt)
         Sources.emplace_back();
       else if (Of.Tiled)
-        Sources.push_back(std::make_unique<TileBand>(file, Of, plane, memoryLimit));
+        Sources.push_back(std::make_unique<TileBand>(input, Of, plane, memoryLimit));
       else if (Of.Compression == COMPRESSION_NONE)
-        Sources.push_back(std::make_unique<PlainStrips>(file, *File, Of, plane));
+        Sources.push_back(std::make_unique<PlainStrips>(input, *File, Of, plane));
       else
-        Sources.push_back(std::make_unique<DecodedStrips>(file, plane, memoryLimit));
+        Sources.push_back(std::make_unique<DecodedStrips>(input, plane, memoryLimit));
     }
     Lines.resize(Sources.size());
   }
@@ -244,17 +233,16 @@ class TIFFReader : public ImageReader {
 
  private:
   /// libtiff overlooks a cut in the last bytes of a directory.
-  void RequireWholeDirectory(std::int64_t fileSize) const {
+  void RequireWholeDirectory() const {
     const std::uint64_t at = TIFFCurrentDirOffset(*File);
     const bool big = TIFFIsBigTIFF(*File), bigEnd = TIFFIsBigEndian(*File);
     std::uint8_t count[8] = {};
     const std::size_t size = big ? 8 : 2;
-    const Stream stream = OpenForReading(Path);
-    if (pread(fileno(stream.get()), count, size, off_t(at)) != ssize_t(size))
+    if (From.ReadAt(std::int64_t(at), std::span(count).first(size)) != size)
       throw Failure(Path, "the TIFF file is cut off");
     std::uint64_t entries = 0;
     for (std::size_t i = 0; i < size; ++i) entries = entries << 8 | count[bigEnd ? i : size - 1 - i];
-    if (at + size + entries * (big ? 20 : 12) + (big ? 8 : 4) > std::uint64_t(fileSize))
+    if (at + size + entries * (big ? 20 : 12) + (big ? 8 : 4) > std::uint64_t(From.Size()))
       throw Failure(Path, "the TIFF file is cut off");
   }
 
@@ -384,6 +372,7 @@ class TIFFReader : public ImageReader {
     }
   }
 
+  Input From;
   std::filesystem::path Path;
   std::unique_ptr<TIFFHandle> File;
   Layout Of;
@@ -407,8 +396,10 @@ const FileType TIFFType{
             if (StartsWith(start, magic)) return true;
           return false;
         },
-    .Open = [](const std::filesystem::path& file, const ReadOptions& options)
-        -> std::unique_ptr<ImageReader> { return std::make_unique<TIFFReader>(file, options.MemoryLimit); },
+    .InOrder = false,
+    .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
+      return std::make_unique<TIFFReader>(input, options.MemoryLimit);
+    },
     .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
                  const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
       return WriteTIFF(descriptor, target, info, options);

@@ -44,15 +44,38 @@ int TIFFHandle::OnWarning(TIFF* file, void* user, const char* module, const char
   return 1;
 }
 
-std::unique_ptr<TIFFHandle> TIFFHandle::Open(const std::filesystem::path& file, std::int64_t memoryLimit) {
-  std::unique_ptr<TIFFHandle> handle(new TIFFHandle(file));
+tmsize_t TIFFHandle::OnRead(thandle_t user, void* into, tmsize_t size) {
+  auto& self = *static_cast<TIFFHandle*>(user);
+  try {
+    const std::size_t got = self.From->ReadAt(self.At, {static_cast<std::uint8_t*>(into), std::size_t(size)});
+    self.At += std::int64_t(got);
+    return tmsize_t(got);
+  } catch (const Failure&) {
+    return -1;
+  }
+}
+
+toff_t TIFFHandle::OnSeek(thandle_t user, toff_t offset, int whence) {
+  auto& self = *static_cast<TIFFHandle*>(user);
+  const std::int64_t from = whence == SEEK_SET ? 0 : whence == SEEK_CUR ? self.At : self.From->Size();
+  self.At = std::int64_t(std::uint64_t(from) + offset);
+  return toff_t(self.At);
+}
+
+std::unique_ptr<TIFFHandle> TIFFHandle::Open(const Input& input, std::int64_t memoryLimit) {
+  std::unique_ptr<TIFFHandle> handle(new TIFFHandle(input.Name()));
+  handle->From = input;
   TIFFOpenOptions* options = TIFFOpenOptionsAlloc();
   // Directories and tables of strips need some room however small the limit is.
   TIFFOpenOptionsSetMaxSingleMemAlloc(options, std::max<std::int64_t>(memoryLimit, 64 << 20));
   TIFFOpenOptionsSetErrorHandlerExtR(options, OnError, handle.get());
   TIFFOpenOptionsSetWarningHandlerExtR(options, OnWarning, handle.get());
+  const auto write = [](thandle_t, void*, tmsize_t) -> tmsize_t { return -1; };
+  const auto finish = [](thandle_t) { return 0; };
+  const auto size = [](thandle_t self) { return toff_t(static_cast<TIFFHandle*>(self)->From->Size()); };
   // Not mapped: the pages would count as memory in use.
-  handle->File = TIFFOpenExt(file.c_str(), "rm", options);
+  handle->File = TIFFClientOpenExt(input.Name().c_str(), "rm", handle.get(), OnRead, write, OnSeek, finish,
+                                   size, nullptr, nullptr, options);
   TIFFOpenOptionsFree(options);
   handle->Check(handle->File);
   return handle;

@@ -4,8 +4,10 @@
 #include <cstdint>
 #include <filesystem>
 #include <memory>
+#include <optional>
 #include <string>
 
+#include "input.h"
 #include "picturezor/picture.h"
 
 namespace picturezor::files {
@@ -14,7 +16,7 @@ namespace picturezor::files {
 class TIFFHandle {
  public:
   /// Allocations of libtiff above `memoryLimit` fail.
-  static std::unique_ptr<TIFFHandle> Open(const std::filesystem::path& file, std::int64_t memoryLimit);
+  static std::unique_ptr<TIFFHandle> Open(const Input& input, std::int64_t memoryLimit);
   /// Into an open file, whose descriptor stays the caller's.
   static std::unique_ptr<TIFFHandle> Create(int descriptor, const std::filesystem::path& target, bool big);
   /// What would be written to a file is appended to `written`, whatever the place.
@@ -42,10 +44,14 @@ class TIFFHandle {
 
  private:
   explicit TIFFHandle(std::filesystem::path path) : Path(std::move(path)) {}
+  static tmsize_t OnRead(thandle_t self, void* into, tmsize_t size);
+  static toff_t OnSeek(thandle_t self, toff_t offset, int whence);
   static int OnError(TIFF*, void* self, const char*, const char* format, va_list arguments);
   static int OnWarning(TIFF*, void* self, const char* module, const char* format, va_list arguments);
 
   std::filesystem::path Path;
+  std::optional<Input> From;
+  std::int64_t At = 0;
   TIFF* File = nullptr;
   bool Strict = false, Writing = false;
   std::string Report;

@@ -1,22 +1,28 @@
 #pragma once
 #include <filesystem>
+#include <span>
+#include <string>
 
 #include "picturezor/picture.h"
 
 namespace picturezor {
 
-// PNG, JPEG and TIFF files for programs that embed the library. What can't be done throws std::runtime_error
-// with one line that names the file and the reason.
+// Image files for programs that embed the library; docs/files.md lists their types. What can't be done throws
+// std::runtime_error with one line that names the file and the reason.
 
 /// Reads an image file upright, as gray, RGB or CMYK, with alpha where the file has it. The picture lives in
 /// memory, or in a nameless temporary file where it would take more than half of what is free.
 Picture LoadImage(const std::filesystem::path& file);
-/// The same as a picture of the host, with a mask where the file has alpha.
+/// The same of a file whose bytes are in memory. `name` stands for it in failures.
+Picture DecodeImage(std::span<const std::uint8_t> bytes, const std::string& name = "image");
+/// As a picture of the host, with a mask where the file has alpha.
 HostPicture LoadHostPicture(const std::filesystem::path& file);
 
 /// Writes a picture of any format with colours; the name's ending says the type of the file. JPEG has no
 /// alpha. The file stands under its name when it is complete, and not before.
 void SaveImage(const std::filesystem::path& file, const Picture& picture);
+/// The bytes of such a file, of a type named by the ending of its files: "png", "jpg", "tif".
+Bytes EncodeImage(const std::string& type, const Picture& picture);
 /// A mask becomes alpha.
 void SaveImage(const std::filesystem::path& file, const HostPicture& picture);
 

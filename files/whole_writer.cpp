@@ -1,0 +1,24 @@
+#include "whole_writer.h"
+
+#include "failure.h"
+#include "temporary_files.h"
+
+namespace picturezor::files {
+
+WholeWriter::WholeWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info,
+                         const WriteOptions& options)
+    : Path(target), About(info), Options(options), File(descriptor) {
+  Pixels.reserve(std::size_t(info.Width) * std::size_t(info.Height) * std::size_t(ChannelsOf(info.Pixels)));
+}
+
+void WholeWriter::WriteRow(const std::uint8_t* row) {
+  Pixels.insert(Pixels.end(), row, row + std::size_t(About.Width) * std::size_t(ChannelsOf(About.Pixels)));
+}
+
+void WholeWriter::Finish() { Encode(Pixels.data()); }
+
+void WholeWriter::Put(std::span<const std::uint8_t> bytes) { WriteAll(File, bytes, Path); }
+
+void WholeWriter::Fail(const std::string& reason) const { throw Failure(Path, reason); }
+
+}
