@@ -62,16 +62,22 @@ class DecodedStrips : public PlaneSource {
     const std::uint64_t rowBytes = TIFFScanlineSize64(*File);
     RequireWithinLimit(input.Name(), std::int64_t(rowBytes), memoryLimit, "a row of this TIFF");
     Line.resize(std::size_t(rowBytes));
+    RowsPerStrip = std::max<std::uint32_t>(1, File->Get<std::uint32_t>(TIFFTAG_ROWSPERSTRIP, UINT32_MAX));
   }
 
   const std::uint8_t* Row(std::int64_t y) override {
-    File->Check(TIFFReadScanline(*File, Line.data(), std::uint32_t(y), Plane) == 1);
+    // The rows of a strip come one after the other.
+    const std::int64_t strip = y - y % RowsPerStrip;
+    for (std::int64_t row = Next >= strip && Next <= y ? Next : strip; row <= y; ++row)
+      File->Check(TIFFReadScanline(*File, Line.data(), std::uint32_t(row), Plane) == 1);
+    Next = y + 1;
     return Line.data();
   }
 
  private:
   std::unique_ptr<TIFFHandle> File;
   std::uint16_t Plane;
+  std::int64_t RowsPerStrip, Next = 0;
   Bytes Line;
 };
 
