@@ -49,11 +49,17 @@ void AddWriteOptions(CLI::App& command, Session& session) {
       ->type_name("NAME");
 }
 
+namespace {
+
+std::unique_ptr<ImageReader> OpenFor(const Session& session, const std::filesystem::path& file) {
+  return OpenNamed(
+      file, {.MemoryLimit = session.Stores.MemoryLimit, .TempDirectory = session.Stores.TempDirectory});
+}
+
+}
+
 OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
-    : File(file),
-      Reader(OpenNamed(
-          file, {.MemoryLimit = session.Stores.MemoryLimit, .TempDirectory = session.Stores.TempDirectory})),
-      Upright(files::Upright(Reader->Info())) {
+    : File(file), Reader(OpenFor(session, file)), Upright(files::Upright(Reader->Info())) {
   for (const std::string& note : Upright.Notes) session.Note(file, note);
 }
 
@@ -100,9 +106,9 @@ void Target::Carry(Session& session, OpenedImage& source, const flow::Chain& cha
   info.Height = result.Height;
   info.Density = result.Density;
   const auto writer = Writer(session, format, std::move(info));
-  const auto again = [file = source.File, limit = session.Stores.MemoryLimit] {
-    return OpenImage(file, {.MemoryLimit = limit});
-  };
+  std::function<std::unique_ptr<ImageReader>()> again;
+  // Standard input comes once.
+  if (source.File != "-") again = [&session, file = source.File] { return OpenFor(session, file); };
   flow::Run({std::move(source.Reader), again, source.Part}, chain, format, *writer, {session.Stores, threads},
             session.Bar);
 }
