@@ -150,7 +150,7 @@ class TIFFWriter : public ImageWriter {
       below.Row = Picture(std::int32_t(shape.Width), 1, shape.Pixels);
     }
     const auto bytes = std::size_t(width) * std::size_t(ChannelsOf(above.Pixels));
-    below.Pair.SetRow(below.Rows, {row, bytes});
+    below.Pair.SetRowInFormat(below.Rows, shape.Pixels, {row, bytes});
     if (++below.Rows < 2) return;
     below.Rows = 0;
     if (!below.Row.Scale(below.Pair, {}, Kernel::Box, std::int32_t(shape.Width), 1))
