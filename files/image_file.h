@@ -108,7 +108,7 @@ struct WriteOptions {
   /// How TIFF packs its samples. Types with one way only refuse others than Usual.
   Compression Packing = Compression::Usual;
   /// The effort of deflate, 0 to 9.
-  std::optional<int> Level = {};
+  std::optional<int> Level{};
   /// For TIFF: the edge of square tiles, a multiple of 16; 0 makes strips.
   std::int32_t Tile = 0;
   /// For TIFF: offsets of 64 bits however small the file is; smaller copies of the picture, each half as
