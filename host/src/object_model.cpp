@@ -83,20 +83,26 @@ void Register(zor::ClassRecord* record) {
   record->InstanceOffsetSlot = InstanceOffset;
   for (std::size_t i = 0; i < record->EventCount; ++i) record->Events[i].EventWord = i + 1;
 
+  // What can be wrong with a record comes first, so that a wrong one leaves no class behind.
+  auto methods = EntriesOf(record->Methods, record->MethodCount);
+  auto sharedMethods = EntriesOf(record->SharedMethods, record->SharedMethodCount);
+  decltype(Class::Constants) constants;
+  for (std::size_t i = 0; i < record->ConstantCount; ++i) {
+    const auto [name, value] = ParseConstant(record->Constants[i].Declaration);
+    constants[Lower(name)] = value;
+  }
+
   Class& added = TheRuntime().Classes[Lower(record->ClassName)];
   added.Name = record->ClassName;
   added.DataSize = record->DataSize;
   added.Destructor = reinterpret_cast<void (*)(void*)>(record->DestructorFunction);
   added.Record = record;
-  added.Methods = EntriesOf(record->Methods, record->MethodCount);
-  added.SharedMethods = EntriesOf(record->SharedMethods, record->SharedMethodCount);
+  added.Methods = std::move(methods);
+  added.SharedMethods = std::move(sharedMethods);
+  added.Constants = std::move(constants);
   for (std::size_t i = 0; i < record->PropertyCount; ++i) {
     const zor::PropertyRecord& row = record->Properties[i];
     added.Properties.push_back({&row, row.Name, row.Type, Lower(row.Name), Lower(row.Type)});
-  }
-  for (std::size_t i = 0; i < record->ConstantCount; ++i) {
-    const auto [name, value] = ParseConstant(record->Constants[i].Declaration);
-    added.Constants[Lower(name)] = value;
   }
 }
 
