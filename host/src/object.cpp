@@ -45,10 +45,8 @@ MemoryBlock::MemoryBlock(std::size_t size) : Object(Adopt(NewBlock(Bytes(size)))
 MemoryBlock::MemoryBlock(std::span<const std::uint8_t> bytes)
     : Object(Adopt(NewBlock(Bytes(bytes.begin(), bytes.end())))) {}
 
-MemoryBlock MemoryBlock::Over(std::span<std::uint8_t> memory) {
-  MemoryBlock block{Adopt(NewBlock(static_cast<void*>(memory.data())))};
-  block.Limit(memory.size());
-  return block;
+MemoryBlock MemoryBlock::Over(std::span<std::uint8_t> memory, std::shared_ptr<void> owner) {
+  return MemoryBlock(Object(Adopt(NewBlock(memory, std::move(owner)))));
 }
 
 MemoryBlock MemoryBlock::OfPages(std::size_t size) {

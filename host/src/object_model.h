@@ -133,17 +133,21 @@ struct BlockPayload : Payload {
   Pages OwnPages{0};
   std::uint8_t* Start;
   std::size_t Size;
+  std::shared_ptr<void> Owner;
   explicit BlockPayload(Bytes bytes) : Own(std::move(bytes)), Start(Own.data()), Size(Own.size()) {}
   explicit BlockPayload(Pages pages)
       : OwnPages(std::move(pages)), Start(OwnPages.Start), Size(OwnPages.Size) {}
   /// Over memory of the module, whose size isn't known.
   explicit BlockPayload(void* start) : Start(static_cast<std::uint8_t*>(start)), Size(0) {}
+  /// Over somebody's memory, which `owner` keeps.
+  BlockPayload(std::span<std::uint8_t> memory, std::shared_ptr<void> owner)
+      : Start(memory.data()), Size(memory.size()), Owner(std::move(owner)) {}
 };
 /// A new block, of bytes or over an address.
-template <class Of>
-void* NewBlock(Of&& of) {
+template <class... Of>
+void* NewBlock(Of&&... of) {
   static const Class& blocks = ClassNamed("MemoryBlock");
-  return NewObject(blocks, std::make_unique<BlockPayload>(std::forward<Of>(of)));
+  return NewObject(blocks, std::make_unique<BlockPayload>(std::forward<Of>(of)...));
 }
 
 struct FilePayload : Payload {

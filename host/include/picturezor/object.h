@@ -2,6 +2,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
+#include <memory>
 #include <span>
 #include <string>
 #include <utility>
@@ -47,8 +48,9 @@ class MemoryBlock : public Object {
   /// A zeroed block.
   explicit MemoryBlock(std::size_t size);
   explicit MemoryBlock(std::span<const std::uint8_t> bytes);
-  /// Over somebody else's memory, which outlives it.
-  static MemoryBlock Over(std::span<std::uint8_t> memory);
+  /// Over somebody else's memory, which outlives it, or which `owner` keeps until nothing uses the block any
+  /// more; it is let go of on whatever thread that is.
+  static MemoryBlock Over(std::span<std::uint8_t> memory, std::shared_ptr<void> owner = {});
   /// A zeroed block of any size, which takes memory where it is touched, a page at a time. Throws
   /// std::bad_alloc for what is plainly more than there is.
   static MemoryBlock OfPages(std::size_t size);
