@@ -45,6 +45,8 @@ std::int64_t RoundedUp(std::int64_t bytes, std::int64_t unit) { return (bytes + 
 struct ArrivingPicture::Cursor {
   /// The chunk that it fills next, and the furthest one that a reader wanted of it.
   std::int64_t Next = 0, Wanted = -1;
+  /// The chunk that it is filling, or -1.
+  std::int64_t Filling = -1;
   /// When a reader was last here.
   std::int64_t Used = 0;
   /// The chunks filled, in order, whose slots are the cursor's.
@@ -144,15 +146,18 @@ void ArrivingPicture::OnTouch(std::uintptr_t address) {
 }
 
 ArrivingPicture::Cursor& ArrivingPicture::CursorFor(std::int64_t chunk) {
+  const bool filled = Chunks[std::size_t(chunk)].Slot >= 0;
   Cursor* idle = Cursors.front().get();
   for (const auto& cursor : Cursors) {
-    const std::int64_t first = cursor->Filled.empty() ? cursor->Next : cursor->Filled.front();
+    // It may have passed by the chunk, which another one had filled, and has given up since.
     const bool soon = Cursors.size() == 1 || chunk <= cursor->Next + Ahead;
-    if (chunk >= first && soon && cursor->Wanted >= 0) return *cursor;
+    const bool comes = chunk == cursor->Filling || (chunk >= cursor->Next && soon && cursor->Wanted >= 0);
+    if (filled ? std::ranges::find(cursor->Filled, chunk) != cursor->Filled.end() : comes) return *cursor;
     if (cursor->Used < idle->Used) idle = cursor.get();
   }
   Hide(*idle, ChunkCount());
   idle->StartsOver = true;
+  idle->Filling = -1;
   idle->Next = idle->Wanted = chunk;
   return *idle;
 }
@@ -191,7 +196,7 @@ void ArrivingPicture::Run(Cursor& cursor) {
     if (GaveUp) return;
     Hide(cursor, cursor.Wanted - Behind);
     const bool startsOver = std::exchange(cursor.StartsOver, false);
-    const std::int64_t chunk = cursor.Next++;
+    const std::int64_t chunk = cursor.Filling = cursor.Next++;
     const std::int32_t slot = cursor.FreeSlots.back();
     cursor.FreeSlots.pop_back();
     lock.unlock();
@@ -203,6 +208,7 @@ void ArrivingPicture::Run(Cursor& cursor) {
       return;
     }
     lock.lock();
+    cursor.Filling = -1;
     if (cursor.StartsOver || Chunks[std::size_t(chunk)].Slot >= 0) {
       cursor.FreeSlots.push_back(slot);
       continue;
