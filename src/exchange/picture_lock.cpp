@@ -1,5 +1,6 @@
 #include "exchange/picture_lock.h"
 
+#include <atomic>
 #include <cstring>
 #include <utility>
 
@@ -11,8 +12,8 @@ namespace {
 
 constexpr std::int32_t MostPixels = 32767;
 
-// Which kind of pictures this process has met; set once and for good.
-bool GWorldPathSeen = false, RowTablePathSeen = false;
+// Which kind of pictures this process has met; set once and for good, by whichever thread comes first.
+std::atomic<bool> GWorldPathSeen = false, RowTablePathSeen = false;
 
 template <class T>
 T ReadAt(const void* record, std::size_t offset) {
