@@ -1,7 +1,6 @@
 #include <unistd.h>
 
 #include <CLI/CLI.hpp>
-#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <new>
@@ -13,11 +12,14 @@ namespace picturezor::cli {
 
 namespace {
 
-int Complain(Session& session, std::string text, int code) {
-  session.Bar.Clear();
-  std::ranges::replace(text, '\n', ' ');
-  std::fprintf(stderr, "picturezor: %s\n", text.c_str());
-  return code;
+/// Where the right usage of the chosen command stands.
+std::string See(const CLI::App& app) {
+  std::string command;
+  for (const CLI::App* chosen = &app; !chosen->get_subcommands().empty();) {
+    chosen = chosen->get_subcommands().front();
+    command += " " + chosen->get_name();
+  }
+  return " (see picturezor" + command + " --help)";
 }
 
 int Run(int count, char** arguments) {
@@ -34,35 +36,32 @@ int Run(int count, char** arguments) {
       "error); 3 the command line is wrong.\n\n"
       "The module PictureZOR.so is looked for beside the program, then in the library directory beside\n"
       "it; the environment variable PICTUREZOR_MODULE names another one.");
-  for (const auto add : {AddScale, AddConvert, AddCrop, AddCombine, AddChannels, AddFilter, AddMirror,
-                         AddRotate, AddCompare, AddInfo, AddThumbnail, AddShow})
+  for (const auto add :
+       {AddSteps, AddRun, AddChannels, AddCompare, AddInfo, AddThumbnail, AddShow, AddCompletion})
     add(app, session);
   try {
     app.parse(count, arguments);
   } catch (const CLI::Success& help) {
     return app.exit(help);
   } catch (const CLI::ParseError& error) {
-    std::string command;
-    for (const CLI::App* chosen : app.get_subcommands()) command = " " + chosen->get_name();
-    return Complain(session, std::string(error.what()) + " (see picturezor" + command + " --help)",
-                    WrongUsage);
+    return session.Complain(error.what() + See(app), WrongUsage);
   } catch (const Failure& failure) {
-    return Complain(session, failure.what(), WrongUsage);
+    return session.Complain(failure.what(), WrongUsage);
   }
   try {
     if (!session.Quiet) session.Bar.Enable();
     CatchSignals(Failed);
-    Host::Load();
+    if (session.NeedsModule) Host::Load();
     const int code = session.Work();
     session.Bar.Clear();
-    if (std::fflush(stdout) != 0) return Complain(session, "standard output can't be written", Failed);
+    if (std::fflush(stdout) != 0) return session.Complain("standard output can't be written", Failed);
     return code;
   } catch (const UsageFailure& failure) {
-    return Complain(session, failure.what(), WrongUsage);
+    return session.Complain(failure.what() + See(app), WrongUsage);
   } catch (const std::bad_alloc&) {
-    return Complain(session, "not enough memory", Failed);
+    return session.Complain("not enough memory", Failed);
   } catch (const std::exception& failure) {
-    return Complain(session, failure.what(), Failed);
+    return session.Complain(failure.what(), Failed);
   }
 }
 

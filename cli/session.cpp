@@ -1,17 +1,28 @@
 #include "session.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <charconv>
 #include <cmath>
 #include <cstdio>
 #include <map>
 
+#include "begin.h"
+
 namespace picturezor::cli {
 
 void Session::Note(const std::filesystem::path& file, const std::string& text) {
   if (Quiet) return;
+  const std::lock_guard lock(Told);
   Bar.Clear();
   std::fprintf(stderr, "picturezor: %s: note: %s\n", file.c_str(), text.c_str());
+}
+
+int Session::Complain(std::string text, ExitCode code) {
+  Bar.Clear();
+  std::ranges::replace(text, '\n', ' ');
+  std::fprintf(stderr, "picturezor: %s\n", text.c_str());
+  return code;
 }
 
 void AddStoreOptions(CLI::App& command, Session& session) {
@@ -37,36 +48,62 @@ void AddStoreOptions(CLI::App& command, Session& session) {
       ->type_name("DIR");
 }
 
+namespace {
+
+const std::map<std::string, Compression> Packings{
+    {"none", Compression::None}, {"lzw", Compression::LZW},   {"deflate", Compression::Deflate},
+    {"zstd", Compression::Zstd}, {"jpeg", Compression::JPEG}, {"webp", Compression::WebP}};
+
+/// "9", "zstd", or both with a comma between them.
+void SetCompression(WriteOptions& writing, const std::string& text) {
+  if (const std::size_t comma = text.find(','); comma != text.npos) {
+    SetCompression(writing, text.substr(0, comma));
+    return SetCompression(writing, text.substr(comma + 1));
+  }
+  if (const auto packing = Packings.find(text); packing != Packings.end())
+    writing.Packing = packing->second;
+  else if (text.size() == 1 && text[0] >= '0' && text[0] <= '9')
+    writing.Level = text[0] - '0';
+  else
+    throw UsageFailure("--compression: " + text + " isn't 0 to 9, none, lzw, deflate, zstd, jpeg or webp");
+}
+
+}
+
 void AddWriteOptions(CLI::App& command, Session& session) {
-  command
-      .add_option("--quality", session.Writing.Quality,
-                  "JPEG quality, 1 to 100, 90 by default; from 90 on colours keep their full resolution")
-      ->type_name("N")
-      ->check(CLI::Range(1, 100));
+  WriteOptions& writing = session.Writing;
   command
       .add_option("--type", session.TypeName,
                   "Type of the image that is written, like png; what the name ends in otherwise")
       ->type_name("NAME");
+  command
+      .add_option("--quality", writing.Quality,
+                  "JPEG quality, 1 to 100, 90 by default; from 90 on colours keep their full resolution")
+      ->type_name("N")
+      ->check(CLI::Range(1, 100));
+  command
+      .add_option_function<std::string>(
+          "--compression", [&writing](const std::string& text) { SetCompression(writing, text); },
+          "How hard PNG, or deflate and zstd in TIFF, try: 0 to 9. For TIFF also the way: none, lzw,\n"
+          "deflate, zstd, jpeg or webp; lzw by default. Both may be given: --compression zstd,9")
+      ->type_name("N|NAME");
+  command.add_option("--tile", writing.Tile, "Square tiles in TIFF, of this edge, a multiple of 16")
+      ->type_name("N")
+      ->check(CLI::Range(16, 1 << 14));
+  command.add_flag("--bigtiff", writing.Big, "TIFF with offsets of 64 bits, however small it is");
+  command.add_flag("--pyramid", writing.Pyramid,
+                   "TIFF with smaller copies of the picture, each half as large as the one before");
 }
-
-namespace {
 
 std::unique_ptr<ImageReader> OpenFor(const Session& session, const std::filesystem::path& file) {
-  return OpenNamed(
-      file, {.MemoryLimit = session.Stores.MemoryLimit, .TempDirectory = session.Stores.TempDirectory});
-}
-
+  return OpenNamed(file, {.MemoryLimit = session.Stores.MemoryLimit,
+                          .Threads = session.Threads,
+                          .TempDirectory = session.Stores.TempDirectory});
 }
 
 OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
     : File(file), Reader(OpenFor(session, file)), Upright(files::Upright(Reader->Info())) {
   for (const std::string& note : Upright.Notes) session.Note(file, note);
-}
-
-void OpenedImage::Limit(const Rect& part) {
-  Part = Stored(part, Reader->Info());
-  Upright.Width = part.Width;
-  Upright.Height = part.Height;
 }
 
 Target::Target(Session& session, const std::filesystem::path& file)
@@ -84,49 +121,40 @@ void Target::Start(std::int64_t width, std::int64_t height) {
   Output = OutputNamed(File, Type, Spool);
 }
 
-std::unique_ptr<ImageWriter> Target::Writer(Session& session, Format format, ImageInfo info) {
+std::unique_ptr<ImageWriter> Target::Writer(const Session& session, Format format, ImageInfo info,
+                                            int threads) {
   info.Pixels = format;
   if (!ProfileFits(info.Profile, format)) info.Profile.clear();
-  return Type.Create(Output->Descriptor(), File, info, session.Writing);
+  WriteOptions options = session.Writing;
+  options.Threads = threads;
+  return Type.Create(Output->Descriptor(), File, info, options);
 }
 
 void Target::Write(Session& session, const Picture& picture, Format format, ImageInfo info) {
   info.Width = picture.Width();
   info.Height = picture.Height();
-  const auto writer = Writer(session, format, std::move(info));
+  const auto writer = Writer(session, format, std::move(info), session.Threads);
   WriteFrom(picture, *writer, format, session.Bar);
   writer->Finish();
 }
 
-void Target::Carry(Session& session, OpenedImage& source, const flow::Chain& chain, Format format,
-                   int threads) {
+void Target::Carry(Session& session, OpenedImage& source, flow::Chain chain, Format format, int threads,
+                   Progress& progress) {
   ImageInfo info = source.Upright;
-  const flow::Shape result = flow::ResultOf({info.Width, info.Height, info.Pixels, info.Density}, chain);
+  const flow::Shape result = flow::ResultOf(source.Shape(), chain);
   info.Width = result.Width;
   info.Height = result.Height;
   info.Density = result.Density;
-  const auto writer = Writer(session, format, std::move(info));
-  std::function<std::unique_ptr<ImageReader>()> again;
+  Start(result.Width, result.Height);
+  const auto writer = Writer(session, format, std::move(info), threads);
+  flow::OpenFile file{std::move(source.Reader), {}};
   // Standard input comes once.
-  if (source.File != "-") again = [&session, file = source.File] { return OpenFor(session, file); };
-  flow::Run({std::move(source.Reader), again, source.Part}, chain, format, *writer, {session.Stores, threads},
-            session.Bar);
+  if (source.File != "-") file.Again = [&session, name = source.File] { return OpenFor(session, name); };
+  flow::LetReaderBegin(file, chain);
+  flow::Run(std::move(file), chain, format, *writer, {session.Stores, threads}, progress);
 }
 
 void Target::Commit() { Output->Commit(); }
-
-flow::Shape Work::Result(const flow::Shape& source) const {
-  flow::Shape result = source;
-  if (Reshape) Reshape(result);
-  return result;
-}
-
-flow::Chain ChainOf(flow::Dependence needs, int pictures, Work::Function function,
-                    std::function<void(flow::Shape&)> reshape) {
-  flow::Chain chain;
-  chain.push_back(std::make_unique<Work>(needs, pictures, std::move(function), std::move(reshape)));
-  return chain;
-}
 
 std::int64_t ParseBytes(const std::string& text) {
   double number = 0;
@@ -145,35 +173,6 @@ std::int64_t ParseBytes(const std::string& text) {
   if (failed != std::errc() || rest != end || !(bytes >= 1) || bytes > 1e18)
     throw UsageFailure("--memory-limit: " + text + " isn't a size like 256M or 2G");
   return std::int64_t(bytes);
-}
-
-std::vector<std::int64_t> ParseNumbers(const std::string& option, const std::string& text, char between,
-                                       std::size_t count) {
-  std::vector<std::int64_t> numbers;
-  const char *at = text.data(), *end = at + text.size();
-  while (numbers.size() < count) {
-    std::int64_t number = 0;
-    const auto [rest, failed] = std::from_chars(at, end, number);
-    if (failed != std::errc()) break;
-    numbers.push_back(number);
-    at = rest;
-    if (at == end || *at != between) break;
-    ++at;
-  }
-  if (numbers.size() != count || at != end)
-    throw UsageFailure(option + ": " + text + " isn't " + std::to_string(count) + " whole numbers with '" +
-                       between + "' between them");
-  return numbers;
-}
-
-Color ParseColor(const std::string& option, const std::string& text) {
-  const std::string digits = text.starts_with('#') ? text.substr(1) : text;
-  std::uint32_t colour = 0;
-  const char* end = digits.data() + digits.size();
-  const auto [rest, failed] = std::from_chars(digits.data(), end, colour, 16);
-  if (failed != std::errc() || rest != end || digits.size() != 6)
-    throw UsageFailure(option + ": " + text + " isn't a colour like ff8000");
-  return {std::uint8_t(colour >> 16), std::uint8_t(colour >> 8), std::uint8_t(colour)};
 }
 
 }

@@ -11,6 +11,7 @@
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
+#include <mutex>
 #include <utility>
 
 #include "failure.h"
@@ -25,7 +26,9 @@ struct Doomed {
   bool Directory = false;
   char Path[PATH_MAX] = {};
 };
-std::array<Doomed, 16> TheDoomed;
+std::array<Doomed, 64> TheDoomed;
+/// Several threads may take entries.
+std::mutex Taking;
 static_assert(std::atomic<bool>::is_always_lock_free);
 
 /// Files stand behind the directory that they are in.
@@ -92,6 +95,7 @@ void CatchSignals(int exitCode) {
 void RemoveOnDeath(const std::filesystem::path& file, bool directory) {
   const std::string path = std::filesystem::absolute(file).string();
   if (path.size() >= PATH_MAX) return;
+  const std::lock_guard lock(Taking);
   for (Doomed& entry : TheDoomed)
     if (!entry.Used) {
       std::strcpy(entry.Path, path.c_str());
@@ -103,6 +107,7 @@ void RemoveOnDeath(const std::filesystem::path& file, bool directory) {
 
 void KeepOnDeath(const std::filesystem::path& file) {
   const std::string path = std::filesystem::absolute(file).string();
+  const std::lock_guard lock(Taking);
   for (Doomed& entry : TheDoomed)
     if (entry.Used && path == entry.Path) entry.Used = false;
 }

@@ -1,5 +1,6 @@
 #pragma once
 #include <cstdint>
+#include <memory>
 #include <optional>
 
 #include "image_file.h"
@@ -46,6 +47,8 @@ struct Workplace {
   int Threads = 1;
 };
 
+struct Draft;
+
 /// What a step does to a picture, its options known. It keeps nothing from call to call, so it may work on
 /// several threads at once, each with pictures of its own.
 class Operation {
@@ -58,10 +61,22 @@ class Operation {
   virtual int Pictures() const { return 2; }
   /// The part of the source that the result is, where the work is nothing else: a reader may read that alone.
   virtual std::optional<Rect> Cuts() const { return std::nullopt; }
+  /// Where a reader may give a smaller picture instead of the source.
+  virtual std::optional<Draft> Drafted(const Shape& source) const;
   /// The result of a whole picture, or of a band of rows with those in reach. In place where that can be: the
   /// source may come back changed, and is lost otherwise. The source may be a view. Throws files::Failure
   /// where it can't be done.
   virtual Picture Apply(Picture source, const Workplace& at) const = 0;
 };
+
+/// A smaller picture that does instead of a source.
+struct Draft {
+  /// How large it is at least.
+  files::Extent Least;
+  /// What is left to do with it: the result has the size that it would have of the source.
+  std::unique_ptr<const Operation> Rest;
+};
+
+inline std::optional<Draft> Operation::Drafted(const Shape&) const { return std::nullopt; }
 
 }

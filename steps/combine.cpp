@@ -2,6 +2,7 @@
 #include <mutex>
 
 #include "all_steps.h"
+#include "named.h"
 
 namespace picturezor::steps {
 
@@ -29,7 +30,9 @@ struct Laid {
   files::PictureSize Size;
 
   Laid(const std::string& file, const Surroundings& around)
-      : File(file), Reader(files::OpenImage(File, {.MemoryLimit = around.Stores.MemoryLimit})) {
+      : File(file),
+        Reader(files::OpenNamed(
+            File, {.MemoryLimit = around.Stores.MemoryLimit, .TempDirectory = around.Stores.TempDirectory})) {
     const files::ImageInfo info = files::Upright(Reader->Info());
     Size = {info.Width, info.Height, info.Pixels};
     for (const std::string& note : info.Notes) around.Note(File, note);

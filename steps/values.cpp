@@ -81,7 +81,10 @@ Color ParseColour(const Option& option, const std::string& text) {
 
 std::string Shortest(double number) {
   char text[32];
-  return {text, std::to_chars(text, text + sizeof text, number).ptr};
+  const bool near = std::fabs(number) < 1e10;
+  return {text, std::to_chars(text, text + sizeof text, number,
+                              near ? std::chars_format::fixed : std::chars_format::general)
+                    .ptr};
 }
 
 void RequireWithin(const Option& option, double number) {
@@ -139,6 +142,17 @@ const char* Option::Stands() const {
     case Kind::File: return "FILE";
   }
   return "";
+}
+
+std::string Option::Explained() const {
+  std::string text = Help;
+  constexpr double far = 1e9;
+  const bool bounded = Of == Kind::Integer || Of == Kind::Number || Of == Kind::Numbers;
+  if (bounded && Most < far) text += "; " + Shortest(Least) + " to " + Shortest(Most);
+  for (std::size_t i = 0; i < Choices.size(); ++i)
+    text += (i == 0 ? ": " : i + 1 == Choices.size() ? " or " : ", ") + Choices[i];
+  if (!Default.empty()) text += "; " + Default + " by default";
+  return text;
 }
 
 Value ParseValue(const Option& option, const std::string& text) {

@@ -58,6 +58,8 @@ struct Option {
   /// --name, or the name in capitals where it is given by its place.
   std::string Shown() const;
   const char* Stands() const;
+  /// Its help with the names that it takes, the bounds of its numbers and the default.
+  std::string Explained() const;
 };
 
 /// What a text says. Throws files::UsageFailure naming the option, or files::Failure for a file that can't be

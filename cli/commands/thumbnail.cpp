@@ -1,9 +1,15 @@
+#include <sys/stat.h>
+
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <condition_variable>
 #include <map>
+#include <mutex>
+#include <thread>
 
-#include "failure.h"
 #include "small_picture.h"
+#include "step_options.h"
+#include "threads.h"
 
 namespace picturezor::cli {
 
@@ -14,64 +20,188 @@ using std::filesystem::path;
 struct ThumbnailOptions {
   std::vector<path> In;
   path Directory;
+  std::string Name = "{stem}.png";
   std::int32_t Size = 0;
+  int Jobs = 0;
 };
 
-/// A file for each image. Two of one name, or one that is an image itself, would cost somebody a picture.
-std::vector<path> TargetsOf(const ThumbnailOptions& options) {
-  std::vector<path> targets;
-  std::map<path, path> of;
-  for (const path& in : options.In) {
-    const path target = options.Directory / in.stem().concat(".png");
-    const auto [other, added] = of.emplace(target, in);
-    if (!added) throw Failure(in, "its thumbnail would have the name of that of " + other->second.string());
-    targets.push_back(target);
+/// What is to become of an image.
+struct Thumbnail {
+  path In, Out;
+  files::Extent Size;
+  /// Why it can't be.
+  std::string Failed;
+};
+
+/// A picture of inks as light.
+class InLight final : public flow::Operation {
+ public:
+  flow::Shape Result(const flow::Shape& source) const override {
+    flow::Shape result = source;
+    result.Of = HasAlpha(source.Of) ? Format::RGBA : Format::RGB;
+    return result;
   }
-  std::error_code missing;
-  for (const path& target : targets)
-    for (const path& in : options.In)
-      if (std::filesystem::equivalent(target, in, missing) && !missing)
-        throw Failure(in, "its place would be taken by a thumbnail");
-  return targets;
+  int Pictures() const override { return 3; }
+  Picture Apply(Picture source, const flow::Workplace&) const override {
+    const HostPicture light = source.CopyPictureWithMask();
+    if (!light) throw Failure("no picture can be made of it");
+    const Picture result(source.Width(), source.Height(), light.Mask() ? Format::RGBA : Format::RGB);
+    result.DrawMaskedPictureRGB(light);
+    return result;
+  }
+};
+
+files::Extent SizeOf(const ImageInfo& upright, std::int32_t side) {
+  const double most = std::min(side, std::max(upright.Width, upright.Height));
+  const PictureSize size = SizeWithin({upright.Width, upright.Height, upright.Pixels}, most, most);
+  return {size.Width, size.Height};
 }
 
-void MakeThumbnail(Session& session, const path& in, const path& out, std::int32_t side) {
-  OpenedImage image(session, in);
-  const double most = std::min(side, std::max(image.Upright.Width, image.Upright.Height));
-  const PictureSize size = SizeWithin(image.Size(), most, most);
-  Target target(session, out);
-  target.Start(size.Width, size.Height);
-  const HostPicture small = SmallPicture(session, image, size.Width, size.Height);
-  const Format format = small.Mask() ? Format::RGBA : Format::RGB;
-  const Picture written(size.Width, size.Height, format);
-  written.DrawMaskedPictureRGB(small);
-  target.Write(session, written, format, image.Upright);
+/// A name like '{stem}-{width}.jpg' with everything filled in. Throws UsageFailure.
+std::string NameOf(const std::string& pattern, const path& in, const files::Extent& size) {
+  const std::map<std::string, std::string> words{
+      {"name", in.filename().string()},
+      {"stem", in.stem().string()},
+      {"ext", in.has_extension() ? in.extension().string().substr(1) : ""},
+      {"width", std::to_string(size.Width)},
+      {"height", std::to_string(size.Height)}};
+  std::string name;
+  for (std::size_t at = 0; at < pattern.size(); ++at) {
+    const std::size_t end = pattern.find('}', at);
+    if (pattern[at] != '{' || end == pattern.npos) {
+      name += pattern[at];
+      continue;
+    }
+    const auto word = words.find(pattern.substr(at + 1, end - at - 1));
+    if (word == words.end())
+      throw UsageFailure("--name: {stem}, {name}, {ext}, {width} and {height} are filled in, and not " +
+                         pattern.substr(at, end - at + 1));
+    name += word->second;
+    at = end;
+  }
+  return name;
+}
+
+/// Tells a file from all others, whatever its names.
+using Identity = std::pair<dev_t, ino_t>;
+std::optional<Identity> IdentityOf(const path& file) {
+  struct stat about {};
+  if (stat(file.c_str(), &about) != 0) return std::nullopt;
+  return Identity{about.st_dev, about.st_ino};
+}
+
+/// Finds out all sizes and names. Two of one name, or one that is an image itself, would cost somebody a
+/// picture.
+std::vector<Thumbnail> Planned(Session& session, const ThumbnailOptions& options) {
+  std::vector<Thumbnail> thumbnails;
+  std::map<path, path> of;
+  std::map<Identity, path> images;
+  for (const path& in : options.In) {
+    if (const auto identity = IdentityOf(in)) images.emplace(*identity, in);
+    Thumbnail one{in, {}, {}, {}};
+    try {
+      one.Size = SizeOf(Upright(OpenFor(session, in)->Info()), options.Size);
+    } catch (const Failure& failure) {
+      one.Failed = failure.what();
+    }
+    one.Out = options.Directory / NameOf(options.Name, in, one.Size);
+    TypeToWrite(one.Out, session.TypeName);
+    if (one.Failed.empty()) {
+      const auto [other, added] = of.emplace(one.Out, in);
+      if (!added) throw Failure(in, "its thumbnail would have the name of that of " + other->second.string());
+    }
+    thumbnails.push_back(one);
+  }
+  for (const Thumbnail& one : thumbnails)
+    if (const auto identity = IdentityOf(one.Out); identity && images.contains(*identity))
+      throw Failure(images[*identity], "its place would be taken by a thumbnail");
+  return thumbnails;
+}
+
+void Make(Session& session, const Thumbnail& one, int threads) {
+  OpenedImage image(session, one.In);
+  Target target(session, one.Out);
+  flow::Chain chain;
+  if (one.Size.Width != image.Upright.Width || one.Size.Height != image.Upright.Height)
+    chain.push_back(
+        steps::MakeOperation(*steps::FindStep("scale"),
+                             std::map<std::string, steps::Value>{{"width", std::int64_t{one.Size.Width}},
+                                                                 {"height", std::int64_t{one.Size.Height}},
+                                                                 {"draft", true}},
+                             SurroundingsOf(session)));
+  if (WithoutAlpha(image.Upright.Pixels) == Format::CMYK) chain.push_back(std::make_unique<InLight>());
+  Silence silent;
+  const Format colours = HasAlpha(image.Upright.Pixels) ? Format::RGBA : Format::RGB;
+  target.Carry(session, image, std::move(chain), target.Storable(session, colours), threads, silent);
   target.Commit();
 }
 
-int Thumbnail(Session& session, const ThumbnailOptions& options) {
-  const std::vector<path> targets = TargetsOf(options);
+/// Makes all of them, some at a time. What keeps one from being made is kept with it.
+void MakeAll(Session& session, std::vector<Thumbnail>& thumbnails, int asked) {
+  const int processors = flow::Processors();
+  const int jobs = int(std::min<std::size_t>(std::size_t(asked > 0 ? asked : processors), thumbnails.size()));
+  // The jobs share the memory and the processors.
+  session.Stores.MemoryLimit /= jobs;
+  const int threads = std::max(1, processors / jobs);
+  std::mutex access;
+  std::condition_variable changed;
+  std::size_t next = 0, done = 0;
+  const auto work = [&] {
+    std::unique_lock lock(access);
+    while (next < thumbnails.size()) {
+      Thumbnail& one = thumbnails[next++];
+      lock.unlock();
+      try {
+        if (one.Failed.empty()) Make(session, one, threads);
+      } catch (const std::bad_alloc&) {
+        one.Failed = one.In.string() + ": not enough memory";
+      } catch (const steps::Unserved& failure) {
+        one.Failed = Failure(one.In, failure.what()).what();
+      } catch (const std::exception& failure) {
+        one.Failed = failure.what();
+      }
+      lock.lock();
+      ++done;
+      changed.notify_one();
+    }
+  };
+  std::vector<std::thread> workers;
+  for (int i = 0; i < jobs; ++i) workers.push_back(flow::StartThread(work));
+  session.Bar.Begin("making", std::int64_t(thumbnails.size()));
+  std::unique_lock lock(access);
+  for (std::size_t told = 0; told < thumbnails.size();) {
+    changed.wait(lock, [&] { return done > told; });
+    session.Bar.Step(std::int64_t(done - told));
+    told = done;
+  }
+  lock.unlock();
+  for (std::thread& worker : workers) worker.join();
+}
+
+int MakeThumbnails(Session& session, const ThumbnailOptions& options) {
+  std::vector<Thumbnail> thumbnails = Planned(session, options);
   std::error_code failed;
   std::filesystem::create_directory(options.Directory, failed);
   if (failed) throw Failure(options.Directory, failed.message());
-  for (std::size_t i = 0; i < targets.size(); ++i)
-    MakeThumbnail(session, options.In[i], targets[i], options.Size);
-  return Done;
+  MakeAll(session, thumbnails, options.Jobs);
+  int code = Done;
+  for (const Thumbnail& one : thumbnails)
+    if (!one.Failed.empty()) code = session.Complain(one.Failed, Failed);
+  return code;
 }
 
 }
 
 void AddThumbnail(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("thumbnail", "Make a small PNG of each of many images");
-  command->footer(
-      "Each keeps its proportions; one that is small already keeps its size. Colours become RGB, alpha "
-      "stays.\n"
-      "Thumbnails are named after their images. At the first one that can't be made the command stops; "
-      "those\n"
-      "before it stay.\n\n"
-      "Example:\n  picturezor thumbnail photos/*.jpg --size 160 -o contacts");
+  CLI::App* command = app.add_subcommand("thumbnail", "Make a small image of each of many");
+  command->footer(Footer(
+      "Each keeps its proportions; one that is small already keeps its size. Colours become RGB, alpha\n"
+      "stays where the type has it. JPEGs are made smaller as they are read. Images that can't be read are\n"
+      "told at the end, and the others made all the same.",
+      {"thumbnail photos/*.jpg --size 160 -o contacts",
+       "thumbnail photos/* --size 1024 --name '{stem}-{width}.jpg' --quality 80 -o web"}));
   auto options = std::make_shared<ThumbnailOptions>();
-  command->add_option("IN", options->In, "Images to read: PNG, JPEG or TIFF")->required()->type_name("");
+  command->add_option("IN", options->In, "Images to read")->required()->type_name("");
   command->add_option("-o,--output", options->Directory, "Directory to write to; made if it isn't there")
       ->required()
       ->type_name("DIR");
@@ -79,9 +209,19 @@ void AddThumbnail(CLI::App& app, Session& session) {
       ->required()
       ->type_name("N")
       ->check(CLI::Range(1, 32767));
+  command
+      ->add_option("--name", options->Name,
+                   "What they are called; {stem}, {name}, {ext}, {width} and {height} stand for the image's\n"
+                   "name without and with its ending, the ending, and the size; {stem}.png by default")
+      ->type_name("TEXT");
+  command->add_option("--jobs", options->Jobs, "Images at a time; 0, the default, is one a processor")
+      ->type_name("N")
+      ->check(CLI::Range(0, 256));
+  AddWriteOptions(*command, session);
   AddStoreOptions(*command, session);
-  command->callback(
-      [&session, options] { session.Work = [&session, options] { return Thumbnail(session, *options); }; });
+  command->callback([&session, options] {
+    session.Work = [&session, options] { return MakeThumbnails(session, *options); };
+  });
 }
 
 }

@@ -33,6 +33,7 @@ class FilterOperation final : public flow::Operation {
                      files::Describe(source.Of));
     if (Rules.Groups == Serves::GrayAndRGB && colours == Format::CMYK)
       throw Unserved(std::string(Rules.Name) + " isn't there for CMYK");
+    if (Rules.NotForGray && colours == Format::G) throw files::UsageFailure(Rules.NotForGray);
     return source;
   }
   flow::Dependence DependsOn(const flow::Shape&) const override { return Rules.Needs; }

@@ -14,6 +14,8 @@ struct FilterRules {
   flow::Dependence Needs{.Of = flow::Dependence::Kind::Bands};
   /// The pictures of the image's size that it needs at a time.
   int Pictures = 1;
+  /// What is said of a gray image where the options are for colours; nothing where they do for both.
+  const char* NotForGray = nullptr;
   /// It looks at what stands behind a row, so the picture has to be no view.
   bool LooksBehindRows = false;
 };

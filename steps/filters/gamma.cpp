@@ -17,12 +17,12 @@ const Step Gamma{.Name = "filter gamma",
                    const Numbers g = values.Get<Numbers>("gamma");
                    if (g.size() != 1 && g.size() != 3)
                      throw files::UsageFailure("--gamma: give one number, or three with commas");
-                   return MakeFilter({.Name = "gamma", .Groups = Serves::GrayAndRGB},
+                   return MakeFilter({.Name = "gamma",
+                                      .Groups = Serves::GrayAndRGB,
+                                      .NotForGray = g.size() > 1 ? "--gamma: a gray image has one" : nullptr},
                                      [g](const Picture& colours) {
-                                       if (g.size() == 1) return colours.GammaFilter(colours, g[0]);
-                                       if (colours.IsGray())
-                                         throw files::UsageFailure("--gamma: a gray image has one");
-                                       return colours.GammaFilter(colours, g[0], g[1], g[2]);
+                                       return g.size() == 1 ? colours.GammaFilter(colours, g[0])
+                                                            : colours.GammaFilter(colours, g[0], g[1], g[2]);
                                      });
                  }};
 

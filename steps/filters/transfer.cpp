@@ -30,14 +30,15 @@ const Step Transfer{
       if (values.Has("table") == (channels > 0))
         throw files::UsageFailure("give --table, or --red, --green and --blue");
       if (channels % 3 != 0) throw files::UsageFailure("--red, --green and --blue go together");
-      const FilterRules rules{.Name = "transfer", .Groups = Serves::GrayAndRGB};
+      const FilterRules rules{.Name = "transfer",
+                              .Groups = Serves::GrayAndRGB,
+                              .NotForGray = channels > 0 ? "a gray image has one --table" : nullptr};
       if (channels == 0)
         return MakeFilter(rules, [table = TableOf("table", values)](const Picture& colours) {
           return colours.TransferFilter(colours, IntegerArray(table));
         });
       return MakeFilter(rules, [red = TableOf("red", values), green = TableOf("green", values),
                                 blue = TableOf("blue", values)](const Picture& colours) {
-        if (colours.IsGray()) throw files::UsageFailure("a gray image has one --table");
         return colours.TransferFilter(colours, IntegerArray(red), IntegerArray(green), IntegerArray(blue));
       });
     }};

@@ -55,12 +55,54 @@ TEST_F(Thumbnails, NeverCostAnImage) {
   Fail({"thumbnail", "a.png", "--size", "5", "-o", "."}, "a.png", "taken by a thumbnail");
   Fail({"thumbnail", "b/a.png", "a.png", "--size", "5", "-o", "."}, "a.png", "the name of that of b/a.png");
   Fail({"thumbnail", "a.png", "a.jpg", "--size", "5", "-o", "out"}, "a.jpg", "the name of that of a.png");
+  Fail({"thumbnail", "a.png", "a.jpg", "--name", "{width}.tif", "--size", "5", "-o", "out"}, "a.jpg",
+       "the name of that of a.png");
   Fail({"thumbnail", "a.png", "--size", "5", "-o", "no/out"}, "no/out", "No such file");
-  EXPECT_EQ(Run({"thumbnail", "a.png", "--size", "0", "-o", "out"}).Code, 3);
-  EXPECT_EQ(Run({"thumbnail", "a.png", "-o", "out"}).Code, 3);
-  // What was made before a failure stays.
-  EXPECT_EQ(Run({"thumbnail", "a.png", "none.png", "--size", "5", "-o", "out"}).Code, 2);
-  EXPECT_EQ(ReadPNG(At("out/a.png")).Width, 5);
+  for (const Arguments& wrong : {Arguments{"--size", "0"},
+                                 {},
+                                 {"--size", "5", "--name", "{side}.png"},
+                                 {"--size", "5", "--name", "{stem}"},
+                                 {"--size", "5", "--name", "{stem}.gif"}}) {
+    Arguments all{"thumbnail", "a.png", "-o", "out"};
+    all.insert(all.end(), wrong.begin(), wrong.end());
+    EXPECT_EQ(Run(all).Code, 3) << testing::PrintToString(wrong);
+  }
+  EXPECT_FALSE(std::filesystem::exists(At("out")));
+}
+
+// Catches a bad file that ends the work or is forgotten, and pictures that depend on who made them.
+TEST_F(Thumbnails, AreMadeSeveralAtATime) {
+  Arguments names{"none.png"};
+  for (int i = 0; i < 12; ++i) {
+    names.push_back("a" + std::to_string(i) + (i % 3 ? ".jpg" : ".png"));
+    const Raster picture = Waves(90 + 30 * i, 120, 3);
+    if (i % 3)
+      WriteJPEG(At(names.back()), picture);
+    else
+      WritePNG(At(names.back()), picture);
+  }
+  WriteBytes(At("bad.jpg"), {0xFF, 0xD8, 0xFF, 0});
+  names.push_back("bad.jpg");
+  Raster first[12];
+  for (const char* jobs : {"1", "3", "0"}) {
+    Arguments all{"thumbnail", "--size", "30", "--jobs", jobs, "--name", "{ext}-{stem}-{width}x{height}.png",
+                  "-o",        jobs};
+    all.insert(all.end(), names.begin(), names.end());
+    const Outcome outcome = Run(all);
+    EXPECT_EQ(outcome.Code, 2);
+    EXPECT_THAT(outcome.Error,
+                testing::MatchesRegex("picturezor: none.png: [^\n]+\npicturezor: bad.jpg: [^\n]+\n"));
+    for (int i = 0; i < 12; ++i) {
+      const int width = i == 0 ? 23 : 30,
+                height = i == 0 ? 30 : (30 * 120 + (90 + 30 * i) / 2) / (90 + 30 * i);
+      const std::string name = std::string(i % 3 ? "jpg-a" : "png-a") + std::to_string(i) + "-" +
+                               std::to_string(width) + "x" + std::to_string(height) + ".png";
+      const Raster made = ReadPNG(At(std::string(jobs) + "/" + name));
+      EXPECT_EQ(made.Width, width) << name;
+      if (jobs[0] == '1') first[i] = made;
+      EXPECT_EQ(made, first[i]);
+    }
+  }
 }
 
 TEST_F(Shown, HasTwoPixelsInAPlace) {
