@@ -65,6 +65,8 @@ class Scaling final : public flow::Operation {
   Picture Apply(Picture source, const flow::Workplace& at) const override {
     const flow::Shape size = Result({source.Width(), source.Height(), source.ImageFormat(), {}});
     const Picture scaled = files::MakePictures(at.Stores, {{size.Width, size.Height, size.Of}})[0];
+    // What stands between the two passes can't be mapped, as that of a step before may be.
+    source.SetFactory({});
     const bool done =
         Fast ? scaled.ScaleFast(source, size.Width, size.Height)
              : scaled.ScaleMT(at.Threads > 1 ? at.Threads : -1, source, {}, By, size.Width, size.Height);

@@ -221,7 +221,9 @@ class TIFFReader : public ImageReader {
       if (Sources[i]) Lines[i] = Sources[i]->Row(NextRow);
     ++NextRow;
     const int channels = ChannelsOf(About.Pixels);
-    if (Of.Photometric == PHOTOMETRIC_PALETTE) {
+    if (AsStored()) {
+      std::memcpy(row, Lines[0] + Left * channels, std::size_t(About.Width) * std::size_t(channels));
+    } else if (Of.Photometric == PHOTOMETRIC_PALETTE) {
       for (std::int64_t x = 0; x < About.Width; ++x)
         std::memcpy(row + x * channels, Palette[Raw(x, 0) & 255].data(), 3);
     } else {
@@ -230,7 +232,7 @@ class TIFFReader : public ImageReader {
         for (std::int64_t x = 0; x < About.Width; ++x)
           row[x * channels] = std::uint8_t(255 - row[x * channels]);
     }
-    if (Of.AlphaAt >= 0) CopySamples(row + channels - 1, channels, Of.AlphaAt);
+    if (Of.AlphaAt >= 0 && !AsStored()) CopySamples(row + channels - 1, channels, Of.AlphaAt);
     if (Of.Associated) Divide(row, channels);
   }
 
@@ -238,6 +240,12 @@ class TIFFReader : public ImageReader {
   void Finish() override {}
 
  private:
+  /// Whether a row of the file is one of the picture.
+  bool AsStored() const {
+    return Of.Bits == 8 && !Of.Planar && Of.Samples == ChannelsOf(About.Pixels) &&
+           Of.Photometric != PHOTOMETRIC_PALETTE && Of.Photometric != PHOTOMETRIC_MINISWHITE;
+  }
+
   /// libtiff overlooks a cut in the last bytes of a directory.
   void RequireWholeDirectory() const {
     const std::uint64_t at = TIFFCurrentDirOffset(*File);

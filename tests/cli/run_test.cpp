@@ -142,6 +142,34 @@ TEST_F(Runs, TellWhichStepIsWrong) {
               HasSubstr("nowhere: it can't be read"));
 }
 
+// What bash offers behind a command line, by the program's own script.
+TEST_F(Runs, AreCompletedByTheShell) {
+  const struct {
+    const char *Line, *Offered;
+  } cases[] = {
+      {"thumbnail --jo", "--jobs"},
+      {"scale --ker", "--kernel"},
+      {"scale in.png --kernel lan", "lanczos3 lanczos8"},
+      {"filter so", "solarize soft-blur"},
+      {"filter blur --it", "--iterations"},
+      {"run in.png --st", "--steps --store"},
+      {"run in.png -o out.png crop --re", "--rect"},
+      {"run in.png -o out.png crop --rect 0,0,5,5 : filt", "filter"},
+      {"run in.png -o out.png crop --rect 0,0,5,5 : filter uns", "unsharp"},
+      {"run in.png -o out.png rotate --angle 9 : filter dither --pattern clus", "cluster3 cluster4 cluster8"},
+      {"run in.png -o out.png filter blur : mirror --o", ""},
+      {"convert i", ""},
+  };
+  const std::string script = Run({"completion", "bash"}).Out;
+  for (const auto& [line, offered] : cases) {
+    std::ofstream(At("try")) << script << "COMP_WORDS=(picturezor " << line << ")\n"
+                             << "COMP_CWORD=$((${#COMP_WORDS[@]} - 1))\n_picturezor\n"
+                             << "[ \"${COMPREPLY[*]}\" = '" << offered
+                             << "' ] || { echo \"${COMPREPLY[*]}\"; exit 1; }\n";
+    EXPECT_EQ(std::system(("bash '" + At("try").string() + "'").c_str()), 0) << line;
+  }
+}
+
 }
 
 }
