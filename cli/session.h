@@ -107,5 +107,7 @@ void AddInfo(CLI::App& app, Session& session);
 void AddThumbnail(CLI::App& app, Session& session);
 void AddShow(CLI::App& app, Session& session);
 void AddCompletion(CLI::App& app, Session& session);
+void AddTiles(CLI::App& app, Session& session);
+void AddView(CLI::App& app, Session& session);
 
 }

@@ -1,0 +1,110 @@
+#include <CLI/CLI.hpp>
+#include <map>
+
+#include "make_tiles.h"
+#include "session.h"
+#include "values.h"
+
+namespace picturezor::cli {
+
+namespace {
+
+using tiles::Layout;
+
+struct Options {
+  std::filesystem::path In, Out;
+  tiles::TilesOptions Making;
+  std::string Background;
+};
+
+const std::map<std::string, Layout> Layouts{
+    {"deepzoom", Layout::DeepZoom}, {"iiif", Layout::IIIF}, {"xyz", Layout::XYZ}};
+
+int Tiles(Session& session, Options options) {
+  tiles::TilesOptions& making = options.Making;
+  if (!options.Background.empty()) {
+    const steps::Option colour{.Name = "background", .Of = steps::Kind::Colour, .Help = ""};
+    making.Background = std::get<Color>(steps::ParseValue(colour, options.Background));
+  }
+  making.Writing = session.Writing;
+  making.Running = {session.Stores, session.Threads};
+  OpenedImage source(session, options.In);
+  std::function<std::unique_ptr<ImageReader>()> again;
+  // Standard input comes once.
+  if (options.In != "-") again = [&] { return OpenedImage(session, options.In).Reader; };
+  MakeTiles({std::move(source.Reader), again}, options.In, options.Out, making, session.Bar);
+  return Done;
+}
+
+}
+
+void AddTiles(CLI::App& app, Session& session) {
+  CLI::App* command = app.add_subcommand("tiles", "Make an image pyramid for viewers on the web");
+  command->footer(
+      "Levels are made by halves from the picture itself, each as `scale` makes it. The pyramid stands "
+      "under\n"
+      "its name when it is complete; until then NAME.unfinished does, which --resume goes on with.\n\n"
+      "Examples:\n"
+      "  picturezor tiles scan.tif -o scan --page\n"
+      "  picturezor tiles scan.tif --layout iiif --address https://example.org/iiif -o scan\n"
+      "  picturezor tiles map.png --layout xyz --format png --skip-blank -o map\n"
+      "  picturezor tiles scan.tif --tile 254 --overlap 1 -o scan.szi");
+  auto options = std::make_shared<Options>();
+  command->add_option("IN", options->In, "Image to read")->required()->type_name("");
+  command
+      ->add_option("-o,--output", options->Out,
+                   "Name of the pyramid: a folder, or a ZIP where it ends in .zip or .szi")
+      ->required()
+      ->type_name("NAME");
+  command
+      ->add_option_function<std::string>(
+          "--layout", [options](const std::string& name) { options->Making.How = Layouts.at(name); },
+          "deepzoom (NAME.dzi and NAME_files; the default), iiif (level 0 of version 3) or xyz (for maps)")
+      ->type_name("KIND")
+      ->check(CLI::IsMember({"deepzoom", "iiif", "xyz"}));
+  command->add_option("--tile", options->Making.Tile, "Edge of a tile in pixels, 256 by default")
+      ->type_name("N")
+      ->check(CLI::Range(16, 8192));
+  command
+      ->add_option("--overlap", options->Making.Overlap,
+                   "Pixels that a tile of deepzoom has of its neighbours, on each side; 0 by default")
+      ->type_name("N")
+      ->check(CLI::Range(0, 64));
+  command->add_option("--format", options->Making.Type, "Type of the tiles: jpg (default), png or webp")
+      ->type_name("NAME");
+  command
+      ->add_option("--quality", session.Writing.Quality,
+                   "JPEG quality, 1 to 100, 90 by default; from 90 on colours keep their full resolution")
+      ->type_name("N")
+      ->check(CLI::Range(1, 100));
+  command
+      ->add_option("--kernel", options->Making.Kernel,
+                   "triangle, box (default), lanczos3, lanczos8, mitchell, poly3 or cubic. box reads the\n"
+                   "image once, others once for each level")
+      ->type_name("NAME")
+      ->check(CLI::IsMember({"triangle", "box", "lanczos3", "lanczos8", "mitchell", "poly3", "cubic"}));
+  command
+      ->add_option(
+          "--background", options->Background,
+          "What shows through where tiles have no alpha, and fills up tiles of xyz; white by default")
+      ->type_name("RRGGBB");
+  command->add_flag("--skip-blank", options->Making.SkipBlank,
+                    "Leave out tiles that show the background alone, or nothing");
+  command
+      ->add_option("--address", options->Making.Address,
+                   "Where the folder of iiif will be found, as https://example.org/iiif")
+      ->type_name("URL");
+  command->add_flag("--page", options->Making.Page,
+                    "Add a page that shows it: NAME.html beside NAME.dzi, else NAME/index.html");
+  command->add_flag("--resume", options->Making.Resume, "Go on with a folder that was interrupted");
+  command
+      ->add_option("--threads", session.Threads,
+                   "Threads to work on; 0, the default, is one a processor")
+      ->type_name("N")
+      ->check(CLI::Range(0, 32));
+  AddStoreOptions(*command, session);
+  command->callback(
+      [&session, options] { session.Work = [&session, options] { return Tiles(session, *options); }; });
+}
+
+}

@@ -1,0 +1,103 @@
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <fstream>
+#include <system_error>
+
+#include "failure.h"
+#include "target.h"
+#include "temporary_files.h"
+
+namespace picturezor::tiles {
+
+namespace {
+
+using files::Failure;
+using std::filesystem::path;
+
+/// A file in the unfinished folder.
+class PlainFile final : public files::Output {
+ public:
+  PlainFile(const path& file, int flags) : Output(file) {
+    constexpr mode_t mode = 0666;
+    File = open(file.c_str(), O_CREAT | O_CLOEXEC | flags, mode);
+    if (File < 0 && errno == ENOENT) {
+      std::error_code failed;
+      std::filesystem::create_directories(file.parent_path(), failed);
+      if (failed) throw Failure(file.parent_path(), failed.message());
+      File = open(file.c_str(), O_CREAT | O_CLOEXEC | flags, mode);
+    }
+    if (File < 0) throw Failure(file, std::strerror(errno));
+  }
+  void Commit() override {
+    const int file = std::exchange(File, -1);
+    if (close(file) != 0) throw Failure(Name, std::strerror(errno));
+  }
+};
+
+void Rename(const path& from, const path& to) {
+  if (rename(from.c_str(), to.c_str()) != 0) throw Failure(to, std::strerror(errno));
+}
+
+}
+
+FolderTarget::FolderTarget(const path& parent, const std::string& name, const std::string& task, bool resume)
+    : Parent(parent),
+      Unfinished(parent / (name + ".unfinished")),
+      JournalName(Unfinished / "journal"),
+      Name(name) {
+  for (const char* ending : {"", "_files", ".dzi", ".html"}) RequireFree(Parent / (Name + ending));
+  bool goesOn = false;
+  if (std::ifstream journal(JournalName); resume && journal) {
+    std::string before;
+    goesOn = std::getline(journal, before) && before == task;
+    int level = 0;
+    std::int32_t row = 0;
+    // A line that was cut off has no end, and its row is made again.
+    for (std::string line; goesOn && std::getline(journal, line) && !journal.eof();)
+      if (std::sscanf(line.c_str(), "%d %d", &level, &row) == 2) Rows.insert({level, row});
+  }
+  std::error_code failed;
+  // Only what has a journal is ours to remove.
+  if (!goesOn && std::filesystem::exists(JournalName)) std::filesystem::remove_all(Unfinished, failed);
+  if (failed) throw Failure(Unfinished, failed.message());
+  if (!goesOn && std::filesystem::exists(Unfinished)) throw Failure(Unfinished, "something else is there");
+  Journal = std::make_unique<PlainFile>(JournalName, O_WRONLY | O_APPEND);
+  const std::string start = goesOn ? "\n" : task + "\n";
+  files::WriteAll(Journal->Descriptor(), {reinterpret_cast<const std::uint8_t*>(start.data()), start.size()},
+                  JournalName);
+}
+
+void FolderTarget::RequireFree(const path& file) const {
+  std::error_code failed;
+  if (std::filesystem::exists(std::filesystem::symlink_status(file, failed)))
+    throw Failure(file, "it is there already; remove it first, or choose another name");
+}
+
+std::unique_ptr<files::Output> FolderTarget::Begin(const std::string& name) const {
+  return std::make_unique<PlainFile>(Unfinished / name, O_WRONLY | O_TRUNC);
+}
+
+void FolderTarget::Add(files::Output& file) { file.Commit(); }
+
+void FolderTarget::AddRow(int level, std::int32_t row) {
+  const std::string line = std::to_string(level) + " " + std::to_string(row) + "\n";
+  files::WriteAll(Journal->Descriptor(), {reinterpret_cast<const std::uint8_t*>(line.data()), line.size()},
+                  JournalName);
+}
+
+void FolderTarget::Commit() {
+  Journal->Commit();
+  // What says that there is a pyramid comes last.
+  for (const char* ending : {"", "_files", ".html", ".dzi"}) {
+    const path file = Unfinished / (Name + ending);
+    if (!std::filesystem::exists(file)) continue;
+    RequireFree(Parent / (Name + ending));
+    Rename(file, Parent / (Name + ending));
+  }
+  std::filesystem::remove_all(Unfinished);
+}
+
+}

@@ -1,0 +1,282 @@
+#include "make_tiles.h"
+
+#include <algorithm>
+#include <array>
+#include <functional>
+
+#include "box_levels.h"
+#include "conveyor.h"
+#include "failure.h"
+#include "page.h"
+#include "step.h"
+#include "target.h"
+#include "threads.h"
+#include "tile_pixels.h"
+#include "tile_rows.h"
+
+namespace picturezor::tiles {
+
+namespace {
+
+using files::Failure;
+using std::filesystem::path;
+
+/// Rows that go through the kernel together begin at a multiple of this.
+constexpr std::int32_t RowsTogether = 32;
+/// Jobs that wait, for each thread.
+constexpr std::size_t JobsAhead = 16;
+
+const files::FileType& TileType(const std::string& name) {
+  static constexpr std::array shown{"PNG", "JPEG", "WebP", "AVIF"};
+  const files::FileType& type = files::TypeByName(name);
+  if (std::ranges::find(shown, std::string_view(type.Name)) == shown.end() || !type.Create)
+    throw files::UsageFailure("--format: no browser shows tiles of the type " + name);
+  return type;
+}
+
+/// Work for any thread, and what the thread that put it does afterwards, in order.
+struct Job {
+  std::function<void(int thread)> Work;
+  std::function<void()> Then;
+};
+
+class Maker {
+ public:
+  Maker(const flow::Shape& shape, const std::string& name, const files::FileType& type, TileTarget& target,
+        const TilesOptions& options)
+      : Grids({shape.Width, shape.Height}, options.How, options.Tile, options.Overlap),
+        Name(name),
+        Ending(type.Extensions.front()),
+        Type(type),
+        Into(target),
+        Options(options),
+        Writing(options.Writing),
+        TileFormat(files::StorableFormat(name + Ending, type, shape.Of)),
+        LevelFormat(shape.Of),
+        Pixels(shape.Of, TileFormat, options.Background),
+        Threads(options.Running.Threads > 0 ? options.Running.Threads : flow::Processors()),
+        Jobs(Threads, [](Job& job, int thread) { job.Work(thread); }) {
+    Writing.Threads = 1;
+    files::RequireStorableSize(name + Ending, type, options.Tile + 2 * options.Overlap,
+                               options.Tile + 2 * options.Overlap);
+    for (int level = 0; level < Grids.LevelCount(); ++level)
+      Levels.push_back(std::make_unique<TileRows>(Grids, level, files::ChannelsOf(shape.Of)));
+  }
+
+  const Grid& Cut() const { return Grids; }
+  const std::string& TileEnding() const { return Ending; }
+
+  /// The picture itself, and with it all other levels by the kernel box.
+  void MakeAll(flow::Rows& rows, files::Progress& progress) {
+    std::vector<files::Extent> sizes;
+    for (int level = 1; level < Grids.LevelCount(); ++level) sizes.push_back(Grids.Level(level));
+    BoxLevels boxes(Grids.Level(0), files::ChannelsOf(LevelFormat), sizes);
+    std::vector<decltype(boxes.MakeScratch())> scratch;
+    for (int i = 0; i < Threads; ++i) scratch.push_back(boxes.MakeScratch());
+    const auto onRow = [this](int level, std::int32_t, const std::uint8_t* row) {
+      TileRows& into = *Levels[std::size_t(level) + 1];
+      std::copy_n(row, into.Filling()->RowBytes, into.Place());
+      Gathered(level + 1, 1);
+    };
+    MakeLevel(0, rows, progress, [&](std::int32_t first, std::int32_t count) {
+      struct Reduction {
+        std::shared_ptr<Band> Of;
+        BoxLevels::Part Part;
+      };
+      auto reduction = std::make_shared<Reduction>(Reduction{Levels[0]->Filling(), {}});
+      Put({[=, &boxes, &scratch](int thread) {
+             reduction->Part =
+                 boxes.Reduce(reduction->Of->Row(first), std::ptrdiff_t(reduction->Of->RowBytes), first,
+                              count, *scratch[std::size_t(thread)]);
+             reduction->Of.reset();
+           },
+           [=, &boxes] { boxes.Add(reduction->Part, onRow); }});
+    });
+  }
+
+  /// One level alone.
+  void MakeOne(int level, flow::Rows& rows, files::Progress& progress) {
+    MakeLevel(level, rows, progress, [](std::int32_t, std::int32_t) {});
+  }
+
+ private:
+  template <class OnRows>
+  void MakeLevel(int level, flow::Rows& rows, files::Progress& progress, OnRows&& onRows) {
+    TileRows& into = *Levels[std::size_t(level)];
+    const std::int32_t height = Grids.Level(level).Height;
+    progress.Begin("making tiles", height);
+    while (into.Next() < height) {
+      const std::int32_t y = into.Next();
+      const std::int32_t count = std::min(into.Room(), RowsTogether - y % RowsTogether);
+      flow::ReadRows(rows, into.Place(), std::ptrdiff_t(into.Filling()->RowBytes), count);
+      onRows(y, count);
+      Gathered(level, count);
+      progress.Step(count);
+    }
+    while (Jobs.Size() > 0) Finish();
+  }
+
+  void Put(Job job) {
+    // What follows from a job may put others.
+    Jobs.Put(std::make_unique<Job>(std::move(job)));
+  }
+
+  void Finish() {
+    const std::unique_ptr<Job> job = Jobs.Take();
+    if (job->Then) job->Then();
+  }
+
+  /// Rows of a level are at their place.
+  void Gathered(int level, std::int32_t count) {
+    TileRows& rows = *Levels[std::size_t(level)];
+    rows.Add(count);
+    for (;;) {
+      // The band behind the next is still being cut into tiles. Only where the picture itself comes may other
+      // jobs be taken meanwhile: those of smaller levels stand behind jobs that have been taken.
+      while (level == 0 && rows.Room() == 0 &&
+             (rows.Waits() || Jobs.Size() > JobsAhead * std::size_t(Threads)))
+        Finish();
+      const auto complete = rows.Take();
+      if (!complete) return;
+      MakeTilesOf(level, *complete);
+    }
+  }
+
+  void MakeTilesOf(int level, const TileRows::Complete& row) {
+    if (Into.HasRow(level, row.Row)) return;
+    const std::int32_t across = Grids.Across(level);
+    for (std::int32_t column = 0; column < across; ++column) {
+      auto file = std::make_shared<std::unique_ptr<files::Output>>();
+      const bool last = column + 1 == across;
+      Put({[=, this, band = row.Of](int) { *file = MakeTile(*band, level, column, row.Row); },
+           [=, this, number = row.Row] {
+             if (*file) Into.Add(**file);
+             if (last) Into.AddRow(level, number);
+           }});
+    }
+  }
+
+  /// The tile's file, or none where it is blank.
+  std::unique_ptr<files::Output> MakeTile(Band& band, int level, std::int32_t column,
+                                          std::int32_t row) const {
+    const Rect tile = Grids.TileAt(level, column, row);
+    const int channels = files::ChannelsOf(LevelFormat);
+    const auto start = [&](std::int32_t y) {
+      return band.Row(tile.Y + y) + std::ptrdiff_t{tile.X} * channels;
+    };
+    if (Options.SkipBlank) {
+      std::int32_t y = 0;
+      while (y < tile.Height && Pixels.AreBlank(start(y), tile.Width)) ++y;
+      if (y == tile.Height) return nullptr;
+    }
+    files::ImageInfo info;
+    info.Width = Grids.Fills() ? Grids.Tile() : tile.Width;
+    info.Height = Grids.Fills() ? Grids.Tile() : tile.Height;
+    info.Pixels = TileFormat;
+    auto file = Into.Begin(Grids.TileName(Name, Ending, level, column, row));
+    const auto writer = Type.Create(file->Descriptor(), file->Target(), info, Writing);
+    if (Pixels.Same() && info.Width == tile.Width && info.Height == tile.Height) {
+      writer->WriteRows(start(0), std::ptrdiff_t(band.RowBytes), tile.Height);
+    } else {
+      const std::span<const std::uint8_t> outside = Pixels.Outside();
+      Bytes empty;
+      for (std::int32_t x = 0; x < info.Width; ++x) empty.insert(empty.end(), outside.begin(), outside.end());
+      Bytes line = empty;
+      for (std::int32_t y = 0; y < info.Height; ++y) {
+        if (y < tile.Height) Pixels.Convert(start(y), tile.Width, line.data());
+        writer->WriteRow(y < tile.Height ? line.data() : empty.data());
+      }
+    }
+    writer->Finish();
+    return file;
+  }
+
+  const Grid Grids;
+  const std::string Name, Ending;
+  const files::FileType& Type;
+  TileTarget& Into;
+  const TilesOptions& Options;
+  files::WriteOptions Writing;
+  const Format TileFormat, LevelFormat;
+  const TilePixels Pixels;
+  std::vector<std::unique_ptr<TileRows>> Levels;
+  const int Threads;
+  files::Conveyor<Job> Jobs;
+};
+
+bool EndsWith(const path& target, const char* ending) { return target.extension() == ending; }
+
+/// What the journal of an unfinished folder is compared with.
+std::string TaskOf(const path& source, const flow::Shape& shape, const TilesOptions& options) {
+  std::error_code failed;
+  const path whole = std::filesystem::absolute(source, failed);
+  const auto changed = std::filesystem::last_write_time(source, failed).time_since_epoch().count();
+  std::string task;
+  for (const std::int64_t number :
+       {std::int64_t(changed), std::int64_t(shape.Width), std::int64_t(shape.Height), std::int64_t(shape.Of),
+        std::int64_t(options.How), std::int64_t(options.Tile), std::int64_t(options.Overlap),
+        std::int64_t(options.Writing.Quality), std::int64_t(options.SkipBlank),
+        std::int64_t(options.Background.Red << 16 | options.Background.Green << 8 | options.Background.Blue)})
+    task += std::to_string(number) + " ";
+  task += options.Type + " " + options.Kernel + " " + whole.string();
+  std::ranges::replace(task, '\n', ' ');
+  return task;
+}
+
+std::unique_ptr<flow::Rows> WholeRows(flow::OpenFile file, const TilesOptions& options,
+                                      files::Progress& progress) {
+  // Rows that come as they are need no thread that reads ahead: the other processors have tiles to make.
+  if (file.Reader->Info().Orientation <= 2) return flow::RowsOf(std::move(file)).From(0);
+  return flow::Through(std::move(file), {}, options.Running, progress);
+}
+
+void MakeLevels(Maker& maker, flow::OpenFile file, const path& source, const TilesOptions& options,
+                files::Progress& progress) {
+  const auto again = file.Again;
+  const std::unique_ptr<flow::Rows> rows = WholeRows(std::move(file), options, progress);
+  if (options.Kernel == "box") return maker.MakeAll(*rows, progress);
+  if (!again) throw Failure(source, "only the kernel box makes all levels of what can't be read again");
+  maker.MakeOne(0, *rows, progress);
+  for (int level = 1; level < maker.Cut().LevelCount(); ++level) {
+    const files::Extent size = maker.Cut().Level(level);
+    flow::Chain chain;
+    chain.push_back(
+        steps::MakeOperation(*steps::FindStep("scale"),
+                             std::map<std::string, std::string>{{"width", std::to_string(size.Width)},
+                                                                {"height", std::to_string(size.Height)},
+                                                                {"kernel", options.Kernel}},
+                             {.Stores = options.Running.Stores, .Note = {}}));
+    maker.MakeOne(level, *flow::Through({again(), again}, chain, options.Running, progress), progress);
+  }
+}
+
+}
+
+void MakeTiles(flow::OpenFile file, const path& source, const path& target, const TilesOptions& options,
+               files::Progress& progress) {
+  const files::FileType& type = TileType(options.Type);
+  const flow::Shape shape = flow::ShapeOf(file);
+  const bool zip = EndsWith(target, ".zip") || EndsWith(target, ".szi");
+  const bool described = options.How == Layout::DeepZoom && EndsWith(target, ".dzi");
+  const std::string name = (zip || described ? target.stem() : target.filename()).string();
+  if (name.empty() || name == "." || name == "..") throw files::UsageFailure(target, "a name is missing");
+  if (options.How != Layout::DeepZoom && options.Overlap > 0)
+    throw files::UsageFailure("--overlap: only the layout deepzoom has that");
+  if (zip && options.Resume) throw files::UsageFailure("--resume: only a folder can be gone on with");
+  std::unique_ptr<TileTarget> into;
+  if (zip)
+    into = std::make_unique<ZipTarget>(target);
+  else
+    into = std::make_unique<FolderTarget>(target.parent_path(), name, TaskOf(source, shape, options),
+                                          options.Resume);
+  Maker maker(shape, name, type, *into, options);
+  MakeLevels(maker, std::move(file), source, options, progress);
+  const Grid& grid = maker.Cut();
+  const std::string id =
+      (options.Address.empty() ? std::string("http://localhost") : options.Address) + "/" + name;
+  WriteText(*into, grid.DescriptionName(name), grid.Description(maker.TileEnding(), id));
+  if (options.Page) WritePage(*into, grid, name, maker.TileEnding(), shape.Density);
+  into->Commit();
+}
+
+}

@@ -1,0 +1,69 @@
+#pragma once
+#include <filesystem>
+#include <memory>
+#include <set>
+#include <string>
+#include <utility>
+
+#include "output.h"
+
+namespace picturezor::tiles {
+
+/// Where the files of a pyramid go. Failures are thrown as files::Failure.
+class TileTarget {
+ public:
+  virtual ~TileTarget() = default;
+  /// A file to write, by its name below the place where the pyramid is to stand. Several threads may begin
+  /// files at once.
+  virtual std::unique_ptr<files::Output> Begin(const std::string& name) const = 0;
+  /// The file is written. Called from one thread.
+  virtual void Add(files::Output& file) = 0;
+  /// All files of a row of a level's tiles have been added; and whether they had been, in an earlier run.
+  virtual void AddRow(int /*level*/, std::int32_t /*row*/) {}
+  virtual bool HasRow(int /*level*/, std::int32_t /*row*/) const { return false; }
+  /// The pyramid is complete.
+  virtual void Commit() = 0;
+};
+
+/// A name's file or folder, and what stands for it until it is complete: NAME.unfinished, which stays where
+/// the work is interrupted.
+class FolderTarget final : public TileTarget {
+ public:
+  /// `name` is what the names of all files begin with. `task` says what is done with what: with `resume` the
+  /// rows of an unfinished pyramid with the same task needn't be made again. Throws where the pyramid is
+  /// there already.
+  FolderTarget(const std::filesystem::path& parent, const std::string& name, const std::string& task,
+               bool resume);
+  std::unique_ptr<files::Output> Begin(const std::string& name) const override;
+  void Add(files::Output& file) override;
+  void AddRow(int level, std::int32_t row) override;
+  bool HasRow(int level, std::int32_t row) const override { return Rows.contains({level, row}); }
+  void Commit() override;
+
+ private:
+  void RequireFree(const std::filesystem::path& file) const;
+
+  std::filesystem::path Parent, Unfinished, JournalName;
+  std::string Name;
+  std::unique_ptr<files::Output> Journal;
+  std::set<std::pair<int, std::int32_t>> Rows;
+};
+
+/// One uncompressed ZIP, with 64 bits where it needs them. It stands under its name when it is complete.
+class ZipTarget final : public TileTarget {
+ public:
+  explicit ZipTarget(const std::filesystem::path& file);
+  ~ZipTarget() override;
+  std::unique_ptr<files::Output> Begin(const std::string& name) const override;
+  void Add(files::Output& file) override;
+  void Commit() override;
+
+ private:
+  void Check(int result) const;
+
+  std::unique_ptr<files::Output> File;
+  struct Archive;
+  std::unique_ptr<Archive> Of;
+};
+
+}
