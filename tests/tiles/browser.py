@@ -108,10 +108,10 @@ def served(folder):
 
 
 @contextlib.contextmanager
-def viewing(*names, temporary=None):
+def viewing(*names, temporary=None, folder=None):
     environment = dict(os.environ, TMPDIR=str(temporary)) if temporary else None
     process = subprocess.Popen([PROGRAM, "view", "--no-open", *map(str, names)], stdout=subprocess.PIPE,
-                               text=True, env=environment)
+                               text=True, env=environment, cwd=folder)
     try:
         yield process.stdout.readline().strip(), process
     finally:
@@ -306,7 +306,8 @@ class Browser(unittest.TestCase):
 
 def screenshot(file):
     browser = new_browser()
-    with viewing(EXAMPLES / "lake.jpg", EXAMPLES / "badge.png") as (address, _):
+    browser.set_window_size(1100, 800)
+    with viewing("lake.jpg", "badge.png", folder=EXAMPLES) as (address, _):
         browser.get(address)
         wait(browser, "document.querySelectorAll('#strip button img').length == 2")
         wait(browser, "document.getElementById('progress').hidden && " + LOADED)
@@ -318,7 +319,10 @@ def screenshot(file):
             .move_by_offset(150, 100).move_by_offset(120, 90).release().perform()
         wait(browser, "!document.getElementById('save').hidden && " + LOADED)
         time.sleep(0.5)
-        browser.save_screenshot(file)
+        with tempfile.TemporaryDirectory() as shots:
+            shot = pathlib.Path(shots) / "shot.png"
+            browser.save_screenshot(str(shot))
+            run("convert", shot, "-o", file)
     browser.quit()
 
 
