@@ -1,6 +1,7 @@
 #include "shown_picture.h"
 
 #include <algorithm>
+#include <chrono>
 #include <cmath>
 
 #include "box_levels.h"
@@ -14,10 +15,11 @@ namespace {
 
 constexpr std::int32_t TileEdge = 256;
 /// A part is made of one that has at most so many times as many rows and columns.
-constexpr double MostReduction = 8;
+constexpr double MostReduction = 4;
 /// The small version's edge.
 constexpr std::int32_t RoughEdge = 1024;
 constexpr std::int32_t RowsTogether = 32;
+constexpr auto MostWaited = std::chrono::seconds(3);
 
 /// Sizes that differ by the way in which a half is rounded.
 bool Alike(files::Extent a, files::Extent b) {
@@ -38,10 +40,8 @@ ShownPicture::ShownPicture(const Opener& opener, const files::StoreOptions& stor
       Grids({Of.Width, Of.Height}, Layout::XYZ, TileEdge, 0) {
   for (const files::Extent size : opener()->Info().Levels)
     if (std::shared_ptr<Plane> plane = FilePlane::Of(opener, size)) Planes.push_back(std::move(plane));
-  if (std::shared_ptr<Plane> whole = FilePlane::Of(opener, {Of.Width, Of.Height})) {
-    Direct = true;
+  if (std::shared_ptr<Plane> whole = FilePlane::Of(opener, {Of.Width, Of.Height}))
     Planes.insert(Planes.begin(), std::move(whole));
-  }
   Worker = flow::StartThread([this] { Work(); });
 }
 
@@ -71,6 +71,22 @@ void ShownPicture::Work() {
     FailedWith = failure.what();
   }
   Finished = true;
+  RoughIs(nullptr);
+}
+
+void ShownPicture::RoughIs(std::shared_ptr<Plane> plane) {
+  {
+    const std::lock_guard lock(Access);
+    if (plane) Rough = std::move(plane);
+    RoughTried = true;
+  }
+  Changed.notify_all();
+}
+
+std::shared_ptr<Plane> ShownPicture::RoughInAMoment() {
+  std::unique_lock lock(Access);
+  Changed.wait_for(lock, MostWaited, [this] { return RoughTried; });
+  return Rough;
 }
 
 void ShownPicture::MakePlanes() {
@@ -87,10 +103,7 @@ void ShownPicture::MakePlanes() {
     RowsRead = Of.Height;
     return;
   }
-  if (std::shared_ptr<Plane> rough = RoughPlane(Open, RoughEdge, Stores.TempDirectory, Stop)) {
-    const std::lock_guard lock(Access);
-    Rough = std::move(rough);
-  }
+  RoughIs(RoughPlane(Open, RoughEdge, Stores.TempDirectory, Stop));
   const int channels = files::ChannelsOf(Of.Of);
   std::vector<std::shared_ptr<MappedPlane>> made(std::size_t(Grids.LevelCount()));
   for (const int level : missing) {
@@ -123,7 +136,7 @@ void ShownPicture::MakePlanes() {
   }
 }
 
-std::shared_ptr<Plane> ShownPicture::PlaneFor(int level, const Rect& part) {
+std::shared_ptr<Plane> ShownPicture::PlaneFor(int level, const Rect& part) const {
   const files::Extent size = Grids.Level(level);
   const std::lock_guard lock(Access);
   std::shared_ptr<Plane> best;
@@ -136,7 +149,7 @@ std::shared_ptr<Plane> ShownPicture::PlaneFor(int level, const Rect& part) {
         plane->Rows() >= std::min<std::int64_t>(last, plane->Size().Height))
       best = plane;
   }
-  return best ? best : Rough;
+  return best;
 }
 
 Picture ShownPicture::Read(Plane& plane, int level, const Rect& part) const {
@@ -198,7 +211,9 @@ std::optional<ShownPicture::Part> ShownPicture::PartOf(int level, const Rect& pa
   const std::int32_t left = std::max(0, part.X - margin), top = std::max(0, part.Y - margin);
   const Rect wide{left, top, std::min(size.Width, part.X + part.Width + margin) - left,
                   std::min(size.Height, part.Y + part.Height + margin) - top};
-  const std::shared_ptr<Plane> plane = PlaneFor(level, wide);
+  std::shared_ptr<Plane> plane = PlaneFor(level, wide);
+  const bool rough = !plane;
+  if (rough) plane = RoughInAMoment();
   if (!plane) return std::nullopt;
   Picture picture = Read(*plane, level, wide);
   if (adjustments.AutoLevel) {
@@ -211,11 +226,6 @@ std::optional<ShownPicture::Part> ShownPicture::PartOf(int level, const Rect& pa
   for (const auto& work : chain) picture = work->Apply(std::move(picture), {.Stores = Stores});
   if (wide.Width != part.Width || wide.Height != part.Height)
     picture = picture.ClipImage({part.X - wide.X, part.Y - wide.Y, part.Width, part.Height});
-  bool rough = false;
-  {
-    const std::lock_guard lock(Access);
-    rough = plane == Rough;
-  }
   return Part{std::move(picture), rough};
 }
 

@@ -1,5 +1,6 @@
 #pragma once
 #include <atomic>
+#include <condition_variable>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -41,16 +42,19 @@ class ShownPicture {
     bool Rough = false;
   };
   /// A part of a level, with so many of the pixels around it as there are up to `margin` for adjustments to
-  /// work on; they are cut off again. Nothing where it isn't there yet.
+  /// work on; they are cut off again. Nothing where it isn't there yet; the small version is waited for, if
+  /// it takes a moment.
   std::optional<Part> PartOf(int level, const Rect& part, const Adjustments& adjustments = {});
 
  private:
-  std::shared_ptr<Plane> PlaneFor(int level, const Rect& part);
+  std::shared_ptr<Plane> PlaneFor(int level, const Rect& part) const;
+  std::shared_ptr<Plane> RoughInAMoment();
   Picture Read(Plane& plane, int level, const Rect& part) const;
   SampleTable LevelTable();
   void Work();
   void MakePlanes();
   void Put(std::shared_ptr<Plane> plane);
+  void RoughIs(std::shared_ptr<Plane> plane);
 
   const Opener Open;
   const files::StoreOptions Stores;
@@ -60,7 +64,9 @@ class ShownPicture {
   /// Largest first.
   std::vector<std::shared_ptr<Plane>> Planes;
   std::shared_ptr<Plane> Rough;
-  bool Direct = false;
+  /// Whether that is there, or never will be.
+  bool RoughTried = false;
+  std::condition_variable Changed;
   std::string FailedWith;
   std::atomic<std::int32_t> RowsRead = 0;
   std::atomic<bool> Finished = false, Stop = false;

@@ -279,7 +279,8 @@ struct ViewServer::Implementation {
     const files::Extent size = plane->Size();
     const Format format = files::Upright(OpenerOf(number)()->Info()).Pixels;
     const Picture small(size.Width, size.Height, format);
-    for (std::int32_t y = 0; y < size.Height; ++y) small.SetRowInFormat(y, format, {plane->Row(y), plane->BytesOfRow()});
+    for (std::int32_t y = 0; y < size.Height; ++y)
+      small.SetRowInFormat(y, format, {plane->Row(y), plane->BytesOfRow()});
     Send(response, Encode(small, format));
   }
 

@@ -289,7 +289,7 @@ class Browser(unittest.TestCase):
 
     def test_an_ended_server_leaves_nothing(self):
         # Not read in parts, so a pyramid is made in temporary files.
-        run("scale", self.folder / "plain.ppm", "--width", 12000, "--fast", "-o", self.folder / "large.png")
+        run("scale", self.folder / "plain.ppm", "--width", 6000, "--fast", "-o", self.folder / "large.png")
         for end in (signal.SIGINT, signal.SIGKILL):
             with self.subTest(end), tempfile.TemporaryDirectory() as temporary:
                 before = set(os.listdir(self.folder))

@@ -3,10 +3,6 @@
 
 #include <algorithm>
 #include <csignal>
-#include <fstream>
-#include <map>
-#include <regex>
-#include <sstream>
 
 #include "cli/command_test_support.h"
 #include "grid.h"
@@ -185,12 +181,12 @@ TEST_F(Tiles, AreThereWhenTheyAreCompleteAndCanBeGoneOnWith) {
   Do({"tiles", "a.png", "--tile", "64", "--format", "png", "-o", "whole"});
   const pid_t process = Start({"tiles", "a.png", "--tile", "64", "--format", "png", "-o", "p"}, 1, 2);
   // A row of the picture's tiles is there.
-  while (!std::filesystem::exists(At("p.unfinished/p_files/11/0_3.png"))) sched_yield();
+  while (!std::filesystem::exists(At("p.unfinished/p_files/11/0_3.png")) &&
+         !std::filesystem::exists(At("p.dzi")))
+    sched_yield();
   kill(process, SIGKILL);
   ASSERT_EQ(WaitFor(process), -SIGKILL);
   EXPECT_FALSE(std::filesystem::exists(At("p.dzi")) || std::filesystem::exists(At("p_files")));
-  std::string before;
-  std::ifstream(At("p.unfinished/journal")) >> before;
   // What the journal says is done isn't made again.
   const path first = At("p.unfinished/p_files/11/0_0.png");
   std::filesystem::resize_file(first, 0);

@@ -86,7 +86,7 @@ function showValues() {
 }
 
 async function watch(number) {
-  for (let shown = 0; number === current;) {
+  for (let shown = 0, when = Date.now(); number === current;) {
     const answer = await fetch(`pictures/${number}/state`);
     if (!answer.ok || number !== current) return;
     const { rows, done, failed } = await answer.json();
@@ -94,13 +94,14 @@ async function watch(number) {
     byId("progress").value = rows / picture.height;
     if (failed) say(failed);
     if (done) {
-      if (shown || watch.waited) showAnew();
+      if (watch.waited) showAnew();
       return;
     }
     watch.waited = true;
     // Now and then what has come to be there is shown.
-    if (rows - shown > picture.height / 8) {
+    if (rows > shown && Date.now() - when > 1500) {
       shown = rows;
+      when = Date.now();
       showAnew();
     }
     await new Promise((resolve) => setTimeout(resolve, 300));
