@@ -67,8 +67,8 @@ Format PixelsBehind(Session& session, const OpenedImage& source, const flow::Cha
 
 }
 
-int Carry(Session& session, const std::filesystem::path& in, const std::filesystem::path& out,
-          flow::Chain chain) {
+Extent Carry(Session& session, const std::filesystem::path& in, const std::filesystem::path& out,
+             flow::Chain chain) {
   Target target(session, out);
   OpenedImage source(session, in);
   try {
@@ -78,7 +78,7 @@ int Carry(Session& session, const std::filesystem::path& in, const std::filesyst
     throw Failure(in, failure.what());
   }
   target.Commit();
-  return Done;
+  return {source.Upright.Width, source.Upright.Height};
 }
 
 }

@@ -20,8 +20,8 @@ std::string Footer(const std::string& more, const std::vector<const char*>& exam
 /// -o, and the options of commands that carry an image through steps into a file.
 void AddCarryOptions(CLI::App& command, Session& session, std::filesystem::path& out);
 steps::Surroundings SurroundingsOf(Session& session);
-/// Reads an image, does what is to be done to it, and writes what comes out.
-int Carry(Session& session, const std::filesystem::path& in, const std::filesystem::path& out,
-          flow::Chain chain);
+/// Reads an image, does what is to be done to it, and writes what comes out. Gives the size of what was read.
+Extent Carry(Session& session, const std::filesystem::path& in, const std::filesystem::path& out,
+             flow::Chain chain);
 
 }

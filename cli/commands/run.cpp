@@ -1,5 +1,7 @@
 #include <CLI/CLI.hpp>
+#include <cstdio>
 #include <fstream>
+#include <iostream>
 #include <iterator>
 
 #include "step_options.h"
@@ -11,7 +13,7 @@ namespace {
 
 struct RunOptions {
   std::filesystem::path In, Out;
-  std::string File;
+  std::string File, Pairs;
 };
 
 std::vector<steps::WrittenStep> StepsOf(const std::string& file) {
@@ -21,6 +23,37 @@ std::vector<steps::WrittenStep> StepsOf(const std::string& file) {
   const auto written = steps::ParseSteps(text, file);
   if (written.empty()) throw UsageFailure(file, "there are no steps in it");
   return written;
+}
+
+/// Does one image after another, with names from a stream. Each result is told at once, since another program
+/// waits for it.
+int RunPairs(Session& session, std::istream& names, const std::vector<steps::WrittenStep>& written) {
+  const auto chain = [&] { return steps::MakeChain(written, SurroundingsOf(session)); };
+  chain();
+  for (std::string in, out; std::getline(names, in, '\0') && std::getline(names, out, '\0');) {
+    std::string failed;
+    Extent size;
+    try {
+      size = Carry(session, in, out, chain());
+    } catch (const std::bad_alloc&) {
+      failed = Failure(in, "not enough memory").what();
+    } catch (const std::exception& failure) {
+      failed = failure.what();
+    }
+    const std::string answer = failed.empty()
+                                   ? "done " + std::to_string(size.Width) + " " + std::to_string(size.Height)
+                                   : "failed " + failed;
+    if (std::fwrite(answer.c_str(), 1, answer.size() + 1, stdout) == 0 || std::fflush(stdout) != 0) break;
+  }
+  return Done;
+}
+
+int RunPairs(Session& session, const RunOptions& options) {
+  const auto written = StepsOf(options.File);
+  if (options.Pairs == "-") return RunPairs(session, std::cin, written);
+  std::ifstream names(options.Pairs, std::ios::binary);
+  if (!names) throw Failure(options.Pairs, "it can't be read");
+  return RunPairs(session, names, written);
 }
 
 }
@@ -36,16 +69,30 @@ void AddRun(CLI::App& app, Session& session) {
       {"run photo.jpg -o out.jpg crop --rect 100,50,1600,1200 : scale --fit 1280x800 : filter unsharp",
        "run scan.tif -o page.png --steps page.steps"}));
   auto options = std::make_shared<RunOptions>();
-  command->add_option("IN", options->In, "Image to read")->required()->type_name("");
-  command->add_option("--steps", options->File, "A text file with the steps")->type_name("FILE");
+  CLI::Option* const in = command->add_option("IN", options->In, "Image to read")->type_name("");
+  CLI::Option* const file =
+      command->add_option("--steps", options->File, "A text file with the steps")->type_name("FILE");
   AddCarryOptions(*command, session, options->Out);
+  CLI::Option* const out = command->get_option("--output")->required(false);
+  command
+      ->add_option("--pairs", options->Pairs,
+                   "Instead of IN and OUT, a file with names of both in turn, each with a zero byte behind\n"
+                   "it; - is standard input. For each pair standard output gets \"done WIDTH HEIGHT\", the\n"
+                   "size of what was read, or \"failed REASON\", and a zero byte")
+      ->type_name("FILE")
+      ->needs(file)
+      ->excludes(in)
+      ->excludes(out);
   command->prefix_command();
   command->callback([&session, options, command] {
     session.Work = [&session, options, words = command->remaining()] {
+      if (!options->Pairs.empty()) return RunPairs(session, *options);
+      if (options->In.empty() || options->Out.empty()) throw UsageFailure("IN and -o OUT are required");
       if (words.empty() == options->File.empty())
         throw UsageFailure("give steps, or --steps and a file of them");
       const auto written = words.empty() ? StepsOf(options->File) : steps::ParseSteps(words);
-      return Carry(session, options->In, options->Out, steps::MakeChain(written, SurroundingsOf(session)));
+      Carry(session, options->In, options->Out, steps::MakeChain(written, SurroundingsOf(session)));
+      return int(Done);
     };
   });
 }

@@ -29,7 +29,8 @@ void AddStep(CLI::App& parent, Session& session, const steps::Step& step, const 
     session.Work = [&session, &step, files, texts] {
       flow::Chain chain;
       chain.push_back(steps::MakeOperation(step, *texts, SurroundingsOf(session)));
-      return Carry(session, files->In, files->Out, std::move(chain));
+      Carry(session, files->In, files->Out, std::move(chain));
+      return Done;
     };
   });
 }

@@ -1,0 +1,124 @@
+"""What a worker does with a group of pictures. Sent along with the work, so that a worker needs nothing but the
+engine and the command; so it uses the standard library and the engine alone."""
+
+import os
+import shutil
+import signal
+import socket
+import subprocess
+import time
+
+# The machine's fault and not the picture's: another machine may do it.
+MACHINE_FAULTS = ("No space left on device", "Disk quota exceeded", "Read-only file system", "no space left for")
+
+
+class _Command:
+    """A process of the command that takes pair after pair of names. A picture that crashes takes it along, and
+    nothing else."""
+
+    def __init__(self, job, memory, threads):
+        # A file without a name, which the child opens as its steps.
+        steps = os.memfd_create("steps")
+        self._errors = os.memfd_create("errors")
+        try:
+            os.write(steps, job["steps"])
+            # The child ends with its worker, also when that is killed.
+            guard = ["setpriv", "--pdeathsig", "TERM"] if shutil.which("setpriv") else []
+            arguments = [*guard, job["command"], "run", "--pairs", "-", "--steps", f"/dev/fd/{steps}", "--quiet",
+                         "--threads", str(threads), *job["writing"]]
+            if memory:
+                arguments += ["--memory-limit", str(memory)]
+            if job["temp_dir"]:
+                arguments += ["--temp-dir", job["temp_dir"]]
+            # In a session of its own, so that Ctrl-C reaches the batch alone.
+            self._process = subprocess.Popen(
+                arguments, stdin=subprocess.PIPE, stdout=subprocess.PIPE, stderr=self._errors, pass_fds=[steps],
+                cwd=job["directory"], start_new_session=True, env={**os.environ, "LC_ALL": "C"})
+        except BaseException:
+            os.close(self._errors)
+            raise
+        finally:
+            os.close(steps)
+
+    def ask(self, source, target):
+        """Makes a picture. Gives its pixels and an empty text, or 0 and what went wrong. Throws EOFError with the
+        reason where the process has ended."""
+        try:
+            self._process.stdin.write(source + b"\0" + target + b"\0")
+            self._process.stdin.flush()
+            answer = b""
+            while not answer.endswith(b"\0"):
+                part = os.read(self._process.stdout.fileno(), 1 << 16)
+                if not part:
+                    raise EOFError
+                answer += part
+        except (EOFError, BrokenPipeError):
+            raise EOFError(self._last_words()) from None
+        word, _, rest = answer[:-1].partition(b" ")
+        if word != b"done":
+            return 0, os.fsdecode(rest)
+        width, height = rest.split()
+        return int(width) * int(height), ""
+
+    def _last_words(self):
+        code = self._process.wait()
+        said = os.pread(self._errors, 1 << 12, 0).decode(errors="replace").strip().splitlines()
+        if said:
+            return said[-1].removeprefix("picturezor: ")
+        if code < 0:
+            return f"the command was ended by signal {-code} ({signal.strsignal(-code)})"
+        return f"the command ended with code {code}"
+
+    def close(self):
+        try:
+            self._process.stdin.close()
+        except BrokenPipeError:
+            pass
+        self._process.stdout.close()
+        self._process.wait()
+        os.close(self._errors)
+
+
+def _machine_fault(message, source, target):
+    if any(fault in message for fault in MACHINE_FAULTS):
+        return message
+    for name in (source, target):
+        if not os.path.isdir(os.path.dirname(name)):
+            return f"{os.fsdecode(os.path.dirname(name))}: not on this machine"
+    return ""
+
+
+def make_group(job, pairs):
+    """Makes the pictures of `pairs`, (source, target) in bytes, one after another. Gives the machine, the worker's
+    address, for each picture (message, seconds, pixels), its message empty where it is done, and what keeps this
+    machine from working: the pictures without an answer then aren't begun or are to be made elsewhere."""
+    from distributed import get_worker
+
+    worker = get_worker()
+    hands = worker.state.nthreads
+    limit = job["memory_limit"] or worker.memory_manager.memory_limit
+    threads = job["threads"] or max(1, len(os.sched_getaffinity(0)) // hands)
+    answers, fault, command = [], "", None
+    try:
+        for source, target in pairs:
+            start = time.perf_counter()
+            pixels = 0
+            try:
+                os.makedirs(os.path.dirname(target), exist_ok=True)
+                command = command or _Command(job, limit and limit // hands, threads)
+                pixels, message = command.ask(source, target)
+            except EOFError as end:
+                message = str(end)
+                command.close()
+                command = None
+            except OSError as error:
+                fault = str(error)
+                break
+            fault = message and _machine_fault(message, source, target)
+            if fault:
+                break
+            answers.append((message, time.perf_counter() - start, pixels))
+    finally:
+        if command:
+            command.close()
+    return {"machine": socket.gethostname(), "worker": worker.address, "answers": answers, "fault": fault}
