@@ -38,7 +38,8 @@ ShownPicture::ShownPicture(const Opener& opener, const files::StoreOptions& stor
       Stores(stores),
       Of(ShapeOf(*opener())),
       Grids({Of.Width, Of.Height}, Layout::XYZ, TileEdge, 0) {
-  for (const files::Extent size : opener()->Info().Levels)
+  const auto reader = opener();
+  for (const files::Extent size : reader->Info().Levels)
     if (std::shared_ptr<Plane> plane = FilePlane::Of(opener, size)) Planes.push_back(std::move(plane));
   if (std::shared_ptr<Plane> whole = FilePlane::Of(opener, {Of.Width, Of.Height}))
     Planes.insert(Planes.begin(), std::move(whole));
