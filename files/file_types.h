@@ -3,8 +3,8 @@
 
 namespace picturezor::files {
 
-// Each stands in the file of its name under types/.
-extern const FileType PNGType, JPEGType, TIFFType, PNMType, WebPType, JPEGXLType, AVIFType, HEICType,
-    JPEG2000Type, SlideType;
+// Each stands in the file of its name under types/. Not all are built: see FileTypes.
+extern const FileType PNGType, JPEGType, TIFFType, PNMType, WebPType, JPEGXLType, JPEG2000Type, AVIFType,
+    HEICType;
 
 }

@@ -53,6 +53,8 @@ std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& op
   std::vector<std::string> names;
   for (const FileType* type : FileTypes()) {
     if (type->Begins(start)) {
+      if (options.Page > 0 && !type->Several)
+        throw Failure(input.Name(), "only the first picture of a file can be read");
       if (type->InOrder || input.Seekable()) return type->Open(input, options);
       return type->Open(
           input.Spooled(options.TempDirectory.empty() ? DefaultTempDirectory() : options.TempDirectory),
@@ -142,9 +144,19 @@ void RequirePlausible(const std::filesystem::path& file, std::int64_t width, std
 }
 
 void RequirePage(const Input& input, const ReadOptions& options, int pages) {
-  if (options.Page < 0 || options.Page >= pages)
-    throw Failure(input.Name(), pages == 1 ? std::string("there is only one picture in it")
-                                           : "there are " + std::to_string(pages) + " pictures in it");
+  if (options.Page >= pages)
+    throw Failure(input.Name(), "there " +
+                                    (pages == 1 ? std::string("is one picture")
+                                                : "are " + std::to_string(pages) + " pictures") +
+                                    " in it");
+}
+
+void TakeAlphaOut(std::uint8_t* row, std::int64_t width, int channels) {
+  for (std::int64_t x = 0; x < width; ++x, row += channels) {
+    const int alpha = row[channels - 1];
+    for (int c = 0; c < channels - 1; ++c)
+      row[c] = std::uint8_t(alpha ? std::min(255, (row[c] * 255 + alpha / 2) / alpha) : 0);
+  }
 }
 
 void RequireWithinLimit(const std::filesystem::path& file, std::int64_t bytes, std::int64_t memoryLimit,

@@ -103,11 +103,14 @@ struct ReadOptions {
 enum class Compression { Usual, None, LZW, Deflate, Zstd, JPEG, WebP };
 
 struct WriteOptions {
-  /// 1 to 100, for JPEG. From 90 on colours are kept at full resolution.
+  /// 1 to 100, for JPEG and the types after it. From 90 on colours are kept at full resolution where a type
+  /// has a choice.
   int Quality = 90;
+  /// Every sample as it is, where a type has a way for that beside its usual one.
+  bool Lossless = false;
   /// How TIFF packs its samples. Types with one way only refuse others than Usual.
   Compression Packing = Compression::Usual;
-  /// The effort of deflate, 0 to 9.
+  /// The effort of packing, 0 to 9: of deflate, and of what other types have instead.
   std::optional<int> Level{};
   /// For TIFF: the edge of square tiles, a multiple of 16; 0 makes strips.
   std::int32_t Tile = 0;
@@ -132,6 +135,8 @@ struct FileType {
   /// Whether files are read in order, from the first byte to the last, and written so; others get an input
   /// and an output in which they can move about.
   bool InOrder;
+  /// Whether ReadOptions chooses one of several pictures of a file.
+  bool Several = false;
   std::unique_ptr<ImageReader> (*Open)(const Input& input, const ReadOptions& options);
   /// Starts a file at the beginning of `descriptor`, which stays the caller's. Of `info` the size, pixels,
   /// profile and density count, and of the notes those that the type has a place for; the orientation is
@@ -177,8 +182,10 @@ void RequirePlausible(const std::filesystem::path& file, std::int64_t width, std
                       std::int64_t fileSize, double pixelsPerByte);
 void RequireWithinLimit(const std::filesystem::path& file, std::int64_t bytes, std::int64_t memoryLimit,
                         const std::string& what);
-/// Refuses a page that isn't there.
+/// Refuses a picture that isn't there.
 void RequirePage(const Input& input, const ReadOptions& options, int pages);
+/// Takes the alpha out of colours that have been multiplied by it, in a row of pixels with alpha.
+void TakeAlphaOut(std::uint8_t* row, std::int64_t width, int channels);
 bool StartsWith(std::span<const std::uint8_t> bytes, std::string_view magic);
 
 }

@@ -5,10 +5,7 @@
 namespace picturezor::files {
 
 bool WholeReader::Select(const Rect& part) {
-  if (WholeWidth == 0) {
-    WholeWidth = About.Width;
-    WholeHeight = About.Height;
-  }
+  if (Whole.Width == 0) Whole = {About.Width, About.Height};
   About.Width = part.Width;
   About.Height = part.Height;
   Left = part.X;
@@ -18,14 +15,15 @@ bool WholeReader::Select(const Rect& part) {
 
 void WholeReader::ReadRow(std::uint8_t* row) {
   const auto channels = std::int64_t{ChannelsOf(About.Pixels)};
-  if (WholeWidth == 0) Select({0, 0, About.Width, About.Height});
+  if (Whole.Width == 0) Whole = {About.Width, About.Height};
   if (Pixels.empty()) {
-    const std::int64_t size = channels * WholeWidth * WholeHeight;
-    RequireWithinLimit(From.Name(), size, Options.MemoryLimit, std::string("a picture in ") + Type().Name);
+    const std::int64_t size = channels * Whole.Width * Whole.Height;
+    RequireWithinLimit(From.Name(), size * Needs, Options.MemoryLimit,
+                       std::string("a picture in ") + Type().Name);
     Pixels.resize(std::size_t(size));
-    Decode(Pixels.data());
+    Decode(Pixels.data(), Whole);
   }
-  std::memcpy(row, &Pixels[std::size_t((std::int64_t{Next++} * WholeWidth + Left) * channels)],
+  std::memcpy(row, &Pixels[std::size_t((std::int64_t{Next++} * Whole.Width + Left) * channels)],
               std::size_t(About.Width * channels));
 }
 

@@ -12,15 +12,18 @@ class WholeReader : public ImageReader {
 
  protected:
   WholeReader(const Input& input, const ReadOptions& options) : From(input), Options(options) {}
-  /// Packed pixels of the size and format that Info() had at first, from the top down.
-  virtual void Decode(std::uint8_t* pixels) = 0;
+  /// Gives packed pixels from the top down, of the whole size: Info() may have that of a part by now.
+  virtual void Decode(std::uint8_t* pixels, const Extent& size) = 0;
 
   Input From;
   ReadOptions Options;
+  /// Bytes that decoding takes for each sample of the picture, which stands in one of them.
+  std::int64_t Needs = 1;
 
  private:
   Bytes Pixels;
-  std::int32_t Left = 0, Next = 0, WholeWidth = 0, WholeHeight = 0;
+  std::int32_t Left = 0, Next = 0;
+  Extent Whole;
 };
 
 }

@@ -19,6 +19,11 @@ void WholeWriter::Finish() { Encode(Pixels.data()); }
 
 void WholeWriter::Put(std::span<const std::uint8_t> bytes) { WriteAll(File, bytes, Path); }
 
+void WholeWriter::RequireUsualPacking() const {
+  if (Options.Packing != Compression::Usual)
+    throw UsageFailure(Path, "this type has --compression 0 to 9 only");
+}
+
 void WholeWriter::Fail(const std::string& reason) const { throw Failure(Path, reason); }
 
 }

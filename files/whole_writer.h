@@ -15,6 +15,8 @@ class WholeWriter : public ImageWriter {
   /// Packed pixels from the top down; the whole file goes to `Put`, in parts.
   virtual void Encode(std::uint8_t* pixels) = 0;
   void Put(std::span<const std::uint8_t> bytes);
+  /// For types that have one way of packing only.
+  void RequireUsualPacking() const;
   [[noreturn]] void Fail(const std::string& reason) const;
 
   std::filesystem::path Path;

@@ -233,7 +233,7 @@ class TIFFReader : public ImageReader {
           row[x * channels] = std::uint8_t(255 - row[x * channels]);
     }
     if (Of.AlphaAt >= 0 && !AsStored()) CopySamples(row + channels - 1, channels, Of.AlphaAt);
-    if (Of.Associated) Divide(row, channels);
+    if (Of.Associated) TakeAlphaOut(row, About.Width, channels);
   }
 
   /// libtiff has read all that belongs to the picture.
@@ -375,15 +375,6 @@ class TIFFReader : public ImageReader {
     else
       for (std::int64_t x = 0; x < About.Width; ++x)
         out[x * step] = std::uint8_t(Raw(x, sample) * 255 / most);
-  }
-
-  /// Takes the alpha out of colours that have been multiplied by it.
-  void Divide(std::uint8_t* row, int channels) const {
-    for (std::int64_t x = 0; x < About.Width; ++x, row += channels) {
-      const int alpha = row[channels - 1];
-      for (int c = 0; c < channels - 1; ++c)
-        row[c] = std::uint8_t(alpha ? std::min(255, (row[c] * 255 + alpha / 2) / alpha) : 0);
-    }
   }
 
   Input From;
