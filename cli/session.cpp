@@ -77,14 +77,20 @@ void AddWriteOptions(CLI::App& command, Session& session) {
                   "Type of the image that is written, like png; what the name ends in otherwise")
       ->type_name("NAME");
   command
-      .add_option("--quality", writing.Quality,
-                  "JPEG quality, 1 to 100, 90 by default; from 90 on colours keep their full resolution")
+      .add_option(
+          "--quality", writing.Quality,
+          "Of JPEG, WebP and other types with loss, 1 to 100, 90 by default; from 90 on colours keep\n"
+          "their full resolution where the type has a choice")
       ->type_name("N")
       ->check(CLI::Range(1, 100));
+  command.add_flag(
+      "--lossless", writing.Lossless,
+      "Every sample as it is in WebP, JPEG XL, AVIF, HEIC and JPEG 2000; PNG, TIFF and PNM are so");
   command
       .add_option_function<std::string>(
           "--compression", [&writing](const std::string& text) { SetCompression(writing, text); },
-          "How hard PNG, or deflate and zstd in TIFF, try: 0 to 9. For TIFF also the way: none, lzw,\n"
+          "How hard PNG and other types, or deflate and zstd in TIFF, try: 0 to 9. For TIFF also the way: "
+          "none, lzw,\n"
           "deflate, zstd, jpeg or webp; lzw by default. Both may be given: --compression zstd,9")
       ->type_name("N|NAME");
   command.add_option("--tile", writing.Tile, "Square tiles in TIFF, of this edge, a multiple of 16")
@@ -127,6 +133,7 @@ std::unique_ptr<ImageWriter> Target::Writer(const Session& session, Format forma
   if (!ProfileFits(info.Profile, format)) info.Profile.clear();
   WriteOptions options = session.Writing;
   options.Threads = threads;
+  options.MemoryLimit = session.Stores.MemoryLimit;
   return Type.Create(Output->Descriptor(), File, info, options);
 }
 

@@ -5,85 +5,14 @@
 #include <cmath>
 #include <cstring>
 
+#include "exif_block.h"
+
 namespace picturezor::files {
 
 namespace {
 
-enum Tag : std::uint32_t {
-  ImageWidth = 0x100,
-  ImageLength = 0x101,
-  StripOffsets = 0x111,
-  OrientationTag = 0x112,
-  XResolution = 0x11A,
-  StripSizes = 0x117,
-  YResolution = 0x11B,
-  ResolutionUnit = 0x128,
-  ThumbnailAt = 0x201,
-  ThumbnailSize = 0x202,
-  CameraDirectory = 0x8769,
-  PixelsAcross = 0xA002,
-  PixelsDown = 0xA003
-};
-enum FieldType : std::uint32_t { Short = 3, Long = 4, Ratio = 5 };
-
-constexpr std::size_t EntrySize = 12;
-
-/// Numbers at places in a block; 0 beyond its end, where nothing is written either.
-class Block {
- public:
-  explicit Block(Bytes bytes) : At(std::move(bytes)), Little(At.size() > 1 && At[0] == 'I' && At[1] == 'I') {}
-
-  bool Valid() const { return Number(2, 2) == 42; }
-  bool Holds(std::size_t place, std::size_t size) const {
-    return place <= At.size() && size <= At.size() - place;
-  }
-
-  std::uint32_t Number(std::size_t place, std::size_t size) const {
-    if (!Holds(place, size)) return 0;
-    std::uint32_t number = 0;
-    for (std::size_t i = 0; i < size; ++i) number = number << 8 | At[place + (Little ? size - 1 - i : i)];
-    return number;
-  }
-  void Put(std::size_t place, std::size_t size, std::uint32_t number) {
-    if (!Holds(place, size)) return;
-    for (std::size_t i = 0; i < size; ++i)
-      At[place + (Little ? i : size - 1 - i)] = std::uint8_t(number >> 8 * i);
-  }
-
-  double RatioAt(std::size_t place) const {
-    const std::uint32_t divisor = Number(place + 4, 4);
-    return divisor ? double(Number(place, 4)) / divisor : 0;
-  }
-
-  /// Calls `look` with the place of each entry of a directory and its tag; gives the place behind them.
-  template <class Look>
-  std::size_t ForEntries(std::size_t directory, Look&& look) const {
-    std::size_t entry = directory + 2;
-    for (std::uint32_t left = Number(directory, 2); left > 0 && Holds(entry, EntrySize);
-         --left, entry += EntrySize)
-      look(entry, Number(entry, 2));
-    return entry;
-  }
-  /// The number that an entry holds, or 0.
-  std::uint32_t ValueAt(std::size_t entry) const {
-    return Number(entry + 8, Number(entry + 2, 2) == Short ? 2 : 4);
-  }
-  void PutEntry(std::size_t entry, std::uint32_t tag, std::uint32_t type, std::uint32_t value) {
-    Put(entry, 2, tag);
-    Put(entry + 2, 2, type);
-    Put(entry + 4, 4, 1);
-    Put(entry + 8, 4, 0);
-    Put(entry + 8, type == Short ? 2 : 4, value);
-  }
-
-  Bytes At;
-
- private:
-  bool Little;
-};
-
 /// What a directory tells of a thumbnail is overwritten, or cut off where it ends the block.
-void DropThumbnail(Block& block, std::size_t directory) {
+void DropThumbnail(ExifBlock& block, std::size_t directory) {
   std::size_t at = 0, size = 0;
   block.ForEntries(directory, [&](std::size_t entry, std::uint32_t tag) {
     if (tag == ThumbnailAt || tag == StripOffsets) at = block.ValueAt(entry);
@@ -96,7 +25,7 @@ void DropThumbnail(Block& block, std::size_t directory) {
     std::memset(block.At.data() + at, 0, size);
 }
 
-void PutSize(Block& block, std::size_t directory, const ImageInfo& info) {
+void PutSize(ExifBlock& block, std::size_t directory, const ImageInfo& info) {
   block.ForEntries(directory, [&](std::size_t entry, std::uint32_t tag) {
     if (tag == PixelsAcross) block.PutEntry(entry, tag, Long, std::uint32_t(info.Width));
     if (tag == PixelsDown) block.PutEntry(entry, tag, Long, std::uint32_t(info.Height));
@@ -107,7 +36,7 @@ void PutSize(Block& block, std::size_t directory, const ImageInfo& info) {
 
 Exif ReadExif(std::span<const std::uint8_t> bytes) {
   Exif exif;
-  const Block block(Bytes(bytes.begin(), bytes.end()));
+  const ExifBlock block(Bytes(bytes.begin(), bytes.end()));
   if (!block.Valid()) return exif;
   Resolution density;
   double inches = 1;
@@ -136,10 +65,10 @@ void SetExif(ImageInfo& info, Bytes block) {
 }
 
 Bytes ExifToWrite(const ImageInfo& info) {
-  Block block(info.Exif);
+  ExifBlock block(info.Exif);
   if (!block.Valid()) {
     if (!info.Density) return {};
-    block = Block({'M', 'M', 0, 42, 0, 0, 0, 0});
+    block = ExifBlock({'M', 'M', 0, 42, 0, 0, 0, 0});
   }
   using Entry = std::array<std::uint8_t, EntrySize>;
   std::vector<Entry> entries;
@@ -235,6 +164,40 @@ Bytes XmpToWrite(const ImageInfo& info) {
   DropElement(text, "xmp:Thumbnails");
   DropElement(text, "xap:Thumbnails");
   return Bytes(text.begin(), text.end());
+}
+
+namespace {
+
+constexpr std::string_view ResourcesStart("Photoshop 3.0\0", 14), ResourceStart("8BIM");
+constexpr std::uint32_t IptcResource = 0x0404;
+
+}
+
+Bytes IptcOfResources(std::span<const std::uint8_t> marker) {
+  if (!StartsWith(marker, ResourcesStart)) return {};
+  // Four letters, a number, a name that tells its length, the size; name and content fill pairs of bytes.
+  const ExifBlock block(Bytes(marker.begin(), marker.end()));
+  for (std::size_t at = ResourcesStart.size(); block.Holds(at, 12);) {
+    if (!StartsWith(marker.subspan(at), ResourceStart)) return {};
+    const std::size_t name = (1 + block.Number(at + 6, 1) + 1) / 2 * 2;
+    const std::size_t size = block.Number(at + 6 + name, 4), content = at + 10 + name;
+    if (!block.Holds(content, size)) return {};
+    const auto first = marker.begin() + std::ptrdiff_t(content);
+    if (block.Number(at + 4, 2) == IptcResource) return Bytes(first, first + std::ptrdiff_t(size));
+    at = content + (size + 1) / 2 * 2;
+  }
+  return {};
+}
+
+Bytes ResourcesWithIptc(const Bytes& iptc) {
+  if (iptc.empty()) return {};
+  Bytes marker(ResourcesStart.begin(), ResourcesStart.end());
+  marker.insert(marker.end(), ResourceStart.begin(), ResourceStart.end());
+  marker.insert(marker.end(), {IptcResource >> 8, IptcResource & 255, 0, 0});
+  for (int shift = 24; shift >= 0; shift -= 8) marker.push_back(std::uint8_t(iptc.size() >> shift));
+  marker.insert(marker.end(), iptc.begin(), iptc.end());
+  if (iptc.size() % 2) marker.push_back(0);
+  return marker;
 }
 
 }

@@ -26,4 +26,9 @@ Bytes ExifToWrite(const ImageInfo& info);
 /// The same for XMP, where its properties of that kind are made true.
 Bytes XmpToWrite(const ImageInfo& info);
 
+/// The records of IPTC in a marker of JPEG that begins with "Photoshop 3.0"; empty where it doesn't.
+Bytes IptcOfResources(std::span<const std::uint8_t> marker);
+/// The content of such a marker; empty where there are no records.
+Bytes ResourcesWithIptc(const Bytes& iptc);
+
 }

@@ -117,6 +117,8 @@ struct WriteOptions {
   /// For TIFF: offsets of 64 bits however small the file is; smaller copies of the picture, each half as
   /// large as the one before, down to a tile.
   bool Big = false, Pyramid = false;
+  /// Bytes that a type may hold which packs a picture as a whole.
+  std::int64_t MemoryLimit = INT64_MAX;
   /// Threads that may encode, the caller's among them; 0 stands for one a processor. The bytes don't depend
   /// on it.
   int Threads = 0;

@@ -8,7 +8,11 @@ namespace picturezor::files {
 WholeWriter::WholeWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info,
                          const WriteOptions& options)
     : Path(target), About(info), Options(options), File(descriptor) {
-  Pixels.reserve(std::size_t(info.Width) * std::size_t(info.Height) * std::size_t(ChannelsOf(info.Pixels)));
+  // The samples, and what libraries make of them.
+  constexpr std::int64_t bytesPerSample = 6;
+  const std::int64_t samples = std::int64_t{info.Width} * info.Height * ChannelsOf(info.Pixels);
+  RequireWithinLimit(target, samples * bytesPerSample, options.MemoryLimit, "to pack a picture of this type");
+  Pixels.reserve(std::size_t(samples));
 }
 
 void WholeWriter::WriteRow(const std::uint8_t* row) {

@@ -20,7 +20,9 @@ namespace picturezor::files {
 
 namespace {
 
-constexpr int ExifMarker = JPEG_APP0 + 1, ProfileMarker = JPEG_APP0 + 2;
+constexpr int NotesMarker = JPEG_APP0 + 1, ProfileMarker = JPEG_APP0 + 2, RecordsMarker = JPEG_APP0 + 13;
+constexpr std::string_view ExifStart("Exif\0\0", 6), XmpStart("http://ns.adobe.com/xap/1.0/\0", 29);
+constexpr std::size_t MostMarkerBytes = 65533;
 constexpr double CentimetresOfInch = 2.54;
 /// A block of 64 samples takes at least a bit.
 constexpr double MostPixelsPerByte = 512;
@@ -125,7 +127,8 @@ class JPEGReader : public ImageReader {
   void Start(std::int64_t memoryLimit) {
     Try([&] {
       jpeg_stdio_src(&Jpeg, File.get());
-      jpeg_save_markers(&Jpeg, ExifMarker, 0xFFFF);
+      jpeg_save_markers(&Jpeg, NotesMarker, 0xFFFF);
+      jpeg_save_markers(&Jpeg, RecordsMarker, 0xFFFF);
       jpeg_save_markers(&Jpeg, ProfileMarker, 0xFFFF);
       jpeg_read_header(&Jpeg, TRUE);
     });
@@ -157,15 +160,16 @@ class JPEGReader : public ImageReader {
   }
 
   void ReadExtras() {
-    constexpr std::string_view start("Exif\0\0", 6);
-    for (auto marker = Jpeg.marker_list; marker; marker = marker->next)
-      if (marker->marker == ExifMarker && marker->data_length > start.size() &&
-          std::memcmp(marker->data, start.data(), start.size()) == 0) {
-        const Exif exif = ReadExif({marker->data + start.size(), marker->data_length - start.size()});
-        About.Orientation = exif.Orientation;
-        About.Density = exif.Density;
-        break;
-      }
+    for (auto marker = Jpeg.marker_list; marker; marker = marker->next) {
+      const std::span<const std::uint8_t> data(marker->data, marker->data_length);
+      const auto rest = [&](std::string_view start) {
+        return Bytes(data.begin() + std::ptrdiff_t(start.size()), data.end());
+      };
+      if (marker->marker == NotesMarker && StartsWith(data, ExifStart) && About.Exif.empty())
+        SetExif(About, rest(ExifStart));
+      if (marker->marker == NotesMarker && StartsWith(data, XmpStart)) About.Xmp = rest(XmpStart);
+      if (marker->marker == RecordsMarker && About.Iptc.empty()) About.Iptc = IptcOfResources(data);
+    }
     if (Jpeg.saw_JFIF_marker && Jpeg.density_unit != 0 && Jpeg.X_density && Jpeg.Y_density) {
       const double inches = Jpeg.density_unit == 2 ? CentimetresOfInch : 1;
       About.Density = {Jpeg.X_density * inches, Jpeg.Y_density * inches};
@@ -222,6 +226,11 @@ class JPEGWriter : public ImageWriter {
   }
 
   void Start(const ImageInfo& info, const WriteOptions& options) {
+    if (options.Lossless) throw UsageFailure(Path, "JPEG has no --lossless; JPEG XL, WebP and PNG have");
+    // CMYK has no JFIF header, so its density needs a block of EXIF.
+    const bool needsExif = !info.Exif.empty() || info.Pixels == Format::CMYK;
+    const Bytes exif = needsExif ? ExifToWrite(info) : Bytes(), xmp = XmpToWrite(info);
+    const Bytes iptc = ResourcesWithIptc(info.Iptc);
     Try([&] {
       jpeg_create_compress(&Jpeg);
       jpeg_stdio_dest(&Jpeg, File.get());
@@ -240,8 +249,9 @@ class JPEGWriter : public ImageWriter {
         Jpeg.Y_density = Density(info.Density->Y);
       }
       jpeg_start_compress(&Jpeg, TRUE);
-      // CMYK has no JFIF header, so its density needs a block of EXIF.
-      if (info.Density && info.Pixels == Format::CMYK) WriteDensityAsExif(*info.Density);
+      WriteMarker(NotesMarker, ExifStart, exif);
+      WriteMarker(NotesMarker, XmpStart, xmp);
+      WriteMarker(RecordsMarker, {}, iptc);
       if (!info.Profile.empty())
         jpeg_write_icc_profile(&Jpeg, info.Profile.data(), unsigned(info.Profile.size()));
     });
@@ -249,22 +259,12 @@ class JPEGWriter : public ImageWriter {
 
   static UINT16 Density(double perInch) { return UINT16(std::clamp(std::lround(perInch), 1L, 65535L)); }
 
-  void WriteDensityAsExif(const Resolution& density) {
-    std::uint8_t block[] = {
-        'E',  'x',  'i', 'f', 0, 0, 'M', 'M', 0, 42, 0, 0,  0, 8, 0, 3,    //
-        0x01, 0x1A, 0,   5,   0, 0, 0,   1,   0, 0,  0, 50,                // XResolution
-        0x01, 0x1B, 0,   5,   0, 0, 0,   1,   0, 0,  0, 58,                // YResolution
-        0x01, 0x28, 0,   3,   0, 0, 0,   1,   0, 2,  0, 0,                 // in inches
-        0,    0,    0,   0,                                                // no further directory
-        0,    0,    0,   0,   0, 0, 0,   100, 0, 0,  0, 0,  0, 0, 0, 100,  // two ratios
-    };
-    const auto put = [&](std::size_t place, double value) {
-      const auto hundredths = std::uint32_t(std::clamp(value * 100, 1.0, 4e9));
-      for (int i = 0; i < 4; ++i) block[6 + place + i] = std::uint8_t(hundredths >> (24 - 8 * i));
-    };
-    put(50, density.X);
-    put(58, density.Y);
-    jpeg_write_marker(&Jpeg, ExifMarker, block, sizeof block);
+  /// A marker that would be too long is left out.
+  void WriteMarker(int marker, std::string_view start, const Bytes& data) {
+    if (data.empty() || start.size() + data.size() > MostMarkerBytes) return;
+    jpeg_write_m_header(&Jpeg, marker, unsigned(start.size() + data.size()));
+    for (const char c : start) jpeg_write_m_byte(&Jpeg, std::uint8_t(c));
+    for (const std::uint8_t c : data) jpeg_write_m_byte(&Jpeg, c);
   }
 
   std::filesystem::path Path;

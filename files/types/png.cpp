@@ -15,6 +15,7 @@ namespace picturezor::files {
 namespace {
 
 constexpr double MetresOfInch = 0.0254;
+constexpr const char* XmpKey = "XML:com.adobe.xmp";
 /// What deflate gives at most for a byte.
 constexpr double MostInflation = 1032;
 
@@ -126,12 +127,19 @@ class PNGReader : public ImageReader, PNGFile {
     png_bytep profile = nullptr, exif = nullptr;
     png_uint_32 profileSize = 0, exifSize = 0, x = 0, y = 0;
     int compression = 0, unit = 0;
+    // What PNG itself tells of the resolution counts more.
+    if (png_get_eXIf_1(Png, Header, &exifSize, &exif)) SetExif(About, Bytes(exif, exif + exifSize));
     if (png_get_iCCP(Png, Header, &name, &compression, &profile, &profileSize))
       About.Profile.assign(profile, profile + profileSize);
     if (png_get_pHYs(Png, Header, &x, &y, &unit) && unit == PNG_RESOLUTION_METER && x && y)
       About.Density = {x * MetresOfInch, y * MetresOfInch};
-    if (png_get_eXIf_1(Png, Header, &exifSize, &exif))
-      About.Orientation = ReadExif({exif, exifSize}).Orientation;
+    png_textp texts = nullptr;
+    const int count = png_get_text(Png, Header, &texts, nullptr);
+    for (const png_text& text : std::span(texts, std::size_t(count)))
+      if (std::strcmp(text.key, XmpKey) == 0) {
+        const std::string_view value(text.text, std::max(text.text_length, text.itxt_length));
+        About.Xmp.assign(value.begin(), value.end());
+      }
   }
 
   /// The passes of an interlaced file fill each other's gaps.
@@ -203,6 +211,13 @@ class PNGWriter : public ImageWriter, PNGFile {
   void Start(const ImageInfo& info) {
     int type = WithoutAlpha(info.Pixels) == Format::RGB ? PNG_COLOR_TYPE_RGB : PNG_COLOR_TYPE_GRAY;
     if (HasAlpha(info.Pixels)) type |= PNG_COLOR_MASK_ALPHA;
+    Bytes exif = info.Exif.empty() ? Bytes() : ExifToWrite(info), xmp = XmpToWrite(info);
+    xmp.push_back(0);
+    png_text text{};
+    text.compression = PNG_ITXT_COMPRESSION_NONE;
+    text.key = const_cast<char*>(XmpKey);
+    text.text = reinterpret_cast<char*>(xmp.data());
+    text.itxt_length = xmp.size() - 1;
     Try([&] {
       png_set_write_fn(Png, this, OnWrite, OnFlush);
       // A profile that libpng finds fault with is left out.
@@ -213,6 +228,8 @@ class PNGWriter : public ImageWriter, PNGFile {
       if (!info.Profile.empty())
         png_set_iCCP(Png, Header, "ICC profile", PNG_COMPRESSION_TYPE_BASE, info.Profile.data(),
                      png_uint_32(info.Profile.size()));
+      if (!exif.empty()) png_set_eXIf_1(Png, Header, png_uint_32(exif.size()), exif.data());
+      if (text.itxt_length) png_set_text(Png, Header, &text, 1);
       if (info.Density)
         png_set_pHYs(Png, Header, png_uint_32(std::lround(info.Density->X / MetresOfInch)),
                      png_uint_32(std::lround(info.Density->Y / MetresOfInch)), PNG_RESOLUTION_METER);

@@ -5,6 +5,7 @@
 #include "failure.h"
 #include "file_types.h"
 #include "tiff_handle.h"
+#include "tiff_notes.h"
 #include "tiff_writer.h"
 
 namespace picturezor::files {
@@ -348,6 +349,9 @@ class TIFFReader : public ImageReader {
     const std::uint8_t* profile = nullptr;
     if (TIFFGetField(*File, TIFFTAG_ICCPROFILE, &size, &profile))
       About.Profile.assign(profile, profile + size);
+    if (TIFFGetField(*File, TIFFTAG_XMLPACKET, &size, &profile)) About.Xmp.assign(profile, profile + size);
+    if (!TIFFIsBigTIFF(*File))
+      ReadTIFFNotes(From, std::int64_t(TIFFCurrentDirOffset(*File)), TIFFIsBigEndian(*File), About);
     File->Check();
   }
 

@@ -81,8 +81,8 @@ std::unique_ptr<TIFFHandle> TIFFHandle::Open(const Input& input, std::int64_t me
   return handle;
 }
 
-std::unique_ptr<TIFFHandle> TIFFHandle::Create(int descriptor, const std::filesystem::path& target,
-                                               bool big) {
+std::unique_ptr<TIFFHandle> TIFFHandle::Create(int descriptor, const std::filesystem::path& target, bool big,
+                                               char order) {
   std::unique_ptr<TIFFHandle> handle(new TIFFHandle(target));
   handle->Writing = true;
   const int copy = fcntl(descriptor, F_DUPFD_CLOEXEC, 0);
@@ -91,7 +91,8 @@ std::unique_ptr<TIFFHandle> TIFFHandle::Create(int descriptor, const std::filesy
   TIFFOpenOptionsSetErrorHandlerExtR(options, OnError, handle.get());
   TIFFOpenOptionsSetWarningHandlerExtR(options, OnWarning, handle.get());
   errno = 0;
-  handle->File = TIFFFdOpenExt(copy, target.c_str(), big ? "w8" : "w", options);
+  handle->File =
+      TIFFFdOpenExt(copy, target.c_str(), (std::string(big ? "w8" : "w") + order).c_str(), options);
   TIFFOpenOptionsFree(options);
   if (!handle->File) close(copy);
   handle->Check(handle->File);

@@ -17,8 +17,9 @@ class TIFFHandle {
  public:
   /// Allocations of libtiff above `memoryLimit` fail.
   static std::unique_ptr<TIFFHandle> Open(const Input& input, std::int64_t memoryLimit);
-  /// Into an open file, whose descriptor stays the caller's.
-  static std::unique_ptr<TIFFHandle> Create(int descriptor, const std::filesystem::path& target, bool big);
+  /// Into an open file, whose descriptor stays the caller's; `order` of the bytes is 'l' or 'b'.
+  static std::unique_ptr<TIFFHandle> Create(int descriptor, const std::filesystem::path& target, bool big,
+                                            char order);
   /// What would be written to a file is appended to `written`, whatever the place.
   static std::unique_ptr<TIFFHandle> CreateInMemory(const std::filesystem::path& target, Bytes& written);
   TIFFHandle(const TIFFHandle&) = delete;

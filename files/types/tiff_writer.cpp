@@ -4,9 +4,11 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "exif.h"
 #include "failure.h"
 #include "pictures.h"
 #include "stream.h"
+#include "tiff_notes.h"
 #include "tiff_pieces.h"
 
 namespace picturezor::files {
@@ -83,9 +85,13 @@ class TIFFWriter : public ImageWriter {
     // LZW makes noise longer by half at most, smaller copies add a third.
     const double worst =
         (options.Pyramid ? 2 : 1.5) * info.Width * double(info.Height) * ChannelsOf(info.Pixels);
-    File = TIFFHandle::Create(descriptor, target, options.Big || worst > 4e9);
+    const bool big = options.Big || worst > 4e9;
+    Bytes exif = info.Exif.empty() ? Bytes() : ExifToWrite(info);
+    File = TIFFHandle::Create(descriptor, target, big, !exif.empty() && exif[0] == 'M' ? 'b' : 'l');
     SetShape(*File, shape);
     SetExtras(true);
+    // Directories of BigTIFF are of another kind.
+    if (!big && !exif.empty()) WriteTIFFNotes(*File, descriptor, target, std::move(exif));
     Levels.push_back(std::make_unique<TIFFPieces>(target, shape, options.Threads,
                                                   [this](const Bytes& piece, const Bytes& tables) {
                                                     if (!tables.empty() && Piece == 0) SetTables(tables);
@@ -160,14 +166,28 @@ class TIFFWriter : public ImageWriter {
     AddBelow(level + 1, half.data());
   }
 
-  void SetExtras(bool withProfile) {
+  void SetExtras(bool first) {
     if (Info.Density) {
       File->Set(TIFFTAG_XRESOLUTION, Info.Density->X);
       File->Set(TIFFTAG_YRESOLUTION, Info.Density->Y);
       File->Set(TIFFTAG_RESOLUTIONUNIT, RESUNIT_INCH);
     }
-    if (withProfile && !Info.Profile.empty())
+    if (!first) return;
+    if (!Info.Profile.empty())
       File->Set(TIFFTAG_ICCPROFILE, std::uint32_t(Info.Profile.size()), Info.Profile.data());
+    if (const Bytes xmp = XmpToWrite(Info); !xmp.empty())
+      File->Set(TIFFTAG_XMLPACKET, std::uint32_t(xmp.size()), xmp.data());
+    if (Info.Iptc.empty()) return;
+    // Some versions of libtiff take them as numbers of 32 bits, in the order of the machine.
+    Bytes records = Info.Iptc;
+    std::size_t count = records.size();
+    if (TIFFFieldDataType(TIFFFieldWithTag(*File, TIFFTAG_RICHTIFFIPTC)) == TIFF_LONG) {
+      count = (count + 3) / 4;
+      records.resize(count * 4);
+      if (TIFFIsByteSwapped(*File))
+        TIFFSwabArrayOfLong(reinterpret_cast<std::uint32_t*>(records.data()), tmsize_t(count));
+    }
+    File->Set(TIFFTAG_RICHTIFFIPTC, std::uint32_t(count), records.data());
   }
 
   void SetTables(const Bytes& tables) {
