@@ -83,6 +83,27 @@ void AddWriteOptions(CLI::App& command, Session& session) {
           "their full resolution where the type has a choice")
       ->type_name("N")
       ->check(CLI::Range(1, 100));
+  const auto target = [&session]() -> TargetProfile& {
+    if (!session.Profile) session.Profile.emplace();
+    return *session.Profile;
+  };
+  CLI::Option* profile =
+      command
+          .add_option_function<std::string>(
+              "--profile", [target](const std::string& name) { target().Profile = ProfileNamed(name); },
+              "Convert the colours: to srgb, adobe-rgb, gray, or the ICC profile in a file; from the image's "
+              "own\n"
+              "profile, or from sRGB where it has none")
+          ->type_name("NAME");
+  command
+      .add_option_function<std::string>(
+          "--intent", [target](const std::string& name) { target().By = Intents().at(name); },
+          "How --profile carries colours over: perceptual (default), relative, saturation or absolute")
+      ->needs(profile)
+      ->type_name("NAME")
+      ->check(CLI::IsMember(Intents()));
+  command.add_flag("--strip", session.Strip,
+                   "Leave out EXIF, XMP, IPTC, the colour profile and the resolution");
   command.add_flag(
       "--lossless", writing.Lossless,
       "Every sample as it is in WebP, JPEG XL, AVIF, HEIC and JPEG 2000; PNG, TIFF and PNM are so");
@@ -102,9 +123,10 @@ void AddWriteOptions(CLI::App& command, Session& session) {
 }
 
 std::unique_ptr<ImageReader> OpenFor(const Session& session, const std::filesystem::path& file) {
-  return OpenNamed(file, {.MemoryLimit = session.Stores.MemoryLimit,
-                          .Threads = session.Threads,
-                          .TempDirectory = session.Stores.TempDirectory});
+  auto reader = OpenNamed(file, {.MemoryLimit = session.Stores.MemoryLimit,
+                                 .Threads = session.Threads,
+                                 .TempDirectory = session.Stores.TempDirectory});
+  return session.Profile ? InProfile(std::move(reader), file, *session.Profile) : std::move(reader);
 }
 
 OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
@@ -131,6 +153,10 @@ std::unique_ptr<ImageWriter> Target::Writer(const Session& session, Format forma
                                             int threads) {
   info.Pixels = format;
   if (!ProfileFits(info.Profile, format)) info.Profile.clear();
+  if (session.Strip) {
+    info.Density.reset();
+    for (Bytes* notes : {&info.Profile, &info.Exif, &info.Xmp, &info.Iptc}) notes->clear();
+  }
   WriteOptions options = session.Writing;
   options.Threads = threads;
   options.MemoryLimit = session.Stores.MemoryLimit;

@@ -8,6 +8,7 @@
 
 #include "failure.h"
 #include "image_file.h"
+#include "in_profile.h"
 #include "named.h"
 #include "pictures.h"
 #include "progress_bar.h"
@@ -31,6 +32,10 @@ struct Session {
   bool Quiet = false;
   StoreOptions Stores;
   WriteOptions Writing;
+  /// Of images that are read; as they are where it is empty.
+  std::optional<TargetProfile> Profile;
+  /// Whether images are written without notes, profile and resolution.
+  bool Strip = false;
   /// Of images that are written; empty where their names tell it.
   std::string TypeName;
   /// 0 is one a processor.

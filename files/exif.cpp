@@ -191,12 +191,13 @@ Bytes IptcOfResources(std::span<const std::uint8_t> marker) {
 
 Bytes ResourcesWithIptc(const Bytes& iptc) {
   if (iptc.empty()) return {};
-  Bytes marker(ResourcesStart.begin(), ResourcesStart.end());
-  marker.insert(marker.end(), ResourceStart.begin(), ResourceStart.end());
-  marker.insert(marker.end(), {IptcResource >> 8, IptcResource & 255, 0, 0});
-  for (int shift = 24; shift >= 0; shift -= 8) marker.push_back(std::uint8_t(iptc.size() >> shift));
+  std::string start(ResourcesStart);
+  start += ResourceStart;
+  start += {char(IptcResource >> 8), char(IptcResource & 255), 0, 0};
+  for (int shift = 24; shift >= 0; shift -= 8) start += char(iptc.size() >> shift);
+  Bytes marker(start.begin(), start.end());
   marker.insert(marker.end(), iptc.begin(), iptc.end());
-  if (iptc.size() % 2) marker.push_back(0);
+  marker.resize((marker.size() + 1) / 2 * 2);
   return marker;
 }
 

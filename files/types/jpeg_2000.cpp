@@ -26,8 +26,16 @@ constexpr double MetresOfInch = 0.0254;
 /// Pictures of one colour take hardly any bytes, whatever their size.
 constexpr double MostPixelsPerByte = 1e9;
 
+void Append(Bytes& bytes, std::string_view text) {
+  const std::size_t at = bytes.size();
+  bytes.resize(at + text.size());
+  std::ranges::copy(text, bytes.begin() + std::ptrdiff_t(at));
+}
+
 void Append(Bytes& bytes, std::uint64_t number, int size) {
-  for (int i = size - 1; i >= 0; --i) bytes.push_back(std::uint8_t(number >> 8 * i));
+  std::string text;
+  for (int i = size - 1; i >= 0; --i) text += char(number >> 8 * i);
+  Append(bytes, text);
 }
 
 /// Bytes in memory as the library reads and writes them.
@@ -339,21 +347,21 @@ class JPEG2000Writer : public WholeWriter {
     Bytes inside, behind;
     if (About.Density) {
       Append(inside, 26, 4);
-      inside.insert(inside.end(), {'r', 'e', 's', ' '});
+      Append(inside, "res ");
       Append(inside, 18, 4);
-      inside.insert(inside.end(), {'r', 'e', 's', 'c'});
+      Append(inside, "resc");
       // Hundredths of pixels a metre don't fit, tens of them do.
       for (const double perInch : {About.Density->Y, About.Density->X}) {
         Append(inside, std::uint64_t(std::clamp(std::lround(perInch / MetresOfInch / 10), 1L, 65535L)), 2);
         Append(inside, 1, 2);
       }
-      inside.insert(inside.end(), {1, 1});
+      Append(inside, "\1\1");
     }
     const auto addNotes = [&](std::string_view uuid, const Bytes& notes) {
       if (notes.empty()) return;
       Append(behind, 8 + uuid.size() + notes.size(), 4);
-      behind.insert(behind.end(), {'u', 'u', 'i', 'd'});
-      behind.insert(behind.end(), uuid.begin(), uuid.end());
+      Append(behind, "uuid");
+      Append(behind, uuid);
       behind.insert(behind.end(), notes.begin(), notes.end());
     };
     if (!About.Exif.empty()) addNotes(ExifUuid, ExifToWrite(About));

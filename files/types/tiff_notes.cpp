@@ -38,10 +38,9 @@ class Gatherer {
   /// Gives the place in the block, or 0 where nothing of the directory is there.
   std::uint32_t Copy(std::int64_t directory, int depth) {
     // A directory in the file's order of bytes, read as a block of its own.
-    ExifBlock file(Into.At[0] == 'I' ? Bytes{'I', 'I'} : Bytes{'M', 'M'});
-    Bytes count(2);
-    if (depth > MostDepth || From.ReadAt(directory, count) != 2) return 0;
-    file.At.insert(file.At.end(), count.begin(), count.end());
+    Bytes start(4, Into.At[0]);
+    if (depth > MostDepth || From.ReadAt(directory, std::span(start).subspan(2)) != 2) return 0;
+    ExifBlock file(std::move(start));
     const std::size_t entries = file.Number(2, 2);
     file.At.resize(4 + entries * EntrySize);
     file.At.resize(4 + From.ReadAt(directory + 2, std::span(file.At).subspan(4)));
