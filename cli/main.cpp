@@ -26,8 +26,7 @@ int Run(int count, char** arguments) {
   Session session;
   session.Stores.MemoryLimit = DefaultMemoryLimit();
   session.Stores.TempDirectory = DefaultTempDirectory();
-  CLI::App app("Scales, converts and combines PNG, JPEG and TIFF images, also ones larger than memory.",
-               "picturezor");
+  CLI::App app("Scales, converts and combines images, also ones larger than memory.", "picturezor");
   app.set_version_flag("--version", "picturezor " PICTUREZOR_VERSION);
   app.require_subcommand(1);
   app.footer(
@@ -36,8 +35,8 @@ int Run(int count, char** arguments) {
       "error); 3 the command line is wrong.\n\n"
       "The module PictureZOR.so is looked for beside the program, then in the library directory beside\n"
       "it; the environment variable PICTUREZOR_MODULE names another one.");
-  for (const auto add : {AddSteps, AddRun, AddChannels, AddCompare, AddInfo, AddThumbnail, AddShow, AddTiles,
-                         AddView, AddCompletion})
+  for (const auto add : {AddSteps, AddRun, AddChannels, AddCompare, AddInfo, AddFormats, AddThumbnail, AddShow,
+                         AddTiles, AddView, AddCompletion})
     add(app, session);
   try {
     app.parse(count, arguments);

@@ -109,6 +109,7 @@ void AddRun(CLI::App& app, Session& session);
 void AddChannels(CLI::App& app, Session& session);
 void AddCompare(CLI::App& app, Session& session);
 void AddInfo(CLI::App& app, Session& session);
+void AddFormats(CLI::App& app, Session& session);
 void AddThumbnail(CLI::App& app, Session& session);
 void AddShow(CLI::App& app, Session& session);
 void AddCompletion(CLI::App& app, Session& session);

@@ -3,8 +3,14 @@
 namespace picturezor::files {
 
 std::span<const FileType* const> FileTypes() {
+  // clang-format off
   static constexpr const FileType* all[] = {
-      &PNGType,      &JPEGType, &TIFFType,
+#ifdef PICTUREZOR_SLIDE
+      &SlideType,
+#endif
+      &PNGType,
+      &JPEGType,
+      &TIFFType,
 #ifdef PICTUREZOR_WEBP
       &WebPType,
 #endif
@@ -12,13 +18,15 @@ std::span<const FileType* const> FileTypes() {
       &JPEGXLType,
 #endif
 #ifdef PICTUREZOR_HEIF
-      &AVIFType,     &HEICType,
+      &AVIFType,
+      &HEICType,
 #endif
 #ifdef PICTUREZOR_JPEG_2000
       &JPEG2000Type,
 #endif
       &PNMType,
   };
+  // clang-format on
   return all;
 }
 

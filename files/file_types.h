@@ -5,6 +5,6 @@ namespace picturezor::files {
 
 // Each stands in the file of its name under types/. Not all are built: see FileTypes.
 extern const FileType PNGType, JPEGType, TIFFType, PNMType, WebPType, JPEGXLType, JPEG2000Type, AVIFType,
-    HEICType;
+    HEICType, SlideType;
 
 }

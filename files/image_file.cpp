@@ -52,7 +52,7 @@ std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& op
   if (start.empty()) throw Failure(input.Name(), "the file is empty");
   std::vector<std::string> names;
   for (const FileType* type : FileTypes()) {
-    if (type->Begins(start)) {
+    if (type->Begins(start) && (!type->Is || type->Is(input))) {
       if (options.Page > 0 && !type->Several)
         throw Failure(input.Name(), "only the first picture of a file can be read");
       if (type->InOrder || input.Seekable()) return type->Open(input, options);

@@ -134,11 +134,15 @@ struct FileType {
   std::int64_t MostEdge;
   /// Told by the first bytes of a file, as many of them as there are, 64 at most.
   bool (*Begins)(std::span<const std::uint8_t> start);
+  /// Where those bytes aren't enough: whether the file is of this type. Null elsewhere.
+  bool (*Is)(const Input& input) = nullptr;
   /// Whether files are read in order, from the first byte to the last, and written so; others get an input
   /// and an output in which they can move about.
   bool InOrder;
   /// Whether ReadOptions chooses one of several pictures of a file.
   bool Several = false;
+  /// Whether parts are read without what is around them.
+  bool Parts = false;
   std::unique_ptr<ImageReader> (*Open)(const Input& input, const ReadOptions& options);
   /// Starts a file at the beginning of `descriptor`, which stays the caller's. Of `info` the size, pixels,
   /// profile and density count, and of the notes those that the type has a place for; the orientation is

@@ -116,6 +116,7 @@ Input::Input(const std::filesystem::path& file) : Of(std::make_shared<Source>(fi
   if (S_ISDIR(about.st_mode)) throw Failure(file, "a directory, not an image");
   if (!S_ISREG(about.st_mode)) throw Failure(file, "not a regular file");
   Of->Size = about.st_size;
+  Of->ByName = true;
 }
 
 Input Input::Memory(std::span<const std::uint8_t> bytes, const std::filesystem::path& name) {

@@ -21,6 +21,8 @@ class Input {
   static Input Descriptor(int descriptor, const std::filesystem::path& name);
 
   const std::filesystem::path& Name() const { return Of->Name; }
+  /// Where it is a file that was opened by its name: that name. Empty elsewhere.
+  std::filesystem::path Path() const { return Of->ByName ? Of->Name : std::filesystem::path(); }
   /// False where the bytes come once, in their order, as through a pipe. Then `Open` may be called once, and
   /// `ReadAt` reaches no further than `Start` did.
   bool Seekable() const { return Of->Size != UnknownSize; }
@@ -55,6 +57,7 @@ class Input {
     /// Where the input begins in the file.
     std::int64_t First = 0;
     int File = -1;
+    bool ByName = false;
     std::span<const std::uint8_t> Held;
     /// Of a pipe the first bytes, of a file all that were asked for at once.
     Bytes Kept;

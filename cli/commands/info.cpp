@@ -31,6 +31,13 @@ int Info(Session& session, const std::filesystem::path& file) {
   else
     std::printf("resolution:  none\n");
   std::printf("profile:     %s\n", ProfileText(stored.Profile).c_str());
+  std::string notes;
+  for (const auto& [name, block] :
+       {std::pair{"EXIF", &stored.Exif}, {"XMP", &stored.Xmp}, {"IPTC", &stored.Iptc}})
+    if (!block->empty()) notes += (notes.empty() ? "" : ", ") + std::string(name);
+  std::printf("notes:       %s\n", notes.empty() ? "none" : notes.c_str());
+  std::printf("pages:       %d\n", stored.Pages);
+  for (const Extent& level : stored.Levels) std::printf("level:       %d x %d\n", level.Width, level.Height);
   for (const std::string& note : stored.Notes) std::printf("note:        %s\n", note.c_str());
   return Done;
 }

@@ -406,6 +406,7 @@ const FileType TIFFType{
           return false;
         },
     .InOrder = false,
+    .Parts = true,
     .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
       return std::make_unique<TIFFReader>(input, options.MemoryLimit);
     },

@@ -1,0 +1,41 @@
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <cstdio>
+
+#include "session.h"
+
+namespace picturezor::cli {
+
+namespace {
+
+int Formats() {
+  std::printf("%-10s %-26s %-5s %-6s %-5s %-6s %-5s %-6s %-6s %s\n", "type", "names", "reads", "writes",
+              "gray", "alpha", "CMYK", "pages", "parts", "stream");
+  for (const FileType* type : FileTypes()) {
+    std::string names;
+    for (const std::string_view ending : type->Extensions) names.append(ending).push_back(' ');
+    const auto yes = [](bool has) { return has ? "yes" : "-"; };
+    const auto holds = [&](auto matches) { return yes(std::ranges::any_of(type->Holds, matches)); };
+    std::printf("%-10s %-26s %-5s %-6s %-5s %-6s %-5s %-6s %-6s %s\n", type->Name, names.c_str(), "yes",
+                yes(type->Create), holds([](Format format) { return WithoutAlpha(format) == Format::G; }),
+                holds(HasAlpha), holds([](Format format) { return WithoutAlpha(format) == Format::CMYK; }),
+                yes(type->Several), yes(type->Parts), yes(type->InOrder));
+  }
+  return Done;
+}
+
+}
+
+void AddFormats(CLI::App& app, Session& session) {
+  CLI::App* command = app.add_subcommand("formats", "Tell which types of files are built in");
+  command->footer(
+      "What a type holds: gray, alpha and CMYK as they are written; pages that FILE[2] picks; parts that "
+      "are\n"
+      "read without the rest of the picture; bytes in order, so that - needs no temporary file.");
+  command->callback([&session] {
+    session.NeedsModule = false;
+    session.Work = Formats;
+  });
+}
+
+}
