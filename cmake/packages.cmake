@@ -35,7 +35,17 @@ set(CPACK_COMPONENT_RUNTIME_DESCRIPTION "Images larger than memory, the same byt
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_NAME libpicturezor-dev)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS
-  "picturezor (= ${PROJECT_VERSION}), libpng-dev, libjpeg-dev, libtiff-dev")
+  "picturezor (= ${PROJECT_VERSION}), libpng-dev, libjpeg-dev, libtiff-dev, liblcms2-dev")
+# Those of the types that are built.
+foreach(pair libwebp:libwebp-dev libjxl:libjxl-dev libheif:libheif-dev libopenjp2:libopenjp2-7-dev
+    openslide:libopenslide-dev)
+  string(REPLACE ":" ";" pair ${pair})
+  list(GET pair 0 library)
+  list(GET pair 1 package)
+  if(library IN_LIST PICTUREZOR_FILES_LIBRARIES)
+    string(APPEND CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS ", ${package}")
+  endif()
+endforeach()
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION "Headers and libraries for programs that use PictureZOR
  C++ headers, static libraries, and files for CMake and pkg-config.")
 include(CPack)

@@ -55,7 +55,7 @@ void AddChannels(CLI::App& app, Session& session) {
       "Example, which writes photo-red.png, photo-green.png and photo-blue.png:\n"
       "  picturezor channels photo.jpg -o photo-{}.png");
   auto options = std::make_shared<ChannelsOptions>();
-  command->add_option("IN", options->In, "Image to read: PNG, JPEG or TIFF")->required()->type_name("");
+  command->add_option("IN", options->In, "Image to read")->required()->type_name("");
   command->add_option("-o,--output", options->Pattern, "Images to write; {} becomes the name of the channel")
       ->required()
       ->type_name("PATTERN");

@@ -89,7 +89,7 @@ void AddShow(CLI::App& app, Session& session) {
       "  picturezor show photo.jpg\n"
       "  picturezor show photo.jpg --width 120 | less -R");
   auto options = std::make_shared<ShowOptions>();
-  command->add_option("FILE", options->File, "Image to show: PNG, JPEG or TIFF")->required()->type_name("");
+  command->add_option("FILE", options->File, "Image to show")->required()->type_name("");
   command->add_option("--width", options->Width, "Columns, whatever the window")
       ->type_name("N")
       ->check(CLI::Range(1, 4000));
