@@ -35,8 +35,8 @@ int Run(int count, char** arguments) {
       "error); 3 the command line is wrong.\n\n"
       "The module PictureZOR.so is looked for beside the program, then in the library directory beside\n"
       "it; the environment variable PICTUREZOR_MODULE names another one.");
-  for (const auto add : {AddSteps, AddRun, AddChannels, AddCompare, AddInfo, AddFormats, AddThumbnail, AddShow,
-                         AddTiles, AddView, AddCompletion})
+  for (const auto add : {AddSteps, AddRun, AddChannels, AddCompare, AddInfo, AddFormats, AddThumbnail,
+                         AddShow, AddTiles, AddView, AddCompletion})
     add(app, session);
   try {
     app.parse(count, arguments);

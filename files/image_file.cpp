@@ -60,7 +60,7 @@ std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& op
           input.Spooled(options.TempDirectory.empty() ? DefaultTempDirectory() : options.TempDirectory),
           options);
     }
-    names.emplace_back(type->Name);
+    if (!type->Is) names.emplace_back(type->Name);
   }
   throw Failure(input.Name(), "not a " + Listed(names) + " image");
 }

@@ -101,7 +101,7 @@ TEST_F(Failures, BadInput) {
     std::string In, Reason;
   } cases[] = {{"missing.png", "No such file"},
                {"folder.png", "directory"},
-               {"text.png", "not a PNG, JPEG, TIFF or PNM image"},
+               {"text.png", "not a PNG, JPEG, TIFF, WebP, JPEG XL, AVIF, HEIC, JPEG 2000 or PNM image"},
                {"empty.jpg", "empty"},
                {"huge.png", "pixels are too many"},
                {"wide.png", "which 100 bytes can't hold"},
