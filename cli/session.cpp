@@ -8,6 +8,7 @@
 #include <map>
 
 #include "begin.h"
+#include "file_types.h"
 
 namespace picturezor::cli {
 
@@ -135,7 +136,14 @@ OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
 }
 
 Target::Target(Session& session, const std::filesystem::path& file)
-    : File(file), Spool(session.Stores.TempDirectory), Type(TypeToWrite(file, session.TypeName)) {}
+    : File(file), Spool(session.Stores.TempDirectory), Type(TypeToWrite(file, session.TypeName)) {
+  const WriteOptions& asked = session.Writing;
+  if (&Type != &TIFFType &&
+      (asked.Packing != Compression::Usual || asked.Tile > 0 || asked.Big || asked.Pyramid))
+    throw UsageFailure(file, std::string(Type.Name) +
+                                 " has no tiles, no pyramid, no 64-bit offsets, and of --compression at most "
+                                 "0 to 9; TIFF has all of them");
+}
 Target::~Target() = default;
 
 Format Target::Storable(Session& session, Format pixels) const {

@@ -1,4 +1,5 @@
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <cstdio>
 #include <fstream>
 #include <iostream>
@@ -15,6 +16,24 @@ struct RunOptions {
   std::filesystem::path In, Out;
   std::string File, Pairs;
 };
+
+/// Text beside a margin, line by line.
+void PrintBeside(const std::string& left, const std::string& text) {
+  for (std::size_t at = 0; at <= text.size();) {
+    const std::size_t end = std::min(text.find('\n', at), text.size());
+    std::printf("  %-26s %s\n", at == 0 ? left.c_str() : "", text.substr(at, end - at).c_str());
+    at = end + 1;
+  }
+}
+
+void List() {
+  for (const steps::Step* step : steps::Steps()) {
+    std::printf("%s%s: %s\n", step == steps::Steps().front() ? "" : "\n", step->Name, step->Help);
+    for (const steps::Option& option : step->Options)
+      PrintBeside(option.ByPlace ? option.Shown() : option.Shown() + " " + option.Stands(),
+                  option.Explained());
+  }
+}
 
 std::vector<steps::WrittenStep> StepsOf(const std::string& file) {
   std::ifstream stream(file, std::ios::binary);
@@ -72,6 +91,13 @@ void AddRun(CLI::App& app, Session& session) {
   CLI::Option* const in = command->add_option("IN", options->In, "Image to read")->type_name("");
   CLI::Option* const file =
       command->add_option("--steps", options->File, "A text file with the steps")->type_name("FILE");
+  command->add_flag_callback(
+      "--list",
+      [] {
+        List();
+        throw CLI::Success();
+      },
+      "Name all steps with their options");
   AddCarryOptions(*command, session, options->Out);
   CLI::Option* const out = command->get_option("--output")->required(false);
   command

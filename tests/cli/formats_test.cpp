@@ -241,6 +241,58 @@ TEST_F(Formats, ProfileAndResolutionGoAlong) {
   EXPECT_THAT(Run({"info", "ink.jpg"}).Out, HasSubstr("150 x 150"));
 }
 
+TEST_F(Formats, ArePackedAsAskedFor) {
+  const Raster picture = Waves(200, 150, 3);
+  WritePNG(At("a.png"), picture);
+  const struct {
+    Arguments Options;
+    int Compression, Tile, Pages;
+    bool Big;
+  } cases[] = {
+      {{}, COMPRESSION_LZW, 0, 1, false},
+      {{"--compression", "none"}, COMPRESSION_NONE, 0, 1, false},
+      {{"--compression", "9"}, COMPRESSION_ADOBE_DEFLATE, 0, 1, false},
+      {{"--compression", "deflate,1", "--tile", "64"}, COMPRESSION_ADOBE_DEFLATE, 64, 1, false},
+      {{"--compression", "zstd", "--bigtiff"}, COMPRESSION_ZSTD, 0, 1, true},
+      {{"--compression", "jpeg", "--quality", "95"}, COMPRESSION_JPEG, 0, 1, false},
+      {{"--pyramid", "--tile", "32"}, COMPRESSION_LZW, 32, 4, false},
+  };
+  for (const auto& [options, compression, tile, pages, big] : cases) {
+    SCOPED_TRACE(testing::PrintToString(options));
+    Arguments all{"convert", "a.png", "-o", "a.tif"};
+    all.insert(all.end(), options.begin(), options.end());
+    Do(all);
+    TIFF* file = TIFFOpen(At("a.tif").c_str(), "r");
+    std::uint16_t packed = 0;
+    std::uint32_t edge = 0;
+    TIFFGetField(file, TIFFTAG_COMPRESSION, &packed);
+    TIFFGetField(file, TIFFTAG_TILEWIDTH, &edge);
+    EXPECT_EQ(packed, compression);
+    EXPECT_EQ(edge, tile);
+    EXPECT_EQ(TIFFNumberOfDirectories(file), pages);
+    EXPECT_EQ(bool(TIFFIsBigTIFF(file)), big);
+    TIFFClose(file);
+    EXPECT_LE(Difference(Converted("a.tif"), picture), compression == COMPRESSION_JPEG ? 8 : 0);
+  }
+  for (const char* level : {"0", "9"}) {
+    Do({"convert", "a.png", "-o", "b.png", "--compression", level});
+    EXPECT_EQ(ReadPNG(At("b.png")), picture);
+    EXPECT_EQ(std::filesystem::file_size(At("b.png")) > picture.Samples.size(), *level == '0');
+  }
+  std::filesystem::remove(At("a.tif"));
+  std::filesystem::remove(At("b.png"));
+  for (const auto& [out, options] : {std::pair<const char*, Arguments>{"b.png", {"--compression", "lzw"}},
+                                     {"b.png", {"--compression", "10"}},
+                                     {"b.jpg", {"--tile", "64"}},
+                                     {"b.jpg", {"--pyramid"}},
+                                     {"b.tif", {"--tile", "20"}}}) {
+    Arguments all{"convert", "a.png", "-o", out};
+    all.insert(all.end(), options.begin(), options.end());
+    EXPECT_EQ(Run(all).Code, 3) << testing::PrintToString(options);
+    EXPECT_FALSE(std::filesystem::exists(At(out)));
+  }
+}
+
 }
 
 }

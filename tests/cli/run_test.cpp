@@ -170,6 +170,14 @@ TEST_F(Runs, AreCompletedByTheShell) {
   }
 }
 
+TEST_F(Runs, StandOnTheirPage) {
+  const Bytes page = ReadBytes(PICTUREZOR_SOURCE_DIR "/docs/steps.md");
+  const std::string list = Run({"run", "--list"}).Out;
+  ASSERT_THAT(list, HasSubstr("\nfilter dither: "));
+  EXPECT_NE(std::string(page.begin(), page.end()).find("```text\n" + list + "```"), std::string::npos)
+      << list;
+}
+
 }
 
 }

@@ -87,6 +87,30 @@ TEST_F(Scaling, BeyondTheMemoryLimit) {
   EXPECT_EQ(Scaled({"--width", "123", "--memory-limit", "100K"}), wanted);
 }
 
+// Twice as large as the result is enough for the reader; PNG has no such way, and half of it isn't twice
+// smaller.
+TEST_F(Scaling, ADraftIsNearAndOnlyAskedFor) {
+  WriteJPEG(At("a.jpg"), Waves(800, 600, 3), {.Orientation = 6});
+  WritePNG(At("a.png"), Noise(80, 60, 3));
+  const struct {
+    const char *In, *Size;
+    int Width, Height, Most;
+  } cases[] = {{"a.jpg", "--percent=12.5", 75, 100, 12},
+               {"a.jpg", "--width=150", 150, 200, 12},
+               {"a.jpg", "--height=402", 302, 402, 0},
+               {"a.png", "--width=20", 20, 15, 0}};
+  for (const auto& [in, size, width, height, most] : cases) {
+    SCOPED_TRACE(size);
+    Do({"scale", in, size, "-o", "exact.png"});
+    Do({"scale", in, size, "--draft", "-o", "draft.png"});
+    const Raster exact = ReadPNG(At("exact.png")), draft = ReadPNG(At("draft.png"));
+    EXPECT_EQ(draft.Width, width);
+    EXPECT_EQ(draft.Height, height);
+    EXPECT_LE(Difference(draft, exact), most);
+    EXPECT_EQ(Difference(draft, exact) == 0, most == 0);
+  }
+}
+
 }
 
 }
