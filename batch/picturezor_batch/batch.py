@@ -1,6 +1,7 @@
 """The work of a batch: groups of pictures on the workers of the engine, results in the journal."""
 
 import collections
+import contextlib
 import itertools
 import os
 import shutil
@@ -265,6 +266,10 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
             _send_along()
             try:
                 _Batch(client, book, recipe, job, fail_fast, task_seconds, progress, stop, outcome).work()
+                if own:
+                    # One that is just coming back would complain of a scheduler that is gone.
+                    with contextlib.suppress(TimeoutError):
+                        client.wait_for_workers(min(workers, count), timeout=20)
             except _Stopped as stopped:
                 outcome.stopped = str(stopped)
         outcome.unfinished = book.count("to do") + book.count("failed") - outcome.done - len(outcome.failed)
