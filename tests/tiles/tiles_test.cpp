@@ -203,7 +203,7 @@ TEST_F(Tiles, AreThereWhenTheyAreCompleteAndCanBeGoneOnWith) {
 TEST_F(Tiles, RefuseWhatCantBe) {
   WritePNG(At("a.png"), Noise(20, 10, 3));
   WriteBytes(At("p_files"), {1});
-  Fail({"tiles", "a.png", "-o", "p"}, "./p_files", "it is there already");
+  Fail({"tiles", "a.png", "-o", "p"}, "p_files", "it is there already");
   std::filesystem::remove(At("p_files"));
   for (const Arguments& wrong : {Arguments{"--format", "tif"},
                                  {"--layout", "iiif", "--overlap", "1"},
