@@ -140,6 +140,21 @@ Input Input::Descriptor(int descriptor, const std::filesystem::path& name) {
   return Input(std::move(source));
 }
 
+std::size_t Input::ReadAt(std::int64_t at, std::span<std::uint8_t> into) const {
+  const std::size_t got = Of->ReadAt(at, into);
+  for (std::size_t i = 0; i < Others.size(); ++i)
+    if (const std::int64_t place = OthersAt + std::int64_t(i) - at; place >= 0 && place < std::int64_t(got))
+      into[std::size_t(place)] = Others[i];
+  return got;
+}
+
+Input Input::With(std::int64_t at, Bytes bytes) const {
+  Input other = *this;
+  other.OthersAt = at;
+  other.Others = std::move(bytes);
+  return other;
+}
+
 Bytes Input::Start(std::size_t most) const {
   if (!Seekable()) Of->Fill(most);
   Bytes start(most);

@@ -33,7 +33,9 @@ class Input {
   /// A stream of its own, from the first byte on.
   Stream Open() const;
   /// Fewer bytes than asked for only where the input ends.
-  std::size_t ReadAt(std::int64_t at, std::span<std::uint8_t> into) const { return Of->ReadAt(at, into); }
+  std::size_t ReadAt(std::int64_t at, std::span<std::uint8_t> into) const;
+  /// The same input, but that ReadAt gives these bytes at their place.
+  Input With(std::int64_t at, Bytes bytes) const;
   /// All bytes at once, kept as long as the input, where they aren't more than `memoryLimit`.
   std::span<const std::uint8_t> All(std::int64_t memoryLimit) const;
   /// The same bytes where any of them can be reached: in a nameless file in `directory` where they came
@@ -67,6 +69,8 @@ class Input {
   explicit Input(std::shared_ptr<Source> source) : Of(std::move(source)) {}
 
   std::shared_ptr<Source> Of;
+  std::int64_t OthersAt = 0;
+  Bytes Others;
 };
 
 }

@@ -6,6 +6,7 @@
 #include "file_types.h"
 #include "tiff_handle.h"
 #include "tiff_notes.h"
+#include "tiff_pages.h"
 #include "tiff_writer.h"
 
 namespace picturezor::files {
@@ -317,7 +318,6 @@ class TIFFReader : public ImageReader {
     }
     const int left = Of.Samples - Of.Colours - (Of.AlphaAt >= 0);
     if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples a pixel left out");
-    if (!TIFFLastDirectory(*File)) About.Notes.push_back("only the first image of the file is used");
     File->Check();
   }
 
@@ -406,9 +406,12 @@ const FileType TIFFType{
           return false;
         },
     .InOrder = false,
+    .Several = true,
     .Parts = true,
     .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<TIFFReader>(input, options.MemoryLimit);
+      return OpenTIFFPage(input, options, [limit = options.MemoryLimit](const Input& page) {
+        return std::make_unique<TIFFReader>(page, limit);
+      });
     },
     .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
                  const WriteOptions& options) -> std::unique_ptr<ImageWriter> {

@@ -1,5 +1,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <tiffio.h>
 #include <unistd.h>
 
 #include <array>
@@ -154,6 +155,58 @@ TEST(Types, AreReadByOtherPrograms) {
   }
   for (const auto& entry : std::filesystem::directory_iterator(directory.Path()))
     std::filesystem::remove(entry);
+}
+
+/// A TIFF of 64 x 48 with a copy of half its size behind it, a page of 8 x 5, and a mask.
+Bytes PagesInTIFF() {
+  const PrivateDirectory directory("/tmp");
+  const std::string path = (directory.Path() / "a.tif").string();
+  TIFF* file = TIFFOpen(path.c_str(), "w");
+  const struct {
+    std::uint32_t Width, Height, Kind;
+    std::uint8_t Sample;
+  } pages[] = {
+      {64, 48, 0, 10}, {32, 24, FILETYPE_REDUCEDIMAGE, 20}, {8, 5, 0, 30}, {8, 5, FILETYPE_MASK, 40}};
+  for (const auto& page : pages) {
+    TIFFSetField(file, TIFFTAG_SUBFILETYPE, page.Kind);
+    TIFFSetField(file, TIFFTAG_IMAGEWIDTH, page.Width);
+    TIFFSetField(file, TIFFTAG_IMAGELENGTH, page.Height);
+    TIFFSetField(file, TIFFTAG_BITSPERSAMPLE, 8);
+    TIFFSetField(file, TIFFTAG_PHOTOMETRIC, PHOTOMETRIC_MINISBLACK);
+    Bytes row(page.Width, page.Sample);
+    for (std::uint32_t y = 0; y < page.Height; ++y) TIFFWriteScanline(file, row.data(), y);
+    TIFFWriteDirectory(file);
+  }
+  TIFFClose(file);
+  const Input input(path);
+  Bytes bytes(std::size_t(input.Size()));
+  input.ReadAt(0, bytes);
+  std::filesystem::remove(path);
+  return bytes;
+}
+
+// Catches pages that are counted wrong, and a copy that is taken for a page or for the picture.
+TEST(Types, TIFFOfSeveralPages) {
+  const Bytes file = PagesInTIFF();
+  const Input input = Input::Memory(file, "made");
+  const struct {
+    int Page, LeastWidth;
+    std::int32_t Width;
+    std::uint8_t Sample;
+  } cases[] = {{0, 0, 64, 10}, {0, 33, 64, 10}, {0, 32, 32, 20},
+               {0, 5, 32, 20}, {1, 0, 8, 30},   {1, 2, 8, 30}};
+  for (const auto& [page, least, width, sample] : cases) {
+    SCOPED_TRACE(testing::Message() << page << ", " << least);
+    const auto reader = OpenImage(input, {.MemoryLimit = 64 << 20, .Page = page});
+    EXPECT_EQ(reader->Info().Pages, 2);
+    EXPECT_EQ(reader->Info().Levels.size(), page == 0 ? 1 : 0);
+    if (least) reader->Reduce(least, 1);
+    ASSERT_EQ(reader->Info().Width, width);
+    Bytes row(std::size_t(width), 0);
+    for (int y = 0; y < reader->Info().Height; ++y) reader->ReadRow(row.data());
+    EXPECT_EQ(row, Bytes(std::size_t(width), sample));
+  }
+  EXPECT_THROW(OpenImage(input, {.MemoryLimit = 64 << 20, .Page = 2}), Failure);
 }
 
 TEST(Types, PNMOfEveryKind) {
