@@ -2,8 +2,6 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
-#include <charconv>
-#include <cmath>
 #include <cstdio>
 #include <map>
 
@@ -196,24 +194,5 @@ void Target::Carry(Session& session, OpenedImage& source, flow::Chain chain, For
 }
 
 void Target::Commit() { Output->Commit(); }
-
-std::int64_t ParseBytes(const std::string& text) {
-  double number = 0;
-  const char* end = text.data() + text.size();
-  auto [rest, failed] = std::from_chars(text.data(), end, number);
-  double unit = 1;
-  if (failed == std::errc() && rest != end) {
-    constexpr std::string_view letters = "KMGT";
-    const auto power = letters.find(char(std::toupper(*rest)));
-    unit = power == letters.npos ? 0 : std::pow(1024.0, double(power + 1));
-    ++rest;
-    if (rest != end && *rest == 'i') ++rest;
-    if (rest != end && *rest == 'B') ++rest;
-  }
-  const double bytes = number * unit;
-  if (failed != std::errc() || rest != end || !(bytes >= 1) || bytes > 1e18)
-    throw UsageFailure("--memory-limit: " + text + " isn't a size like 256M or 2G");
-  return std::int64_t(bytes);
-}
 
 }

@@ -101,8 +101,6 @@ class Target {
   std::unique_ptr<files::Output> Output;
 };
 
-/// "256M", "1.5G" or a plain number of bytes. Throws UsageFailure.
-std::int64_t ParseBytes(const std::string& text);
 /// Each adds its command to the program; AddSteps those that the steps describe.
 void AddSteps(CLI::App& app, Session& session);
 void AddRun(CLI::App& app, Session& session);

@@ -11,14 +11,6 @@ using namespace files;
 
 namespace {
 
-/// The format of files that has a picture's colours and alpha.
-Format FileFormatOf(const std::filesystem::path& file, const Picture& picture) {
-  if (!picture.IsGray() && !picture.IsRGB() && !picture.IsCMYK())
-    throw Failure(file, "the picture has no colours");
-  const Format colours = picture.IsGray() ? Format::G : picture.IsRGB() ? Format::RGB : Format::CMYK;
-  return picture.HasAlpha() ? WithAlpha(colours) : colours;
-}
-
 Picture Load(const Input& input) {
   const StoreOptions stores{Store::Auto, DefaultMemoryLimit(), DefaultTempDirectory()};
   const auto reader = OpenImage(input, {.MemoryLimit = stores.MemoryLimit});
@@ -34,7 +26,7 @@ void Save(Output& output, const FileType& type, const Picture& picture) {
   ImageInfo info;
   info.Width = picture.Width();
   info.Height = picture.Height();
-  info.Pixels = StorableFormat(file, type, FileFormatOf(file, picture));
+  info.Pixels = StorableFormat(file, type, FileFormatOf(picture));
   RequireStorableSize(file, type, info.Width, info.Height);
   const auto writer = type.Create(output.Descriptor(), file, info, {});
   for (std::int32_t y = 0; y < info.Height; ++y) {

@@ -5,7 +5,10 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cctype>
 #include <cerrno>
+#include <charconv>
+#include <cmath>
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
@@ -145,6 +148,25 @@ void ReadUpright(const Picture& picture, ImageReader& reader, Progress& progress
 
 std::int64_t DefaultMemoryLimit() { return FreeMemory() / 2; }
 
+std::int64_t ParseBytes(const std::string& text) {
+  double number = 0;
+  const char* end = text.data() + text.size();
+  auto [rest, failed] = std::from_chars(text.data(), end, number);
+  double unit = 1;
+  if (failed == std::errc() && rest != end) {
+    constexpr std::string_view letters = "KMGT";
+    const auto power = letters.find(char(std::toupper(*rest)));
+    unit = power == letters.npos ? 0 : std::pow(1024.0, double(power + 1));
+    ++rest;
+    if (rest != end && *rest == 'i') ++rest;
+    if (rest != end && *rest == 'B') ++rest;
+  }
+  const double bytes = number * unit;
+  if (failed != std::errc() || rest != end || !(bytes >= 1) || bytes > 1e18)
+    throw UsageFailure(text + " isn't a size like 256M or 2G");
+  return std::int64_t(bytes);
+}
+
 std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector<PictureSize>& sizes) {
   // The module keeps pictures in memory below this, and needs this many rows for a mapped one.
   constexpr std::int64_t mostInMemory = std::int64_t{1} << 31;
@@ -212,6 +234,12 @@ void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress) {
     case 5: read.operator()<5>(); break;
   }
   reader.Finish();
+}
+
+Format FileFormatOf(const Picture& picture) {
+  if (!picture.IsGray() && !picture.IsRGB() && !picture.IsCMYK()) throw Failure("the picture has no colours");
+  const Format colours = picture.IsGray() ? Format::G : picture.IsRGB() ? Format::RGB : Format::CMYK;
+  return picture.HasAlpha() ? WithAlpha(colours) : colours;
 }
 
 bool Convertible(Format from, Format to) {

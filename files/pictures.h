@@ -1,6 +1,7 @@
 #pragma once
 #include <cstdint>
 #include <filesystem>
+#include <string>
 #include <vector>
 
 #include "image_file.h"
@@ -20,6 +21,8 @@ struct StoreOptions {
   std::filesystem::path TempDirectory;
 };
 
+/// "256M", "1.5G" or a plain number of bytes. Throws UsageFailure.
+std::int64_t ParseBytes(const std::string& text);
 /// Half of the memory that is free.
 std::int64_t DefaultMemoryLimit();
 
@@ -51,6 +54,8 @@ ImageInfo Upright(const ImageInfo& info);
 Rect Stored(const Rect& upright, const ImageInfo& info);
 /// Reads all rows into a picture of the upright size and the file's format.
 void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress);
+/// The format of files that has a picture's colours and alpha. Throws Failure for one without colours.
+Format FileFormatOf(const Picture& picture);
 /// Whether `WriteFrom` has a way from a picture's format to a file's.
 bool Convertible(Format from, Format to);
 /// A row in a format of files. A missing alpha becomes opaque. Gray becomes black ink alone, and gray comes

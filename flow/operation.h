@@ -26,8 +26,8 @@ struct Dependence {
     /// gives as many rows as it gets, row i out of those around row i; which rows it gets, and which of the
     /// result count, is the caller's business. So to cut rows off takes no more than to tell it here.
     Bands,
-    /// The work reads the rows from top to bottom, but has to see the whole size: they may arrive while it
-    /// runs, and go some megabytes later.
+    /// The work reads the rows from top to bottom and leaves them as they are, but has to see the whole size:
+    /// they may arrive while it runs, and go some megabytes later.
     InOrder
   };
   Kind Of = Kind::Whole;

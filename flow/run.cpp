@@ -5,6 +5,7 @@
 #include <condition_variable>
 
 #include "arriving_picture.h"
+#include "band_picture.h"
 #include "band_rows.h"
 #include "failure.h"
 #include "in_format.h"
@@ -38,6 +39,19 @@ class Stream {
     }
   }
 
+  /// A picture that isn't changed.
+  Stream(const Picture& picture, const Shape& shape, const RunOptions& options, files::Progress& progress)
+      : Of(shape), Options(options), Report(progress) {
+    if (picture.ImageFormat() != shape.Of) {
+      Whole = Gather(*RowsOf(picture, shape).From(0), options.Stores, progress);
+      return;
+    }
+    Coming = RowsOf(picture, shape);
+    BandsFrom = shape;
+    // Of a mapped one the rows come one by one, so that the work can be stopped.
+    if (!picture.IsMapping()) Standing = picture;
+  }
+
   const Shape& About() const { return Of; }
 
   void Add(const Operation& work) {
@@ -58,6 +72,28 @@ class Stream {
     // Where nothing is left to do they are read ahead.
     if (Coming && !ReadAhead) AddBands(BandChain({}, Of));
     return Coming ? Coming->From(0) : RowsOf(Whole, Of).From(0);
+  }
+
+  Picture TakePicture() {
+    if (Standing) {
+      const Picture made = files::MakePictures(Options.Stores, {{Of.Width, Of.Height, Of.Of}})[0];
+      const bool view = bool(Standing.Parent());
+      if (view && Bands.empty()) {
+        if (!made.CopyPixels(Standing)) throw files::Failure("a row of a picture can't be reached");
+        return made;
+      }
+      if (!view && !made.IsMapping()) {
+        const BandChain chain(std::exchange(Bands, {}), BandsFrom);
+        const int threads = ThreadsOf(Options);
+        ApplyBands(Standing, chain, ChooseBands(chain, threads, MemoryFor(chain)).Rows, threads, made,
+                   Report);
+        return made;
+      }
+    }
+    FlushBands();
+    if (Coming) return Gather(*Coming->From(0), Options.Stores, Report);
+    if (Whole.Parent()) return Gather(*RowsOf(Whole, Of).From(0), Options.Stores, Report);
+    return std::move(Whole);
   }
 
  private:
@@ -99,6 +135,7 @@ class Stream {
     if (!Coming) Coming = RowsOf(std::exchange(Whole, {}), chain.Source());
     const int threads = ThreadsOf(Options);
     const BandSizes sizes = ChooseBands(chain, threads, MemoryFor(chain));
+    Standing = Picture();
     const auto from = [=, source = *Coming](std::int64_t first) {
       return std::make_unique<BandRows>(source, chain, threads, sizes, first);
     };
@@ -108,6 +145,12 @@ class Stream {
 
   /// The work goes on while the rows arrive. This thread reports.
   void ApplyInOrder(const Operation& work) {
+    if (Standing) {
+      Report.Begin("working");
+      Whole = work.Apply(std::move(Standing), {.Stores = Options.Stores, .Threads = ThreadsOf(Options)});
+      Coming.reset();
+      return;
+    }
     const int threads = Coming->Anywhere ? ThreadsOf(Options) : 1;
     ArrivingPicture source(*Coming, threads);
     std::exception_ptr failed;
@@ -154,6 +197,7 @@ class Stream {
     files::StoreOptions stores = Options.Stores;
     stores.MemoryLimit /= std::max(1, work.Pictures());
     if (Coming) {
+      Standing = Picture();
       Whole = Gather(*Coming->From(0), stores, Report);
       Coming.reset();
       ReadAhead = false;
@@ -173,6 +217,8 @@ class Stream {
   std::optional<RowSource> Coming;
   /// Whether those come from bands, which read ahead themselves.
   bool ReadAhead = false;
+  /// The source itself, where that is a picture in memory and nothing was done to it yet.
+  Picture Standing;
   Picture Whole;
   Shape Of;
   std::vector<const Operation*> Bands;
@@ -196,6 +242,23 @@ std::unique_ptr<Rows> Through(OpenFile file, const Chain& chain, const RunOption
   return stream.Take();
 }
 
+Picture ResultOf(const Picture& source, const Shape& shape, const Chain& chain, const RunOptions& options,
+                 files::Progress& progress) {
+  Picture part = source;
+  Shape of = shape;
+  std::size_t first = 0;
+  // What is cut out first is a view. A view that is there already may count its rows another way.
+  for (; first < chain.size() && !source.Parent() && !source.IsMapping(); ++first) {
+    const std::optional<Rect> cut = chain[first]->Cuts();
+    if (!cut) break;
+    of = chain[first]->Result(of);
+    part = part.ClipImage(*cut);
+  }
+  Stream stream(part, of, options, progress);
+  for (; first < chain.size(); ++first) stream.Add(*chain[first]);
+  return stream.TakePicture();
+}
+
 Picture Gather(Rows& rows, const files::StoreOptions& stores, files::Progress& progress) {
   const Shape& shape = rows.About();
   const Picture picture = files::MakePictures(stores, {{shape.Width, shape.Height, shape.Of}})[0];
@@ -204,11 +267,10 @@ Picture Gather(Rows& rows, const files::StoreOptions& stores, files::Progress& p
   return picture;
 }
 
-void Run(OpenFile file, const Chain& chain, Format format, files::ImageWriter& writer,
-         const RunOptions& options, files::Progress& progress) {
+namespace {
+
+void Write(Stream& stream, Format format, files::ImageWriter& writer, files::Progress& progress) {
   const InFormat converted(format);
-  Stream stream(std::move(file), options, progress);
-  for (const auto& work : chain) stream.Add(*work);
   if (stream.About().Of != format) stream.Add(converted);
   const std::unique_ptr<Rows> rows = stream.Take();
   const std::int32_t height = rows->About().Height;
@@ -224,6 +286,21 @@ void Run(OpenFile file, const Chain& chain, Format format, files::ImageWriter& w
     progress.Step(block.Count);
   }
   writer.Finish();
+}
+
+}
+
+void Run(OpenFile file, const Chain& chain, Format format, files::ImageWriter& writer,
+         const RunOptions& options, files::Progress& progress) {
+  Stream stream(std::move(file), options, progress);
+  for (const auto& work : chain) stream.Add(*work);
+  Write(stream, format, writer, progress);
+}
+
+void Run(const Picture& source, const Shape& shape, Format format, files::ImageWriter& writer,
+         const RunOptions& options, files::Progress& progress) {
+  Stream stream(source, shape, options, progress);
+  Write(stream, format, writer, progress);
 }
 
 }

@@ -23,23 +23,32 @@ void FillWithInvertedAlpha(const Picture& mask, const Picture& overlay) {
   }
 }
 
-/// A file that is laid over, or a mask: known from the start, read when it is needed first.
+/// A file or picture that is laid over, or a mask: known from the start, read when it is needed first.
 struct Laid {
-  std::filesystem::path File;
+  std::filesystem::path File = "a picture";
   std::unique_ptr<files::ImageReader> Reader;
+  Picture Given;
   files::PictureSize Size;
 
-  Laid(const std::string& file, const Surroundings& around)
-      : File(file),
-        Reader(files::OpenNamed(
-            File, {.MemoryLimit = around.Stores.MemoryLimit, .TempDirectory = around.Stores.TempDirectory})) {
+  Laid(const Value& of, const Surroundings& around) {
+    if (const auto* picture = std::get_if<Picture>(&of)) {
+      Given = *picture;
+      Size = {Given.Width(), Given.Height(), files::FileFormatOf(Given)};
+      return;
+    }
+    File = std::get<std::string>(of);
+    Reader = files::OpenNamed(
+        File, {.MemoryLimit = around.Stores.MemoryLimit, .TempDirectory = around.Stores.TempDirectory});
     const files::ImageInfo info = files::Upright(Reader->Info());
     Size = {info.Width, info.Height, info.Pixels};
     for (const std::string& note : info.Notes) around.Note(File, note);
   }
   void ReadInto(const Picture& picture) {
     files::Silence silence;
-    files::ReadInto(picture, *Reader, silence);
+    if (Reader)
+      files::ReadInto(picture, *Reader, silence);
+    else if (!picture.CopyPixels(Given))
+      throw Failure(File, "it can't be read");
     Reader.reset();
   }
 };
@@ -47,14 +56,14 @@ struct Laid {
 class Combining final : public flow::Operation {
  public:
   Combining(const Values& values, const Surroundings& around)
-      : Stores(around.Stores), Overlay(values.Text("overlay"), around) {
+      : Stores(around.Stores), Overlay(values.Any("overlay"), around) {
     At = values.Get<Integers>("at");
     How.PreMultipliedSource = values.Flag("premultiplied");
     How.UseColours = true;
     if (values.Has("fore")) How.ForeColour = values.Get<Color>("fore");
     if (values.Has("mask-colour")) How.MaskColour = values.Get<Color>("mask-colour");
     if (!values.Has("mask")) return;
-    Mask.emplace(values.Text("mask"), around);
+    Mask.emplace(values.Any("mask"), around);
     if (Mask->Size.Width != Overlay.Size.Width || Mask->Size.Height != Overlay.Size.Height)
       throw Failure(Mask->File, "the mask must be as large as the overlay");
   }

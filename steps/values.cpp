@@ -228,6 +228,10 @@ Value Checked(const Option& option, Value value) {
           Refuse(option, std::to_string(number) + " isn't a whole number of 32 bits");
       break;
     case Kind::File:
+      if (const auto* picture = std::get_if<Picture>(&value)) {
+        if (!picture->Valid()) Refuse(option, "the picture is closed");
+        break;
+      }
       if (Require<std::string>(option, value, "a file").empty()) Refuse(option, "the name is empty");
       break;
   }

@@ -12,8 +12,9 @@ namespace picturezor::steps {
 
 using Integers = std::vector<std::int64_t>;
 using Numbers = std::vector<double>;
-/// What an option says: a flag, a whole number, a number, a name or file, a colour, or several numbers.
-using Value = std::variant<bool, std::int64_t, double, std::string, Color, Integers, Numbers>;
+/// What an option says: a flag, a whole number, a number, a name or file, a colour, several numbers, or a
+/// picture in a file's place.
+using Value = std::variant<bool, std::int64_t, double, std::string, Color, Integers, Numbers, Picture>;
 
 enum class Kind {
   /// bool; in texts it stands alone.
@@ -33,7 +34,7 @@ enum class Kind {
   Numbers,
   /// Integers, with commas or white space between them; in texts also @ and the name of a file with them.
   IntegersOrFile,
-  /// std::string.
+  /// std::string, or a Picture that isn't changed.
   File
 };
 
@@ -79,6 +80,7 @@ class Values {
   const T& Get(const std::string& name) const {
     return std::get<T>(Of.at(name));
   }
+  const Value& Any(const std::string& name) const { return Of.at(name); }
   bool Flag(const std::string& name) const { return Has(name) && Get<bool>(name); }
   std::int32_t Integer(const std::string& name) const { return std::int32_t(Get<std::int64_t>(name)); }
   double Number(const std::string& name) const { return Get<double>(name); }
