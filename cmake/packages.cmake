@@ -48,4 +48,14 @@ foreach(pair libwebp:libwebp-dev libjxl:libjxl-dev libheif:libheif-dev libopenjp
 endforeach()
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION "Headers and libraries for programs that use PictureZOR
  C++ headers, static libraries, and files for CMake and pkg-config.")
+if(PICTUREZOR_PYTHON)
+  list(APPEND CPACK_COMPONENTS_ALL python)
+  set(CPACK_DEBIAN_PYTHON_PACKAGE_NAME python3-picturezor)
+  set(CPACK_DEBIAN_PYTHON_PACKAGE_SECTION python)
+  # The module is built for one version of the interpreter.
+  set(CPACK_DEBIAN_PYTHON_PACKAGE_DEPENDS
+    "python3 (>= ${PICTUREZOR_PYTHON_VERSION}~), python3 (<< ${PICTUREZOR_PYTHON_NEXT_VERSION}~), python3-numpy")
+  set(CPACK_COMPONENT_PYTHON_DESCRIPTION "Images larger than memory, the same bytes on every machine, in Python
+ Pictures on numpy arrays, with all that PictureZOR does to them.")
+endif()
 include(CPack)

@@ -3,7 +3,8 @@
 #include <pybind11/stl.h>
 #include <pybind11/stl/filesystem.h>
 
-#include <algorithm>
+#include <array>
+#include <atomic>
 #include <filesystem>
 #include <initializer_list>
 #include <memory>
@@ -15,13 +16,13 @@
 #include <tuple>
 #include <vector>
 
+#include "arguments.h"
+#include "pictures.h"
 #include "picturezor/picture.h"
 
 // How Python's pictures stand for the library's: who holds what, who waits for whom, what comes back.
 
 namespace picturezor::python {
-
-namespace py = pybind11;
 
 /// What can't be done though its arguments are right: picturezor.Error.
 class Failed : public std::runtime_error {
@@ -29,45 +30,91 @@ class Failed : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
-/// A picture of Python's.
-struct Handle {
-  explicit Handle(Picture picture, std::shared_ptr<std::recursive_mutex> turn = {})
-      : Of(std::move(picture)), Turn(turn ? std::move(turn) : std::make_shared<std::recursive_mutex>()) {}
-
-  Picture Of;
-  /// Threads take turns at the samples, so a picture and its views share it.
-  std::shared_ptr<std::recursive_mutex> Turn;
-  /// A view that was made when arrays on the samples were, so that they outlive close().
-  Picture Exported;
+/// What Python knows of an object of the library, however it came to it.
+struct State {
+  std::recursive_mutex Access;
   bool Closed = false;
 };
+/// One thread at a time is at a picture, its views, and the host's picture that it may stand on.
+using Turn = std::shared_ptr<State>;
 
-inline const Picture& Opened(const Handle& handle) {
-  if (handle.Closed || !handle.Of.Valid()) throw std::invalid_argument("the picture is closed");
-  return handle.Of;
-}
+/// What a picture hands on to those that are made from it.
+struct Origin {
+  /// Where pictures live; without it half of the free memory counts.
+  std::optional<files::StoreOptions> Stores;
+  /// What was in the file beside the pixels, as of the upright picture.
+  std::optional<files::ImageInfo> Info;
+};
+
+/// A picture of Python's.
+struct Handle {
+  /// Nil becomes picturezor.Error.
+  explicit Handle(Picture picture, std::shared_ptr<const Origin> origin = {});
+
+  Picture Of;
+  /// Of the picture itself, and of what its samples belong to.
+  std::shared_ptr<State> Own;
+  Turn At;
+  std::shared_ptr<const Origin> From;
+  /// The file that it was read from, unchanged since.
+  std::filesystem::path File;
+  int Page = 0;
+};
+
+/// A picture of the host.
+struct HostHandle {
+  explicit HostHandle(HostPicture picture);
+  /// A part of another one.
+  HostHandle(HostPicture picture, Turn at) : Of(std::move(picture)), At(std::move(at)) {}
+
+  HostPicture Of;
+  Turn At;
+};
+
+/// Throws std::invalid_argument once a picture is closed.
+const Picture& Opened(const Handle& handle);
+files::StoreOptions StoresOf(const Handle& handle);
 
 /// Holds the turns of some pictures, without the interpreter's lock, which a thread that waits would keep
 /// from the one that it waits for.
 class AtWork {
  public:
-  explicit AtWork(std::initializer_list<const Handle*> handles) {
-    Turns.reserve(handles.size());
-    for (const Handle* handle : handles)
-      if (handle) Turns.push_back(handle->Turn.get());
-    // In one order everywhere, so that no two threads wait for each other.
-    std::sort(Turns.begin(), Turns.end());
-    Turns.erase(std::unique(Turns.begin(), Turns.end()), Turns.end());
-    for (auto* turn : Turns) turn->lock();
-  }
+  /// Null ones count for nothing.
+  explicit AtWork(std::initializer_list<const Turn*> turns);
   AtWork(const AtWork&) = delete;
-  ~AtWork() {
-    for (auto* turn : Turns) turn->unlock();
-  }
+  ~AtWork();
+  /// The threads that are at work, this one too. Exact for who holds the interpreter's lock.
+  static int Threads() { return Working; }
 
  private:
+  static inline std::atomic<int> Working = 0;
+
   py::gil_scoped_release Released;
-  std::vector<std::recursive_mutex*> Turns;
+  std::array<State*, 4> Held{};
+  std::size_t Count = 0;
+};
+
+/// A reference to something of Python's that is given up on whatever thread.
+class Reference {
+ public:
+  explicit Reference(py::object object);
+  const py::object& Object() const { return *Of; }
+
+ private:
+  std::shared_ptr<py::object> Of;
+};
+
+/// Anything with the buffer protocol, its bytes one after the other.
+struct GivenBytes {
+  explicit GivenBytes(const py::object& object) {
+    if (PyObject_GetBuffer(object.ptr(), &Of, PyBUF_C_CONTIGUOUS) != 0) throw py::error_already_set();
+  }
+  GivenBytes(const GivenBytes&) = delete;
+  ~GivenBytes() { PyBuffer_Release(&Of); }
+  operator std::span<const std::uint8_t>() const {
+    return {static_cast<const std::uint8_t*>(Of.buf), std::size_t(Of.len)};
+  }
+  Py_buffer Of{};
 };
 
 /// How a parameter of the library's is given in Python, and how it gets there.
@@ -75,73 +122,108 @@ template <class T>
 struct Given {
   using Type = T;
   static T Native(const Type& value) { return value; }
-  static const Handle* HandleOf(const Type&) { return nullptr; }
+  static const Turn* TurnOf(const Type&) { return nullptr; }
+  static void RequireOpen(const Type&) {}
 };
 template <>
 struct Given<Picture> {
   using Type = const Handle*;
-  static Picture Native(Type value) { return value ? Opened(*value) : Picture(); }
-  static const Handle* HandleOf(Type value) { return value; }
-};
-template <>
-struct Given<Rect> {
-  using Type = std::tuple<std::int32_t, std::int32_t, std::int32_t, std::int32_t>;
-  static Rect Native(const Type& value) {
-    const auto [x, y, width, height] = value;
-    return {x, y, width, height};
+  static Picture Native(Type value) { return value ? value->Of : Picture(); }
+  static const Turn* TurnOf(Type value) { return value ? &value->At : nullptr; }
+  static void RequireOpen(Type value) {
+    if (value) Opened(*value);
   }
-  static const Handle* HandleOf(const Type&) { return nullptr; }
 };
 template <>
-struct Given<IntegerArray> {
-  using Type = std::vector<std::int32_t>;
+struct Given<HostPicture> {
+  using Type = const HostHandle*;
+  static HostPicture Native(Type value) { return value ? value->Of : HostPicture(); }
+  static const Turn* TurnOf(Type value) { return value ? &value->At : nullptr; }
+  static void RequireOpen(Type) {}
+};
+template <class Enum>
+requires std::is_enum_v<Enum>
+struct Given<Enum> {
+  using Type = Named<Enum>;
+  static Enum Native(const Type& value) { return value; }
+  static const Turn* TurnOf(const Type&) { return nullptr; }
+  static void RequireOpen(const Type&) {}
+};
+template <>
+struct Given<IntegerArray> : Given<std::vector<std::int32_t>> {
   static IntegerArray Native(const Type& value) { return IntegerArray(value); }
-  static const Handle* HandleOf(const Type&) { return nullptr; }
 };
 template <class T>
 using GivenAs = Given<std::remove_cvref_t<T>>;
 
-/// A result as Python gets it: a new picture, a view, or one of the arguments.
-template <class... Handles>
-Handle Wrapped(Picture picture, const char* name, const Handles*... handles) {
-  if (!picture) throw Failed(std::string(name) + ": it can't be done with these pictures");
-  for (const Handle* handle : {handles...})
-    if (handle && handle->Of == picture) return *handle;
-  for (const Handle* handle : {handles...})
-    if (handle && picture.Parent() && handle->Of == picture.Parent()) return Handle(picture, handle->Turn);
-  return Handle(picture);
-}
+/// A result on its way to Python.
+class Result {
+ public:
+  /// To be made while the turns are held. Nil is picturezor.Error.
+  template <class... Arguments>
+  Result(Picture picture, const char* name, const Handle& self, const Arguments&... arguments) {
+    if (!picture) throw Failed(std::string(name) + ": it can't be done with these pictures");
+    const auto compare = [&](const auto& argument) {
+      if constexpr (std::is_same_v<std::remove_cvref_t<decltype(argument)>, const Handle*>)
+        if (argument && argument->Of == picture) Same = argument;
+    };
+    compare(&self);
+    (compare(arguments), ...);
+    if (!Same) New.emplace(std::move(picture), self.From);
+  }
+  /// The very object that was given for it, or a new one.
+  py::object ToPython() && {
+    return Same ? py::cast(Same, py::return_value_policy::reference) : py::cast(std::move(*New));
+  }
+
+ private:
+  const Handle* Same = nullptr;
+  std::optional<Handle> New;
+};
 
 /// A method of the class as one of Python's: the pictures' turns held, the interpreter's lock released, nil
 /// and false become picturezor.Error.
 template <class R, class... A>
 auto Method(const char* name, R (Picture::*method)(A...) const) {
   return [name, method](const Handle& self, typename GivenAs<A>::Type... arguments) {
-    const Picture& picture = Opened(self);
-    std::tuple<std::remove_cvref_t<A>...> native{GivenAs<A>::Native(arguments)...};
-    const auto call = [&]() -> R {
-      const AtWork working({&self, GivenAs<A>::HandleOf(arguments)...});
-      return std::apply([&](auto&... given) -> R { return (picture.*method)(given...); }, native);
+    const auto call = [&](const auto& take) {
+      std::tuple<std::remove_cvref_t<A>...> native{GivenAs<A>::Native(arguments)...};
+      const AtWork working({&self.At, GivenAs<A>::TurnOf(arguments)...});
+      Opened(self);
+      (GivenAs<A>::RequireOpen(arguments), ...);
+      return take(
+          [&] { return std::apply([&](auto&... given) { return (self.Of.*method)(given...); }, native); });
+    };
+    const auto require = [&](const auto& result) {
+      if (!result) throw Failed(std::string(name) + ": it can't be done with these pictures");
     };
     if constexpr (std::is_same_v<R, Picture>) {
-      return Wrapped(call(), name, &self, GivenAs<A>::HandleOf(arguments)...);
+      return call([&](const auto& made) { return Result(made(), name, self, arguments...); }).ToPython();
     } else if constexpr (std::is_same_v<R, bool>) {
-      if (!call()) throw Failed(std::string(name) + ": it can't be done with these pictures");
-    } else if constexpr (std::is_base_of_v<HostPicture, R>) {
-      R result = call();
-      if (!result) throw Failed(std::string(name) + ": the host has no such picture");
-      return result;
+      call([&](const auto& done) { require(done()); });
+    } else if constexpr (std::is_same_v<R, HostPicture> || std::is_same_v<R, GWorld>) {
+      R result = call([](const auto& made) { return made(); });
+      require(result);
+      if constexpr (std::is_same_v<R, GWorld>)
+        return result;
+      else
+        return HostHandle(std::move(result));
     } else {
-      return call();
+      return call([](const auto& value) { return value(); });
     }
   };
 }
 
 using PictureClass = py::class_<Handle>;
 
-// Each adds its part of the class.
+// Each adds its part of the module.
+void AddNames(py::module_& module);
 void AddPictures(py::module_& module, PictureClass& pictures);
-void AddSamples(py::module_& module, PictureClass& pictures);
+/// Lets the class show its samples as a buffer.
+void SetBuffer(PyHeapTypeObject* type);
+void AddSamples(PictureClass& pictures);
 void AddOperations(PictureClass& pictures);
+void AddHostPictures(py::module_& module, PictureClass& pictures);
+void AddFiles(py::module_& module, PictureClass& pictures);
 
 }

@@ -1,3 +1,4 @@
+#include "failure.h"
 #include "handle.h"
 #include "picturezor/host.h"
 
@@ -13,13 +14,34 @@ void AddExceptions(py::module_& module) {
       if (pointer) std::rethrow_exception(pointer);
     } catch (const Failed& failed) {
       error(failed.what());
+    } catch (const files::UsageFailure& failed) {
+      PyErr_SetString(PyExc_ValueError, failed.what());
+    } catch (const files::Failure& failed) {
+      error(failed.what());
     } catch (const HostException& raised) {
-      PyErr_SetString(raised.ClassName() == "OutOfBoundsException" ? PyExc_IndexError : PyExc_ValueError,
-                      raised.what());
+      // The host has one exception for rows that aren't there and for formats without a way to each other.
+      if (std::string_view(raised.what()).starts_with("Conversion"))
+        error(raised.what());
+      else
+        PyErr_SetString(raised.ClassName() == "OutOfBoundsException" ? PyExc_IndexError : PyExc_ValueError,
+                        raised.what());
     } catch (const ModuleError& failed) {
       error(failed.what());
     }
   });
+}
+
+/// What the module and the host have at a time, for those who look for what was left behind.
+py::dict Alive() {
+  const Host::Alive alive = Host::Count();
+  py::dict counts;
+  counts["objects"] = alive.Objects;
+  counts["strings"] = alive.Strings;
+  counts["memory_blocks"] = alive.MemoryBlocks;
+  counts["open_descriptions"] = alive.OpenDescriptions;
+  counts["gworlds"] = alive.GWorlds;
+  counts["pixel_locks"] = alive.PixelLocks;
+  return counts;
 }
 
 }
@@ -27,33 +49,24 @@ void AddExceptions(py::module_& module) {
 PYBIND11_MODULE(_core, module) {
   AddExceptions(module);
   Host::Load();
-  PictureClass pictures(module, "Picture", py::buffer_protocol(),
+  AddNames(module);
+  PictureClass pictures(module, "Picture", py::custom_type_setup(SetBuffer),
                         "An image of 8-bit samples, in memory or in a mapped file, or a view of one.");
-  py::class_<Color>(module, "Colour",
-                    "Red, green and blue; a string like '#ff8000' or a tuple does where one is asked for.")
-      .def(py::init([](const std::string& text) {
-        const std::string digits = text.starts_with('#') ? text.substr(1) : text;
-        std::size_t used = 0;
-        unsigned long value = 0;
-        try {
-          value = std::stoul(digits, &used, 16);
-        } catch (const std::logic_error&) {
-        }
-        if (digits.size() != 6 || used != 6)
-          throw std::invalid_argument(text + " isn't a colour like ff8000");
-        return Color{std::uint8_t(value >> 16), std::uint8_t(value >> 8), std::uint8_t(value)};
-      }))
-      .def(py::init([](const std::tuple<std::uint8_t, std::uint8_t, std::uint8_t>& parts) {
-        return Color{std::get<0>(parts), std::get<1>(parts), std::get<2>(parts)};
-      }))
-      .def_readwrite("red", &Color::Red)
-      .def_readwrite("green", &Color::Green)
-      .def_readwrite("blue", &Color::Blue);
-  py::implicitly_convertible<py::str, Color>();
-  py::implicitly_convertible<py::tuple, Color>();
+  AddHostPictures(module, pictures);
   AddPictures(module, pictures);
-  AddSamples(module, pictures);
+  AddSamples(pictures);
   AddOperations(pictures);
+  AddFiles(module, pictures);
+  module.def("alive", Alive, "How many objects of each kind the module and the host have now.");
+  module.def(
+      "_declarations",
+      [] {
+        std::vector<std::pair<std::string, bool>> rows;
+        for (const auto& row : Host::Methods("PictureZOR"))
+          rows.emplace_back(row.Declaration, row.Assignable);
+        return rows;
+      },
+      "The methods of the class as the module declares them, and whether they can be assigned to.");
 }
 
 }

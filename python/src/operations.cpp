@@ -42,12 +42,13 @@ void AddGeometry(PictureClass& pictures) {
       "rotate_by",
       [](const Handle& self, double angle, int red, int green, int blue, int alpha, int gray, int cyan,
          int magenta, int yellow, int black) {
-        const Picture& picture = Opened(self);
         const auto turned = [&] {
-          const AtWork working({&self});
-          return picture.Rotate(angle, {red, green, blue, alpha, gray, cyan, magenta, yellow, black});
+          const AtWork working({&self.At});
+          return Result(
+              Opened(self).Rotate(angle, {red, green, blue, alpha, gray, cyan, magenta, yellow, black}),
+              "rotate_by", self);
         };
-        return Wrapped(turned(), "rotate_by", &self);
+        return turned().ToPython();
       },
       arg("angle"), py::kw_only(), arg("red") = 0, arg("green") = 0, arg("blue") = 0, arg("alpha") = 0,
       arg("gray") = 0, arg("cyan") = 0, arg("magenta") = 0, arg("yellow") = 0, arg("black") = 0,
@@ -151,6 +152,21 @@ void AddComposition(PictureClass& pictures) {
                           &Picture::FillRectRGB, py::const_)),
                arg("rect"), arg("red"), arg("green"), arg("blue"), arg("alpha"),
                "In a rectangle, with alpha.");
+  pictures.def("fill_rect_rgb",
+               Method("fill_rect_rgb", py::overload_cast<Color>(&Picture::FillRectRGB, py::const_)),
+               arg("colour"));
+  pictures.def(
+      "fill_rect_rgb",
+      Method("fill_rect_rgb", py::overload_cast<Color, std::int32_t>(&Picture::FillRectRGB, py::const_)),
+      arg("colour"), arg("alpha"));
+  pictures.def(
+      "fill_rect_rgb",
+      Method("fill_rect_rgb", py::overload_cast<const Rect&, Color>(&Picture::FillRectRGB, py::const_)),
+      arg("rect"), arg("colour"));
+  pictures.def("fill_rect_rgb",
+               Method("fill_rect_rgb",
+                      py::overload_cast<const Rect&, Color, std::int32_t>(&Picture::FillRectRGB, py::const_)),
+               arg("rect"), arg("colour"), arg("alpha"));
   pictures.def("fill_rect_random",
                Method("fill_rect_random", py::overload_cast<>(&Picture::FillRectRandom, py::const_)),
                "Random samples.");
@@ -163,8 +179,16 @@ void AddComposition(PictureClass& pictures) {
   pictures.def("clear_rect",
                Method("clear_rect", py::overload_cast<const Rect&>(&Picture::ClearRect, py::const_)),
                arg("rect"), "In a rectangle (x, y, width, height).");
-  pictures.def("compare_images", Method("compare_images", &Picture::CompareImages), arg("other"),
-               "The sum of the absolute differences of all samples; -1 when the two can't be compared.");
+  pictures.def(
+      "compare_images",
+      [](const Handle& self, const Handle& other) {
+        const AtWork working({&self.At, &other.At});
+        const std::int64_t difference = Opened(self).CompareImages(Opened(other));
+        if (difference < 0)
+          throw Failed("compare_images: pictures of these sizes or formats can't be compared");
+        return difference;
+      },
+      arg("other"), "The sum of the absolute differences of all samples.");
   pictures.def("copy_pixels",
                Method("copy_pixels", py::overload_cast<Dest>(&Picture::CopyPixels, py::const_)),
                arg("source"), "The pixels of `source`, converted to this picture's format.");
@@ -177,18 +201,15 @@ void AddComposition(PictureClass& pictures) {
                arg("source"), arg("dest"), arg("source_x"), arg("source_y"), "From a place in `source`.");
   pictures.def(
       "combine_with",
-      [](const Handle& self, const Handle* image, const std::tuple<int, int, int, int>& dest, int sourceX,
-         int sourceY, const Handle* mask, bool premultiplied, std::optional<Color> fore,
+      [](const Handle& self, const Handle& image, const Rect& dest, std::int32_t sourceX,
+         std::int32_t sourceY, const Handle* mask, bool premultiplied, std::optional<Color> fore,
          std::optional<Color> maskColour) {
-        const Picture &picture = Opened(self), over = Given<Picture>::Native(image);
-        const CombineOptions options{premultiplied, Given<Picture>::Native(mask), fore || maskColour, fore,
+        const CombineOptions options{premultiplied, mask ? mask->Of : Picture(), fore || maskColour, fore,
                                      maskColour};
-        bool done = false;
-        {
-          const AtWork working({&self, image, mask});
-          done = picture.Combine(over, Given<Rect>::Native(dest), sourceX, sourceY, options);
-        }
-        if (!done) throw Failed("combine_with: it can't be done with these pictures");
+        const AtWork working({&self.At, &image.At, mask ? &mask->At : nullptr});
+        if (mask) Opened(*mask);
+        if (!Opened(self).Combine(Opened(image), dest, sourceX, sourceY, options))
+          throw Failed("combine_with: it can't be done with these pictures");
       },
       arg("image"), arg("dest"), arg("source_x") = 0, arg("source_y") = 0, py::kw_only(),
       arg("mask") = py::none(), arg("premultiplied") = false, arg("fore_colour") = py::none(),

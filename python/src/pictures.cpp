@@ -2,7 +2,7 @@
 
 #include "handle.h"
 
-// What a picture is: formats, making one, properties, views.
+// What a picture is: making one, properties, views, factories.
 
 namespace picturezor::python {
 
@@ -10,135 +10,73 @@ namespace {
 
 using py::arg;
 
-/// Names as strings do where a member of the enumeration is asked for.
-template <class Enum>
-void AddEnum(py::module_& module, const char* name, const char* help,
-             const std::vector<std::pair<const char*, Enum>>& members) {
-  py::enum_<Enum> type(module, name, help);
-  for (const auto& [member, value] : members) type.value(member, value);
-  type.def(py::init([name, members](const std::string& text) {
-    std::string known;
-    for (const auto& [member, value] : members) {
-      if (text == member) return value;
-      known += (known.empty() ? "" : ", ") + std::string(member);
-    }
-    throw std::invalid_argument(text + " is no " + name + "; there are " + known);
-  }));
-  py::implicitly_convertible<py::str, Enum>();
-}
-
-void AddEnums(py::module_& module) {
-  AddEnum<Format>(module, "Format", "How the samples of a pixel lie in memory, a byte each.",
-                  {{"RGB", Format::RGB},
-                   {"RGBA", Format::RGBA},
-                   {"RGBX", Format::RGBX},
-                   {"ARGB", Format::ARGB},
-                   {"XRGB", Format::XRGB},
-                   {"BGR", Format::BGR},
-                   {"BGRA", Format::BGRA},
-                   {"BGRX", Format::BGRX},
-                   {"ABGR", Format::ABGR},
-                   {"XBGR", Format::XBGR},
-                   {"G", Format::G},
-                   {"GA", Format::GA},
-                   {"AG", Format::AG},
-                   {"OneOf3", Format::OneOf3},
-                   {"TwoOf3", Format::TwoOf3},
-                   {"ThreeOf3", Format::ThreeOf3},
-                   {"OneOf4", Format::OneOf4},
-                   {"TwoOf4", Format::TwoOf4},
-                   {"ThreeOf4", Format::ThreeOf4},
-                   {"FourOf4", Format::FourOf4},
-                   {"Buffer", Format::Buffer},
-                   {"CMYK", Format::CMYK},
-                   {"CMYKA", Format::CMYKA},
-                   {"ACMYK", Format::ACMYK},
-                   {"CMYKX", Format::CMYKX},
-                   {"XCMYK", Format::XCMYK},
-                   {"KYMC", Format::KYMC},
-                   {"KYMCA", Format::KYMCA},
-                   {"AKYMC", Format::AKYMC},
-                   {"KYMCX", Format::KYMCX},
-                   {"XKYMC", Format::XKYMC},
-                   {"Scaling1", Format::Scaling1},
-                   {"Scaling2", Format::Scaling2},
-                   {"Scaling3", Format::Scaling3},
-                   {"Scaling4", Format::Scaling4},
-                   {"Scaling5", Format::Scaling5},
-                   {"Scaling6", Format::Scaling6},
-                   {"Scaling7", Format::Scaling7},
-                   {"Scaling8", Format::Scaling8}});
-  AddEnum<Kernel>(module, "Kernel", "How samples are weighted when a picture is resampled.",
-                  {{"triangle", Kernel::Triangle},
-                   {"box", Kernel::Box},
-                   {"lanczos3", Kernel::Lanczos3},
-                   {"lanczos8", Kernel::Lanczos8},
-                   {"mitchell", Kernel::Mitchell},
-                   {"poly3", Kernel::Poly3},
-                   {"cubic", Kernel::Cubic}});
-  AddEnum<DitherMatrix>(module, "DitherMatrix", "The pattern of thresholds of a dither.",
-                        {{"magic2x2", DitherMatrix::Magic2x2},
-                         {"magic4x4", DitherMatrix::Magic4x4},
-                         {"ordered4x4", DitherMatrix::Ordered4x4},
-                         {"lines4x4", DitherMatrix::Lines4x4},
-                         {"halftone", DitherMatrix::Halftone90_6x6},
-                         {"ordered6x6", DitherMatrix::Ordered6x6},
-                         {"ordered8x8", DitherMatrix::Ordered8x8},
-                         {"cluster3", DitherMatrix::Cluster3},
-                         {"cluster4", DitherMatrix::Cluster4},
-                         {"cluster8", DitherMatrix::Cluster8}});
-}
-
-Handle Made(Picture picture) {
-  if (!picture || !picture.Valid()) throw Failed("not enough memory or disk space for such a picture");
-  return Handle(std::move(picture));
-}
-
 void RequireSize(std::int32_t width, std::int32_t height) {
   if (width < 1 || height < 1) throw std::invalid_argument("a picture has at least one row and one column");
 }
 
 void AddConstructors(PictureClass& pictures) {
-  pictures.def(py::init([](std::int32_t width, std::int32_t height, Format format) {
+  using NamedFormat = Named<Format>;
+  const NamedFormat rgb = Format::RGB;
+  pictures.def(py::init([](std::int32_t width, std::int32_t height, NamedFormat format) {
                  RequireSize(width, height);
-                 return Made(Picture(width, height, format));
+                 return Handle(Picture(width, height, format));
                }),
-               arg("width"), arg("height"), arg("format") = Format::RGB,
-               "A picture in memory, all samples 0.");
+               arg("width"), arg("height"), arg("format") = rgb, "A picture in memory, all samples 0.");
   pictures.def_static(
       "mapped",
-      [](const std::filesystem::path& file, std::int32_t width, std::int32_t height, Format format,
+      [](const std::filesystem::path& file, std::int32_t width, std::int32_t height, NamedFormat format,
          std::int32_t block) {
         RequireSize(width, height);
         if (height < 5) throw std::invalid_argument("a mapped picture has at least 5 rows");
-        return Made(Picture::Mapped(file, width, height, format, block));
+        return Handle(Picture::Mapped(file, width, height, format, block));
       },
-      arg("file"), arg("width"), arg("height"), arg("format") = Format::RGB, arg("block_size") = 0,
-      "A picture in a temporary file, which is created or overwritten and goes away with the picture.");
+      arg("file"), arg("width"), arg("height"), arg("format") = rgb, arg("block_size") = 0,
+      "A picture in a temporary file, which is created or overwritten and goes away with the picture. About "
+      "block_size bytes of it, at least 16 MiB, are in the address space at a time.");
+  pictures.def_static(
+      "from_host",
+      [](const HostHandle& picture, bool useAlpha) {
+        const AtWork working({&picture.At});
+        return Handle(Picture(picture.Of, useAlpha));
+      },
+      arg("picture"), arg("use_alpha") = false,
+      "A picture on the pixels of one of the host, its alpha on the mask's.");
   pictures.def_static(
       "create",
-      [](std::int32_t width, std::int32_t height, Format format) {
+      [](std::int32_t width, std::int32_t height, NamedFormat format) {
         RequireSize(width, height);
-        return Made(Picture::Create(width, height, format));
+        const AtWork working({});
+        return Handle(Picture::Create(width, height, format));
       },
-      arg("width"), arg("height"), arg("format") = Format::RGB,
-      "A picture from the global factory, or in memory.");
-  pictures.def_static("calculate_memory", &Picture::CalculateMemory, arg("width"), arg("height"),
+      arg("width"), arg("height"), arg("format") = rgb, "A picture from the global factory, or in memory.");
+  const auto byFormat = [](auto function) {
+    return [function](std::int32_t width, std::int32_t height, NamedFormat format) {
+      return function(width, height, format);
+    };
+  };
+  pictures.def_static("calculate_memory", byFormat(&Picture::CalculateMemory), arg("width"), arg("height"),
                       arg("format"), "Bytes that a picture in memory takes; 0 where it can't be.");
-  pictures.def_static("can_allocate", &Picture::CanAllocate, arg("width"), arg("height"), arg("format"),
-                      "Whether there is memory for such a picture now.");
-  pictures.def("create_picture", Method("create_picture", &Picture::CreatePicture), arg("width"),
-               arg("height"), arg("format"), "A picture from this picture's factory, or in memory.");
-  pictures.def("clone", Method("clone", &Picture::Clone), "A copy in memory.");
+  pictures.def_static("can_allocate", byFormat(&Picture::CanAllocate), arg("width"), arg("height"),
+                      arg("format"), "Whether there is memory for such a picture now.");
+  pictures.def(
+      "create_picture",
+      [](const Handle& self, std::int32_t width, std::int32_t height, NamedFormat format) {
+        RequireSize(width, height);
+        const AtWork working({&self.At});
+        return Handle(Opened(self).CreatePicture(width, height, format), self.From);
+      },
+      arg("width"), arg("height"), arg("format"), "A picture from this picture's factory, or in memory.");
+  pictures.def("clone", Method("clone", &Picture::Clone),
+               "A copy in memory of a picture that is there too; copy() does with every picture.");
   pictures.def(
       "close",
-      [](Handle& self) {
-        const AtWork working({&self});
-        if (!std::exchange(self.Closed, true)) self.Of.Close();
+      [](const Handle& self) {
+        const AtWork working({&self.At});
+        if (!std::exchange(self.Own->Closed, true)) self.Of.Close();
       },
       "End the picture. Views and arrays of it go on working; anything else raises ValueError from now on.");
   pictures.def("__enter__", [](py::object self) { return self; });
-  pictures.def("__exit__", [](py::object self, py::args) { self.attr("close")(); });
+  pictures.def("__exit__", [](const py::object& self, const py::args&) { self.attr("close")(); });
 }
 
 template <class T>
@@ -149,16 +87,15 @@ void Property(PictureClass& pictures, const char* name, T (Picture::*get)() cons
 
 void AddProperties(PictureClass& pictures) {
   pictures.def_property_readonly(
-      "valid", [](const Handle& self) { return !self.Closed && self.Of.Valid(); },
-      "False once it is closed.");
+      "valid", [](const Handle& self) { return !self.Own->Closed; }, "False once it is closed.");
   Property(pictures, "width", &Picture::Width, "Columns.");
   Property(pictures, "height", &Picture::Height, "Rows.");
   Property(pictures, "image_format", &Picture::ImageFormat, "The pixel format.");
-  Property(pictures, "image_format_string", &Picture::ImageFormatString, "Its name.");
-  Property(pictures, "pixel_size", &Picture::PixelSize,
-           "Bytes from pixel to pixel; negative in a mirrored view.");
+  Property(pictures, "image_format_string", &Picture::ImageFormatString,
+           "Its name; empty where it has none.");
+  Property(pictures, "pixel_size", &Picture::PixelSize, "Bytes from pixel to pixel.");
   Property(pictures, "row_size", &Picture::RowSize, "Bytes from row to row.");
-  Property(pictures, "row_offset", &Picture::RowOffset, "Bytes from the start of a row to its first pixel.");
+  Property(pictures, "row_offset", &Picture::RowOffset, "Rows of the store above those of a view.");
   Property(pictures, "total_size", &Picture::TotalSize, "Bytes of all rows.");
   Property(pictures, "channel_count", &Picture::ChannelCount, "Channels, alpha included.");
   Property(pictures, "is_gray", &Picture::IsGray, "Whether its colours are gray.");
@@ -188,23 +125,49 @@ void AddProperties(PictureClass& pictures) {
   pictures.def_property(
       "mapping_block_size", [](const Handle& self) { return Opened(self).MappingBlockSize(); },
       [](const Handle& self, std::int32_t bytes) {
-        const AtWork working({&self});
+        const AtWork working({&self.At});
         Opened(self).SetMappingBlockSize(bytes);
       },
       "Bytes of the file that are in the address space at a time.");
   pictures.def_property_readonly(
       "parent",
       [](const Handle& self) -> std::optional<Handle> {
+        const AtWork working({&self.At});
         Picture parent = Opened(self).Parent();
         if (!parent) return {};
-        return Handle(std::move(parent), self.Turn);
+        Handle made(std::move(parent), self.From);
+        return made.Own->Closed ? std::nullopt : std::optional(std::move(made));
       },
-      "The picture that this view was made from, or None.");
+      "The picture that this view was made from, while it isn't closed, or None.");
+  pictures.def_property_readonly(
+      "target",
+      [](const Handle& self) -> std::optional<HostHandle> {
+        const AtWork working({&self.At});
+        HostPicture target = Opened(self).Target();
+        if (!target) return {};
+        return HostHandle(std::move(target), self.At);
+      },
+      "The picture of the host that holds the samples, or None.");
+  pictures.def_property(
+      "debug_picture_enabled", [](const Handle& self) { return Opened(self).DebugPictureEnabled(); },
+      [](const Handle& self, bool enabled) { Opened(self).SetDebugPictureEnabled(enabled); },
+      "Whether debug_picture shows something.");
+  pictures.def_property_readonly(
+      "debug_picture",
+      [](const Handle& self) -> std::optional<HostHandle> {
+        const AtWork working({&self.At});
+        HostPicture shown = Opened(self).DebugPicture();
+        if (!shown) return {};
+        return HostHandle(std::move(shown));
+      },
+      "The top left corner as a picture of the host, or None.");
   pictures.def("__repr__", [](const Handle& self) {
-    if (self.Closed || !self.Of.Valid()) return std::string("<picturezor.Picture, closed>");
+    if (self.Own->Closed) return std::string("<picturezor.Picture, closed>");
+    std::string format;
+    for (const auto& [name, value] : EnumNames<Format>::Members)
+      if (value == self.Of.ImageFormat()) format = name;
     return "<picturezor.Picture " + std::to_string(self.Of.Width()) + " x " +
-           std::to_string(self.Of.Height()) + " " + self.Of.ImageFormatString() +
-           (self.Of.IsMapping() ? ", mapped>" : ">");
+           std::to_string(self.Of.Height()) + " " + format + (self.Of.IsMapping() ? ", mapped>" : ">");
   });
 }
 
@@ -226,20 +189,78 @@ void AddViews(PictureClass& pictures) {
   view("mirrored_view", &Picture::MirroredView, "A view with top and bottom swapped.");
   pictures.def("channel", Method("channel", &Picture::Channel), arg("index"),
                "A view of the samples at a place in the pixel. IndexError outside of it.");
+  pictures.def(
+      "_view",
+      [](const Handle& self, const Rect& rect, bool upwards) {
+        const AtWork working({&self.At});
+        const Picture& picture = Opened(self);
+        const std::int32_t height = picture.Height();
+        Rect part = rect;
+        // A clip counts rows as they are stored. The first row comes second: then both are in one window.
+        if (height > 1) {
+          const std::uint8_t* second = picture.RawRow(1).Start();
+          if (second < picture.RawRow(0).Start()) part.Y = height - rect.Y - rect.Height;
+        }
+        if (picture.ChannelCount() == 0 && rect.Width < picture.Width())
+          throw std::invalid_argument("a view of pixels without colours has all columns");
+        Picture view = picture.ClipImage(part);
+        if (view && upwards) view = view.MirroredView();
+        return Handle(std::move(view), self.From);
+      },
+      "A view of a rectangle as the picture shows it, from its last row up if asked for.");
   pictures.def("clip_image", Method("clip_image", py::overload_cast<>(&Picture::ClipImage, py::const_)),
                "A view of the whole.");
-  pictures.def("clip_image",
-               Method("clip_image", py::overload_cast<const Rect&>(&Picture::ClipImage, py::const_)),
-               arg("rect"), "A view of a rectangle (x, y, width, height).");
+  pictures.def(
+      "clip_image", Method("clip_image", py::overload_cast<const Rect&>(&Picture::ClipImage, py::const_)),
+      arg("rect"), "A view of a rectangle (x, y, width, height), whose rows are counted as they are stored.");
+}
+
+PictureFactory FactoryOf(const py::object& function) {
+  return PictureFactory([call = Reference(function)](std::int32_t width, std::int32_t height, Format format) {
+    const py::gil_scoped_acquire locked;
+    const py::object made = call.Object()(width, height, format);
+    if (made.is_none()) return Picture();
+    if (!py::isinstance<Handle>(made)) throw py::type_error("a factory gives a Picture, or None");
+    return made.cast<const Handle&>().Of;
+  });
+}
+
+void AddFactories(py::module_& module, PictureClass& pictures) {
+  py::class_<PictureFactory>(module, "Factory",
+                             "Makes the pictures that operations need: called with width, height and format, "
+                             "it gives a Picture, or None to let the next way be tried.")
+      .def(py::init(&FactoryOf), arg("function"))
+      .def("__eq__", [](const PictureFactory& self, const PictureFactory& other) { return self == other; });
+  module.def(
+      "set_factory",
+      [](const std::optional<PictureFactory>& factory) {
+        if (AtWork::Threads() > 0)
+          throw Failed("set_factory: threads are at work on pictures, which may need the factory just now");
+        PictureFactory::SetFactory(factory.value_or(PictureFactory()));
+      },
+      arg("factory"),
+      "The factory that all pictures are asked from which have none of their own; None for none.");
+  pictures.def_property(
+      "factory",
+      [](const Handle& self) -> std::optional<PictureFactory> {
+        const AtWork working({&self.At});
+        PictureFactory factory = Opened(self).Factory();
+        return factory ? std::optional(std::move(factory)) : std::nullopt;
+      },
+      [](const Handle& self, const std::optional<PictureFactory>& factory) {
+        const AtWork working({&self.At});
+        Opened(self).SetFactory(factory.value_or(PictureFactory()));
+      },
+      "This picture's own factory, asked before the global one, or None.");
 }
 
 }
 
 void AddPictures(py::module_& module, PictureClass& pictures) {
-  AddEnums(module);
   AddConstructors(pictures);
   AddProperties(pictures);
   AddViews(pictures);
+  AddFactories(module, pictures);
 }
 
 }

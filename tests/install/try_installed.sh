@@ -37,3 +37,11 @@ for program in by_cmake/outside by_cmake/outside_static ./by_pkg_config; do
   grep -q '960 x 600 no such file.png: No such file or directory' told
   usr/bin/picturezor compare expected.png half.png
 done
+
+python=usr/lib/python3/dist-packages
+if [ -d $python ]; then
+  PYTHONPATH=$python /usr/bin/python3 -c "
+import picturezor as pz
+pz.open('lake.jpg').scale(percent=50, kernel='box').save('half.png')"
+  usr/bin/picturezor compare expected.png half.png
+fi
