@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 #include <numeric>
 
 namespace zor {
@@ -137,8 +138,6 @@ namespace {
 
 constexpr int MostBits = 22, MostLowBits = 15;
 constexpr double MostDigit = 32766.0;
-/// Where more than a third of all samples are in doubt, the plain form makes them all.
-constexpr std::int32_t MostGap = (1 << SlotLine::FractionBits) / 3;
 
 std::int32_t Rounded(double value) { return std::int32_t(value < 0.0 ? value - 0.5 : value + 0.5); }
 
@@ -146,10 +145,38 @@ std::int32_t Rounded(double value) { return std::int32_t(value < 0.0 ? value - 0
 struct LineDigits {
   const Contribution& Line;
   SlotLine::Digits* Of;
-  std::int16_t& High(std::int32_t entry) const { return Of[Row(entry) / 2].High[Row(entry) % 2]; }
-  std::int16_t& Low(std::int32_t entry) const { return Of[Row(entry) / 2].Low[Row(entry) % 2]; }
-  /// Counted from the even line of the first pair.
+  SlotLine& Made;
+
+  double ShareOf(std::int32_t entry) const { return double(Line.Entries[entry].Weight) / Line.Sum; }
+  /// Counted from the even line of the first slot.
   std::int32_t Row(std::int32_t entry) const { return (Line.First & 1) + Line.Entries[entry].Pixel; }
+  std::int32_t Slot(std::int32_t entry) const { return Row(entry) / LinesInSlot; }
+  void PutHigh(std::int32_t entry, std::int32_t share) const {
+    const std::int32_t slot = Slot(entry), line = Row(entry) % LinesInSlot, top = slot - Made.FirstTop;
+    if (top >= 0 && top < Made.TopCount) {
+      const std::int32_t digit = (share + (1 << (SlotLine::TopShift - 1))) >> SlotLine::TopShift;
+      Made.Top[top][line] = std::int16_t(digit);
+      share -= digit * (1 << SlotLine::TopShift);
+    }
+    Of[slot].High[line] = std::int16_t(share);
+  }
+  void PutLow(std::int32_t entry, std::int32_t digit) const {
+    Of[Slot(entry)].Low[Row(entry) % LinesInSlot] = std::int16_t(digit);
+  }
+  /// Sets which slots have a third digit with so many bits. False for too many of them.
+  bool SetTops(int bits) const {
+    std::int32_t first = 0, end = 0;
+    for (std::int32_t i = 0; i < Line.Count; ++i) {
+      if (std::ldexp(std::fabs(ShareOf(i)), bits) <= MostDigit) continue;
+      if (end == 0) first = Slot(i);
+      end = Slot(i) + 1;
+    }
+    if (end - first > SlotLine::MostTops) return false;
+    Made.FirstTop = first;
+    Made.TopCount = end - first;
+    std::fill_n(&Made.Top[0][0], SlotLine::MostTops * LinesInSlot, std::int16_t(0));
+    return true;
+  }
 };
 
 /// What a flat run becomes, if that is the same for all values but 0.
@@ -178,114 +205,108 @@ struct Bounds {
   std::int32_t Both() const { return TooLarge + TooSmall; }
 };
 
-/// Sets what sums begin with and how they are cut off.
-void SetUnits(int bits, std::int32_t bias, SlotLine& made) {
-  made.Start = bias - (SlotLine::Middle << bits);
-  made.Shift = bits - SlotLine::FractionBits;
+/// Whether sums of shares in units of 2^-bits, which add up to `size` in all, stay within 32 bits, also where
+/// only the third digits have been added.
+bool Fits(double size, int bits) {
+  constexpr double ofThird = SlotLine::MostTops * LinesInSlot * 255.0 * (1 << (SlotLine::TopShift - 1));
+  return std::ldexp((size + 0.1) * 255.0, bits) + ofThird < 0x1p31;
 }
 
-/// Whether sums of shares in units of 2^-bits, which add up to `size` in all, stay within 32 bits.
-bool Fits(double size, int bits) { return std::ldexp((size + 0.6) * 255.0, bits) < 0x1p31; }
+/// What the third digits of a line cost, and its doubts with so many bits, by and large: in cycles a vector.
+double CostOf(const LineDigits& digits, int bits) {
+  return 5.0 * digits.Made.TopCount + std::ldexp(2000.0 * 64.0 * digits.Line.Count, -bits);
+}
 
-/// Two digits in units of 2^-bits, of shares that add up to `size` at most. False where too much is in doubt.
-bool MakeTwoDigits(const LineDigits& digits, int bits, double size, SlotLine& made) {
+/// The number of bits from `least` to `most` that costs least; with third digits where a few shares are much
+/// larger than the others.
+int BestBits(const LineDigits& digits, int least, int most) {
+  int best = least;
+  double cost = std::numeric_limits<double>::max();
+  for (int bits = least; bits <= most && digits.SetTops(bits); ++bits)
+    if (const double its = CostOf(digits, bits); its < cost) {
+      best = bits;
+      cost = its;
+    }
+  digits.SetTops(best);
+  return best;
+}
+
+/// Puts a line on its lattice, in units of 2^-bits. False where that isn't exact.
+bool MakeOnLattice(const LineDigits& digits, const Lattice& lattice, int bits) {
+  const auto put = [&](std::int32_t i, std::int32_t share) { digits.PutHigh(i, share); };
+  if (lattice.Denominator == 0 || !digits.SetTops(bits)) return false;
+  digits.Made.Shift = bits;
+  return RoundShares(digits.Line, lattice, {bits, 1, 0x1p24}, put);
+}
+
+/// All digits in units of 2^-bits, of shares that add up to `size` at most. False where too much is in doubt.
+bool MakeAllDigits(const LineDigits& digits, int bits, double size) {
   const Contribution& line = digits.Line;
-  const double one = std::ldexp(1.0, bits);
+  SlotLine& made = digits.Made;
   int lowBits = MostLowBits;
   while (lowBits > 0 && !(std::ldexp(line.Count * 255.0, lowBits - 1) < 0x1p31)) --lowBits;
   Shares coarse, fine;
   for (std::int32_t i = 0; i < line.Count; ++i) {
-    const double exact = double(line.Entries[i].Weight) / line.Sum * one;
+    const double exact = std::ldexp(digits.ShareOf(i), bits);
     const std::int32_t share = Rounded(exact);
     const double rest = std::ldexp(exact - share, lowBits);
     const std::int32_t digit = Rounded(rest);
-    digits.High(i) = std::int16_t(share);
-    digits.Low(i) = std::int16_t(digit);
+    digits.PutHigh(i, share);
+    digits.PutLow(i, digit);
     coarse.Add(share, exact);
     fine.Add(digit, rest);
   }
   const Bounds doubt(coarse, 1.0);
-  SetUnits(bits, doubt.TooSmall, made);
-  made.Gap = (doubt.Both() >> made.Shift) + 1;
+  made.Start = doubt.TooSmall;
+  made.Shift = bits;
+  made.Gap = doubt.Both();
   int fineBits = bits;
   while (fineBits < std::min(MostBits, bits + lowBits) && Fits(size, fineBits + 1)) ++fineBits;
   made.Left = fineBits - bits;
   made.Right = lowBits - made.Left;
   const Bounds fineDoubt(fine, std::ldexp(1.0, -made.Right));
   // Cutting off to the right takes away less than one.
-  made.FineStart = fineDoubt.TooSmall + 1 - (SlotLine::Middle << fineBits);
+  made.FineStart = fineDoubt.TooSmall + 1;
   made.FineGap = fineDoubt.Both() + 1;
-  made.FineShift = fineBits - SlotLine::FractionBits;
-  return made.Gap <= MostGap;
+  made.FineShift = fineBits;
+  // Where more than a third of all samples are in doubt, the plain form makes them all.
+  return made.Gap < (1 << bits) / 3;
 }
 
 }
 
 void MakeDigits(const Contribution& line, SlotLine::Digits* digits, SlotLine& made) {
   made.Of = digits;
-  const LineDigits of{line, digits};
-  if (line.Count == 0 || CopiesOneLine(line)) {
-    constexpr int bits = 14;
-    SetUnits(bits, 0, made);
-    if (line.Count > 0) of.High(0) = 1 << bits;
+  const LineDigits of{line, digits, made};
+  if (line.Count == 0) return;
+  if (CopiesOneLine(line)) {
+    made.Shift = 14;
+    of.PutHigh(0, 1 << made.Shift);
     return;
   }
   made.Plain = true;
   if (!(line.Sum > 0.0F) || line.Count > MostEntries) return;
   double largest = 0.0, positive = 0.0, negative = 0.0;
   for (std::int32_t i = 0; i < line.Count; ++i) {
-    const double share = double(line.Entries[i].Weight) / line.Sum;
+    const double share = of.ShareOf(i);
     largest = std::fmax(largest, std::fabs(share));
     (share > 0.0 ? positive : negative) += std::fabs(share);
   }
   const double size = std::fmax(positive, negative);
   if (!(size < 16.0)) return;
-  int bits = MostBits;
-  while (std::ldexp(largest, bits) > MostDigit || !Fits(size, bits)) --bits;
-  const auto put = [&](std::int32_t i, std::int32_t share) { of.High(i) = std::int16_t(share); };
-  if (const Lattice lattice = LatticeOf(line);
-      lattice.Denominator > 0 && RoundShares(line, lattice, {bits, 1, MostDigit}, put)) {
-    SetUnits(bits, 0, made);
-    made.Plain = false;
-    return;
-  }
-  made.OfFlat = OfFlatRun(line);
-  made.Plain = AlwaysInDoubt(line) || !MakeTwoDigits(of, bits, size, made);
-}
-
-void MakeSingle(const Contribution& line, float* shares, SlotLine& made) {
-  made.Shares = shares;
-  if (line.Count == 0) return;
-  if (CopiesOneLine(line)) {
-    shares[0] = 1.0F;
-    return;
-  }
-  made.Plain = true;
-  if (!(line.Sum > 0.0F)) return;
-  Shares sizes;
-  for (std::int32_t i = 0; i < line.Count; ++i) {
-    const double exact = double(line.Entries[i].Weight) / line.Sum;
-    const auto share = float(exact);
-    shares[line.Entries[i].Pixel] = share;
-    sizes.Add(share, exact);
-  }
-  // A product and a sum an entry round by 2^-24 of what they give at most; N. J. Higham, "Accuracy and
-  // Stability of Numerical Algorithms", 2002, lemma 3.1. Source lines between the entries add nothing and
-  // round nothing. 2^-14 covers the roundings of the start and of the gap.
-  const double rounding = (line.Count + 3) * 0x1p-24 * 1.01;
-  const double error = std::fmax(sizes.TooLarge, sizes.TooSmall);
-  const double bound = 255.0 * (error + sizes.Size() * rounding) + 0x1p-14;
-  if (!(sizes.Size() < 64.0)) return;
+  int most = MostBits;
+  while (!Fits(size, most)) --most;
+  int least = most;
+  while (std::ldexp(largest, least) > MostDigit) --least;
   const Lattice lattice = LatticeOf(line);
-  if (lattice.Denominator > 0 && (2.0 * bound + lattice.Disturbance) * double(lattice.Denominator) < 0.5) {
-    made.SingleStart = float(bound + lattice.Disturbance);
-    made.Plain = false;
-    return;
-  }
+  made.Plain = false;
+  if (MakeOnLattice(of, lattice, least)) return;
+  const int best = BestBits(of, least, most);
+  const double cost = CostOf(of, best);
+  if (of.SetTops(most) && 5.0 * made.TopCount < cost && MakeOnLattice(of, lattice, most)) return;
+  of.SetTops(best);
   made.OfFlat = OfFlatRun(line);
-  made.Plain = AlwaysInDoubt(line) || !(bound < 0.125);
-  made.SingleStart = float(-bound);
-  made.SingleGap = float(2.0 * bound);
+  made.Plain = AlwaysInDoubt(line) || !MakeAllDigits(of, best, size);
 }
 
 }

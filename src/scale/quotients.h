@@ -27,13 +27,17 @@ namespace zor {
 // nothing is ever in doubt. Weights that ought to be 0 and came out as some 2^-54 disturb a lattice; as long
 // as they are positive, they only add to q, and their part counts in the bound of q' - q.
 
-// There are three kinds of numbers that q' is made of: 22 bits after the point on processors that multiply
-// bytes, single precision, and two digits of 16 bits. With digits, the largest share of a line decides how
-// many bits after the point the first one has, so that D + E is near 1/100, and nothing is in doubt on most
-// lattices. A sample that is in doubt is made again with both digits, for which D + E is about a millionth:
-// the rest of a share, times 2^15 and rounded, is the second digit; its sum, cut off to the right, is less
-// than one unit too small.
-//
+// There are two kinds of numbers that q' is made of: 22 bits after the point on processors that multiply
+// bytes, and digits of 16 bits on all. With digits, the largest shares of a line decide how many bits after
+// the point the high one has, so that D + E is between 1/30 and 1/1000, and nothing is in doubt on most
+// lattices. Where a few shares in the middle are much larger than the others, as when a picture grows, their
+// slots have a third digit above the high one, which lets it have more bits: the share is the same whole
+// number, cut in two, so that bounds don't tell. A sample that is in doubt is made again with the low digit
+// too, for which D + E is about a millionth: the rest of a share, times 2^15 and rounded, is that digit; its
+// sum, cut off to the right, is less than one unit too small. All sums, and what they pass through on their
+// way, stay below 2^31: the shares above 0 add up to so much at most, and so do those below; and third digits
+// alone are off by half of one for each of their samples.
+
 // A flat run, whose samples all have the value v, has the quotient v W / S with W the sum of the weights,
 // which is so close to v that it is always in doubt. Whether W is less than S decides between v - 1 and v for
 // all v above 0, provided that the two differ by more than the plain form rounds, or that nothing is rounded
@@ -65,9 +69,8 @@ struct FixedPointLine {
 /// The shares of a line, one an entry. False where they don't fit, or the line is always in doubt.
 bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLine& made);
 
-/// A line in 16-bit numbers, or in single precision: one for each of its slots, 0 before. The line is 0
-/// before too; its slots are left alone.
+/// A line in 16-bit numbers: digits for each of its slots, 0 before. The line is 0 before too; its slots are
+/// left alone.
 void MakeDigits(const Contribution& line, SlotLine::Digits* digits, SlotLine& made);
-void MakeSingle(const Contribution& line, float* shares, SlotLine& made);
 
 }

@@ -41,7 +41,7 @@ std::optional<ColumnPlan> ColumnPlan::Make(const ScaleContext& context, const Co
 bool ColumnPlan::ChooseStripe() {
   const SlotLoops& loops = *Prepared.Loops;
   Span = Prepared.Lines.MostSlots(Together);
-  SlotCount = Span + loops.Width / loops.LinesInSlot - 1;
+  SlotCount = Span + loops.Width / LinesInSlot - 1;
   const auto fits = [&](std::size_t room) {
     return room / (SlotLoops::SampleBytes * std::size_t(SlotCount) + std::size_t(loops.Width));
   };
@@ -109,11 +109,11 @@ bool SlotColumns::Need(std::int32_t y, int count) {
   const std::ptrdiff_t units =
       RoundedUp(std::ptrdiff_t{Of.Count()} * Plan.Samples.Order.Count, Plan.Prepared.Loops->Width) /
       Plan.Prepared.Loops->Width;
-  const int inSlot = Plan.Prepared.Loops->LinesInSlot;
   while (NextSlot < end) {
-    const int rows = std::min(Plan.Prepared.Loops->Width, Plan.Context.Source->Height - inSlot * NextSlot);
-    if (!MakeRows(inSlot * NextSlot, rows)) return false;
-    for (int r = 0; r < rows; r += inSlot, ++NextSlot) {
+    const int rows =
+        std::min(Plan.Prepared.Loops->Width, Plan.Context.Source->Height - LinesInSlot * NextSlot);
+    if (!MakeRows(LinesInSlot * NextSlot, rows)) return false;
+    for (int r = 0; r < rows; r += LinesInSlot, ++NextSlot) {
       const Sample* even = RowMemory + r * Plan.Room;
       // Nobody looks at what isn't there.
       const Sample* odd = r + 1 < rows ? even + Plan.Room : even;

@@ -9,18 +9,18 @@ namespace zor {
 namespace {
 
 /// Slots from the first source line of a line to its last one.
-std::int32_t SlotCount(const Contribution& line, int linesInSlot) {
-  return line.Count == 0 ? 0 : line.Last() / linesInSlot - line.First / linesInSlot + 1;
+std::int32_t SlotCount(const Contribution& line) {
+  return line.Count == 0 ? 0 : line.Last() / LinesInSlot - line.First / LinesInSlot + 1;
 }
 
 /// The lines whose numbers have been made: of each set of weights those whose first source line stands first
 /// in its slot, and those where it stands second.
 class KnownLines {
  public:
-  KnownLines(std::int32_t count, int linesInSlot)
-      : Memory(NewBuffer(std::int64_t{count} * 2, sizeof(std::int32_t))), LinesInSlot(linesInSlot) {}
+  explicit KnownLines(std::int32_t count)
+      : Memory(NewBuffer(std::int64_t{count} * LinesInSlot, sizeof(std::int32_t))) {}
   explicit operator bool() const { return Memory != nullptr; }
-  void Forget(std::int32_t count) { std::fill_n(At(0), std::ptrdiff_t{count} * 2, 0); }
+  void Forget(std::int32_t count) { std::fill_n(At(0), std::ptrdiff_t{count} * LinesInSlot, 0); }
   /// The line that has the numbers of line `of`, which is itself if it comes first.
   std::int32_t For(std::int32_t of, const Contribution& line) {
     std::int32_t& known = At(line.Alike)[line.First % LinesInSlot];
@@ -30,44 +30,36 @@ class KnownLines {
 
  private:
   std::int32_t* At(std::int32_t line) {
-    return reinterpret_cast<std::int32_t*>(Memory.get()) + std::ptrdiff_t{line} * 2;
+    return reinterpret_cast<std::int32_t*>(Memory.get()) + std::ptrdiff_t{line} * LinesInSlot;
   }
   Buffer Memory;
-  int LinesInSlot;
 };
 
 }
 
-SlotTable::SlotTable(const ContributionTable& table, int linesInSlot)
+SlotTable::SlotTable(const ContributionTable& table)
     : LineMemory(NewBuffer(table.Count(), sizeof(SlotLine))), LineCount(table.Count()) {
-  KnownLines known(table.Count(), linesInSlot);
+  KnownLines known(table.Count());
   if (!LineMemory || !known) return;
   std::int64_t slots = 0;
   for (std::int32_t i = 0; i < table.Count(); ++i)
-    if (known.For(i, table[i]) == i) slots += SlotCount(table[i], linesInSlot);
-  NumberMemory = NewBuffer(slots + 1, linesInSlot == 2 ? sizeof(SlotLine::Digits) : sizeof(float));
+    if (known.For(i, table[i]) == i) slots += SlotCount(table[i]);
+  NumberMemory = NewBuffer(slots + 1, sizeof(SlotLine::Digits));
   if (!NumberMemory) return;
   known.Forget(table.Count());
   Lines = reinterpret_cast<SlotLine*>(LineMemory.get());
   auto* digits = reinterpret_cast<SlotLine::Digits*>(NumberMemory.get());
-  auto* shares = reinterpret_cast<float*>(NumberMemory.get());
   for (std::int32_t i = 0; i < table.Count(); ++i) {
     const Contribution& from = table[i];
     SlotLine& line = Lines[i];
     if (const std::int32_t same = known.For(i, from); same != i) {
       line = Lines[same];
     } else {
-      line.Count = SlotCount(from, linesInSlot);
-      if (linesInSlot == 2) {
-        MakeDigits(from, digits, line);
-        digits += line.Count;
-      } else {
-        MakeSingle(from, shares, line);
-        shares += line.Count;
-      }
+      line.Count = SlotCount(from);
+      MakeDigits(from, digits, line);
+      digits += line.Count;
     }
-    line.First = from.First / linesInSlot;
-    Doubtful += line.Plain || line.Gap != 0 || line.SingleGap != 0.0F ? 1 : 0;
+    line.First = from.First / LinesInSlot;
   }
   std::int32_t least = std::numeric_limits<std::int32_t>::max();
   for (std::int32_t i = table.Count() - 1; i >= 0; --i) {

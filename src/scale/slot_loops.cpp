@@ -3,8 +3,6 @@
 #include <cstring>
 #include <limits>
 
-#include "image/targets.h"
-
 #ifdef __ARM_NEON
 #include <arm_neon.h>
 #endif
@@ -18,16 +16,18 @@
 
 namespace zor {
 
-const SlotLoops PlainPairs{Width, LinesInSlot, Widen, Sum, MakeRows};
+const SlotLoops PlainLoops{Width, Widen, Sum, MakeRows};
 
-PreparedLines::PreparedLines(const ContributionTable& table) : Loops(&PlainPairs), Lines(table, LinesInSlot) {
+const SlotLoops& LoopsFor([[maybe_unused]] Target target) {
 #if defined(__x86_64__) || defined(__i386__)
-  if (CurrentTarget < Target::AVX2) return;
-  Loops = &AVX2Pairs;
-  if (Lines.DoubtfulLines() <= table.Count() / 16) return;
-  Loops = &AVX2Floats;
-  Lines = SlotTable(table, Loops->LinesInSlot);
+  constexpr const SlotLoops* all[] = {&PlainLoops, &AVX2Loops, &AVX512Loops, &VNNILoops};
+  return *all[int(target)];
+#else
+  return PlainLoops;
 #endif
 }
+
+PreparedLines::PreparedLines(const ContributionTable& table)
+    : Loops(&LoopsFor(CurrentTarget)), Lines(table) {}
 
 }

@@ -1,6 +1,7 @@
 #pragma once
 #include "image/arithmetic.h"
 #include "image/byte_blocks.h"
+#include "image/targets.h"
 #include "scale/exact_passes.h"
 #include "scale/slot_lines.h"
 
@@ -8,8 +9,8 @@ namespace zor {
 
 // The sums of both passes. Rows between the passes, and columns of some source rows that are turned on their
 // side, stand in slots: two neighbours side by side as numbers of 16 bits, which one instruction multiplies
-// by their two digits and adds up, or one as floats. Either way a unit of a slot, which has as many samples
-// of a source line as a vector has bytes, takes four vectors; how its numbers lie is the processor's affair.
+// by their two digits and adds up. A unit of a slot, which has as many samples of a source line as a vector
+// has bytes, takes four vectors; how its numbers lie is the processor's affair.
 
 /// Some units of a line.
 struct SlotSums {
@@ -43,18 +44,17 @@ struct RowsToMake {
   Sample* Scratch;
 };
 
-/// The loops for a processor and a kind of numbers.
+/// The loops for a processor.
 struct SlotLoops {
   /// Samples of a unit, and rows that are made together.
   int Width;
-  int LinesInSlot;
   /// Makes units of a slot out of one row or two, which have room for whole units.
   void (*Widen)(const Sample* even, const Sample* odd, std::ptrdiff_t units, Sample* slot);
   /// Makes at most MostUnits units.
   void (*Sum)(const SlotSums& sums);
   void (*MakeRows)(const RowsToMake& rows);
 
-  static constexpr int MostUnits = 8, MostWidth = 32;
+  static constexpr int MostUnits = 8, MostWidth = 64;
   /// Bytes of a slot for each sample of a source line.
   static constexpr int SampleBytes = 4;
 };
@@ -64,10 +64,10 @@ inline constexpr int GroupPixels = 16;
 /// The most bytes of a pixel that are turned.
 inline constexpr int MostStep = 8;
 
-extern const SlotLoops PlainPairs, AVX2Pairs, AVX2Floats;
+extern const SlotLoops PlainLoops, AVX2Loops, AVX512Loops, VNNILoops;
+const SlotLoops& LoopsFor(Target target);
 
-/// The lines of a table and the loops that make them best: in 16 bits where nothing is ever in doubt, and
-/// everywhere on processors that are slow with floats.
+/// The lines of a table, and the loops that make them on this processor.
 struct PreparedLines {
   PreparedLines() = default;
   explicit PreparedLines(const ContributionTable& table);

@@ -13,7 +13,7 @@
 
 namespace zor {
 
-const SlotLoops AVX2Pairs{Width, LinesInSlot, Widen, Sum, MakeRows};
+const SlotLoops AVX2Loops{Width, Widen, Sum, MakeRows};
 
 }
 

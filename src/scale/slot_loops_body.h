@@ -1,14 +1,9 @@
-// The loops of slot_loops.h for vectors of VectorBytes bytes and, where FLOATS is defined, single precision;
-// included by a file for each instruction set, which says what that is and marks each function with LOOP or
-// LOOP_INLINE.
+// The loops of slot_loops.h for vectors of VectorBytes bytes; included by a file for each instruction set,
+// which says what that is and marks each function with LOOP or LOOP_INLINE.
 
 #include "scale/slot_vectors.h"
-
-#ifdef FLOATS
-#include "scale/slot_floats.h"
-#else
+// After the vectors.
 #include "scale/slot_pairs.h"
-#endif
 
 namespace zor {
 namespace {
@@ -47,27 +42,27 @@ LOOP_INLINE Sample ExactSample(const SlotSums& sums, std::ptrdiff_t unit, int sa
 }
 
 /// Makes what is in doubt of a unit without more numbers: flat runs, and the others by the plain form.
-NOINLINE LOOP void SettleUnitPlainly(const SlotSums& sums, std::ptrdiff_t unit, std::uint32_t doubts) {
+NOINLINE LOOP void SettleUnitPlainly(const SlotSums& sums, std::ptrdiff_t unit, Bits doubts) {
   constexpr int few = 2;
-  if (sums.Line->OfFlat != Flat::Unknown && __builtin_popcount(doubts) > few) {
+  if (sums.Line->OfFlat != Flat::Unknown && std::popcount(doubts) > few) {
     const LineRows rows{sums, unit};
     const Bytes samples = Narrowed(rows.UnitOf(rows.First()), rows.First());
     Bytes differ{};
     for (std::int32_t row = rows.First() + 1; row < rows.End(); ++row)
       differ |= samples ^ Narrowed(rows.UnitOf(row), row % LinesInSlot);
-    const std::uint32_t flat = doubts & ~Difference(differ, Bytes{});
+    const Bits flat = doubts & ~Difference(differ, Bytes{});
     const int less = sums.Line->OfFlat == Flat::Falls ? 1 : 0;
     Sample values[Width];
     Store(values, samples);
-    for (std::uint32_t left = flat; left != 0; left &= left - 1) {
-      const int sample = __builtin_ctz(left);
+    for (Bits left = flat; left != 0; left &= left - 1) {
+      const int sample = std::countr_zero(left);
       if (const std::ptrdiff_t at = unit * Width + sample; at < sums.Samples)
         sums.Into[at] = Clamp(values[sample] - less);
     }
     doubts &= ~flat;
   }
   for (; doubts != 0; doubts &= doubts - 1) {
-    const int sample = __builtin_ctz(doubts);
+    const int sample = std::countr_zero(doubts);
     if (const std::ptrdiff_t at = unit * Width + sample; at < sums.Samples)
       sums.Into[at] = ExactSample(sums, unit, sample);
   }
@@ -89,15 +84,107 @@ NOINLINE LOOP void SumPlain(const SlotSums& sums) {
     StoreUnit(sums, sums.FirstUnit + u, Load<Bytes>(samples + u * Width));
 }
 
+/// What is whole of sums, between 0 and 255.
+LOOP_INLINE Bytes WholeOf(const Sums* sums, int bits) {
+  return Packed(Saturated(sums[0] >> bits, sums[1] >> bits), Saturated(sums[2] >> bits, sums[3] >> bits));
+}
+/// A bit for each sample that would be another one if its sum were less by `gap`.
+LOOP_INLINE Bits DoubtsOf(Bytes whole, const Sums* sums, std::int32_t gap, int bits) {
+  const Sums less[] = {sums[0] - gap, sums[1] - gap, sums[2] - gap, sums[3] - gap};
+  return Difference(whole, WholeOf(less, bits));
+}
+
+template <int Units>
+LOOP_INLINE void AddSlot(Sums* sums, const Sample* slot, const std::int16_t* two) {
+  const auto digits = DigitsOf(two);
+  for (int u = 0; u < Units; ++u) AddProducts(sums + u * 4, slot + u * UnitBytes, digits);
+}
+
+/// Makes some units, and notes for each which of its samples are in doubt.
+template <int Units>
+LOOP_INLINE void SumUnits(const SlotSums& sums, std::ptrdiff_t unit, Bits* doubts) {
+  const SlotLine& line = *sums.Line;
+  Sums made[Units * 4];
+  const std::ptrdiff_t from = unit * UnitBytes;
+  if (line.TopCount == 0) {
+    for (Sums& sum : made) sum = Sums{} + line.Start;
+  } else {
+    for (Sums& sum : made) sum = Sums{};
+    for (std::int32_t t = 0; t < line.TopCount; ++t)
+      AddSlot<Units>(made, sums.Slots[line.FirstTop + t] + from, line.Top[t]);
+    for (Sums& sum : made) sum = (sum << SlotLine::TopShift) + line.Start;
+  }
+  for (std::int32_t s = 0; s < line.Count; ++s) AddSlot<Units>(made, sums.Slots[s] + from, line.Of[s].High);
+  for (int u = 0; u < Units; ++u) {
+    const Bytes whole = WholeOf(made + u * 4, line.Shift);
+    StoreUnit(sums, unit + u, whole);
+    if (line.Gap != 0) doubts[u] = DoubtsOf(whole, made + u * 4, line.Gap, line.Shift);
+  }
+}
+
+/// Makes a sample with all digits.
+LOOP_INLINE Sample SettledSample(const SlotSums& sums, std::ptrdiff_t unit, int sample) {
+  const SlotLine& line = *sums.Line;
+  SampleSums of;
+  for (std::int32_t s = 0; s < line.Count; ++s) of.Add(sums.Slots[s] + unit * UnitBytes, sample, line.Of[s]);
+  std::int32_t high = of.High();
+  for (std::int32_t t = 0; t < line.TopCount; ++t)
+    for (int i = 0; i < LinesInSlot; ++i)
+      high += (line.Top[t][i] * SampleIn(sums.Slots[line.FirstTop + t] + unit * UnitBytes, sample, i))
+              << SlotLine::TopShift;
+  const std::int32_t upper = (high << line.Left) + (of.Low() >> line.Right) + line.FineStart;
+  const std::int32_t whole = upper >> line.FineShift;
+  return whole == (upper - line.FineGap) >> line.FineShift ? Clamp(whole) : ExactSample(sums, unit, sample);
+}
+
+/// Makes a unit much of which is in doubt with all digits.
+NOINLINE LOOP void SettleUnit(const SlotSums& sums, std::ptrdiff_t unit) {
+  const SlotLine& line = *sums.Line;
+  Sums high[4] = {}, low[4] = {};
+  for (std::int32_t t = 0; t < line.TopCount; ++t)
+    AddProducts(high, sums.Slots[line.FirstTop + t] + unit * UnitBytes, DigitsOf(line.Top[t]));
+  for (Sums& sum : high) sum <<= SlotLine::TopShift;
+  for (std::int32_t s = 0; s < line.Count; ++s) {
+    AddProducts(high, sums.Slots[s] + unit * UnitBytes, DigitsOf(line.Of[s].High));
+    AddProducts(low, sums.Slots[s] + unit * UnitBytes, DigitsOf(line.Of[s].Low));
+  }
+  for (int k = 0; k < 4; ++k) high[k] = (high[k] << line.Left) + (low[k] >> line.Right) + line.FineStart;
+  const Bytes whole = WholeOf(high, line.FineShift);
+  StoreUnit(sums, unit, whole);
+  const Bits doubts = DoubtsOf(whole, high, line.FineGap, line.FineShift);
+  if (doubts != 0) SettleUnitPlainly(sums, unit, doubts);
+}
+
+/// Makes what is in doubt of a unit.
+LOOP_INLINE void Settle(const SlotSums& sums, std::ptrdiff_t unit, Bits doubts) {
+  // What a unit costs, whatever its width.
+  constexpr int many = 5;
+  if (std::popcount(doubts) > many) return SettleUnit(sums, unit);
+  for (; doubts != 0; doubts &= doubts - 1) {
+    const int sample = std::countr_zero(doubts);
+    if (const std::ptrdiff_t at = unit * Width + sample; at < sums.Samples)
+      sums.Into[at] = SettledSample(sums, unit, sample);
+  }
+}
+
 LOOP void Sum(const SlotSums& sums) {
   if (sums.Line->Plain) return SumPlain(sums);
-  std::uint32_t doubts[SlotLoops::MostUnits];
+  // As many units together as there are registers for.
+  constexpr int most = Width == 64 ? 4 : 2;
+  Bits doubts[SlotLoops::MostUnits];
   std::ptrdiff_t done = 0;
-  for (; done + 2 <= sums.UnitCount; done += 2) SumUnits<2>(sums, sums.FirstUnit + done, doubts + done);
-  if (done < sums.UnitCount) SumUnits<1>(sums, sums.FirstUnit + done, doubts + done);
-  if (!HasDoubts(*sums.Line)) return;
-  for (std::ptrdiff_t u = 0; u < sums.UnitCount; ++u)
-    if (doubts[u] != 0) Settle(sums, sums.FirstUnit + u, doubts[u]);
+  const std::ptrdiff_t all = sums.UnitCount, first = sums.FirstUnit;
+  for (; all - done >= most && all - done != 3; done += most)
+    SumUnits<most>(sums, first + done, doubts + done);
+  if (all - done == 3)
+    SumUnits<3>(sums, first + done, doubts + done);
+  else if (most > 2 && all - done == 2)
+    SumUnits<2>(sums, first + done, doubts + done);
+  else if (all - done == 1)
+    SumUnits<1>(sums, first + done, doubts + done);
+  if (sums.Line->Gap == 0) return;
+  for (std::ptrdiff_t u = 0; u < all; ++u)
+    if (doubts[u] != 0) Settle(sums, first + u, doubts[u]);
 }
 
 LOOP void Widen(const Sample* even, const Sample* odd, std::ptrdiff_t units, Sample* slot) {
@@ -120,23 +207,19 @@ LOOP_INLINE void Transpose(Bytes (&rows)[16]) {
 
 using Block16 [[gnu::vector_size(16)]] = std::uint8_t;
 /// 16 bytes each of rows that lie 16 apart.
+#if VectorBytes > 16
+LOOP_INLINE __m256i TwoParts(const Sample* const* rows, std::int64_t at) {
+  const __m256i low = _mm256_castsi128_si256(Load<__m128i>(rows[0] + at));
+  return _mm256_inserti128_si256(low, Load<__m128i>(rows[16] + at), 1);
+}
+#endif
 LOOP_INLINE Bytes LoadParts(const Sample* const* rows, std::int64_t at) {
-#if VectorBytes == 32
-  return __builtin_shufflevector(Load<Block16>(rows[0] + at), Load<Block16>(rows[16] + at), 0, 1, 2, 3, 4, 5,
-                                 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20, 21, 22, 23, 24, 25,
-                                 26, 27, 28, 29, 30, 31);
+#if VectorBytes == 64
+  return Bytes(_mm512_inserti64x4(_mm512_castsi256_si512(TwoParts(rows, at)), TwoParts(rows + 32, at), 1));
+#elif VectorBytes == 32
+  return Bytes(TwoParts(rows, at));
 #else
   return Load<Bytes>(rows[0] + at);
-#endif
-}
-LOOP_INLINE Block16 PartOf(Bytes bytes, int part) {
-#if VectorBytes == 32
-  if (part == 1)
-    return __builtin_shufflevector(bytes, bytes, 16, 17, 18, 19, 20, 21, 22, 23, 24, 25, 26, 27, 28, 29, 30,
-                                   31);
-  return __builtin_shufflevector(bytes, bytes, 0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15);
-#else
-  return part == 0 ? bytes : Block16{};
 #endif
 }
 
@@ -159,7 +242,7 @@ NOINLINE LOOP void TurnGroup(const RowsToMake& rows, const Sample* const* from, 
   for (int x = 0; x < GroupPixels; x += LinesInSlot)
     for (int c = 0; c < rows.Channels; ++c, into += UnitBytes) {
       const Bytes* even = columns + x * rows.Step + rows.Offset[c];
-      StoreWidened(*even, even[LinesInSlot == 2 ? rows.Step : 0], into);
+      StoreWidened(*even, even[rows.Step], into);
     }
 }
 
@@ -171,13 +254,11 @@ NOINLINE LOOP void StoreTurned(const RowsToMake& rows, const Sample* const* from
     for (int j = 0; j < 16; ++j) square[j] = Load<Bytes>(from[k + j]);
     Transpose(square);
     const auto count = std::size_t(places - k < 16 ? places - k : 16);
-    for (int r = 0; r < 16; ++r)
-      for (int part = 0; part < Parts; ++part) {
-        if (r + part * 16 >= rows.Rows) continue;
-        const Block16 made = PartOf(square[r], part);
-        Sample* into = rows.Into[r + part * 16] + at + k;
-        count == 16 ? Store(into, made) : void(std::memcpy(into, &made, count));
-      }
+    for (int r = 0; r < rows.Rows; ++r) {
+      const auto* made = reinterpret_cast<const Sample*>(square + r % 16) + r / 16 * 16;
+      Sample* into = rows.Into[r] + at + k;
+      count == 16 ? Store(into, Load<Block16>(made)) : void(std::memcpy(into, made, count));
+    }
   }
 }
 

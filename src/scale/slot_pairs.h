@@ -1,19 +1,19 @@
-// Slots of two source lines, as numbers of 16 bits; for slot_loops_body.h.
+// How the numbers of a slot lie, and sums of them; for slot_loops_body.h.
 
 namespace zor {
 namespace {
 
-constexpr int LinesInSlot = 2;
-
-#if defined(__SSE2__) || VectorBytes == 32
+#ifdef WIDE
 
 // An instruction multiplies numbers by twos and adds the two products, so the numbers of a sample lie side by
 // side.
 
+LOOP_INLINE int PlaceOf(int sample) {
+  return sample % 16 / 4 * (Width / 2) + sample / 16 * 8 + sample % 4 * 2;
+}
 LOOP_INLINE int SampleIn(const Sample* unit, int sample, int line) {
-  const int place = sample % 16 / 4 * (Width / 2) + sample / 16 * 8 + sample % 4 * 2 + line;
   std::int16_t number;
-  std::memcpy(&number, unit + place * int(sizeof number), sizeof number);
+  std::memcpy(&number, unit + (PlaceOf(sample) + line) * int(sizeof number), sizeof number);
   return number;
 }
 LOOP_INLINE void StoreWidened(Bytes even, Bytes odd, Sample* unit) {
@@ -27,9 +27,9 @@ LOOP_INLINE Bytes Narrowed(const Sample* unit, int line) {
   Sums of[4];
   for (int k = 0; k < 4; ++k) {
     of[k] = Load<Sums>(unit + k * Width);
-    of[k] = (line == 0 ? of[k] & 0xFFFF : of[k] >> 16) - SlotLine::Middle;
+    of[k] = line == 0 ? of[k] & 0xFFFF : of[k] >> 16;
   }
-  return Packed(Saturated(of[0], of[1]), Saturated(of[2], of[3])) ^ Sample(SlotLine::Middle);
+  return Packed(Saturated(of[0], of[1]), Saturated(of[2], of[3]));
 }
 LOOP_INLINE Numbers DigitsOf(const std::int16_t* two) {
   std::int32_t both;
@@ -38,14 +38,27 @@ LOOP_INLINE Numbers DigitsOf(const std::int16_t* two) {
 }
 LOOP_INLINE void AddProducts(Sums* sums, const Sample* unit, Numbers digits) {
   for (int k = 0; k < 4; ++k) {
-    const auto numbers = Load<Numbers>(unit + k * Width);
-#if VectorBytes == 32
-    sums[k] += Sums(__builtin_ia32_pmaddwd256(numbers, digits));
+    const auto numbers = Load<Register>(unit + k * Width);
+#ifdef VNNI
+    sums[k] = Sums(_mm512_dpwssd_epi32(Register(sums[k]), numbers, Register(digits)));
 #else
-    sums[k] += Sums(__builtin_ia32_pmaddwd128(numbers, digits));
+    sums[k] += Sums(WIDE(madd_epi16)(numbers, Register(digits)));
 #endif
   }
 }
+
+/// The sums of one sample with either digit.
+struct SampleSums {
+  __m128i Of = _mm_setzero_si128();
+  LOOP_INLINE void Add(const Sample* unit, int sample, const SlotLine::Digits& digits) {
+    std::int32_t two;
+    std::memcpy(&two, unit + PlaceOf(sample) * int(sizeof(std::int16_t)), sizeof two);
+    const __m128i all = _mm_loadl_epi64(reinterpret_cast<const __m128i*>(&digits));
+    Of = _mm_add_epi32(Of, _mm_madd_epi16(_mm_set1_epi32(two), all));
+  }
+  LOOP_INLINE std::int32_t High() const { return _mm_cvtsi128_si32(Of); }
+  LOOP_INLINE std::int32_t Low() const { return _mm_cvtsi128_si32(_mm_srli_si128(Of, 4)); }
+};
 
 #else
 
@@ -81,89 +94,19 @@ LOOP_INLINE void AddProducts(Sums* sums, const Sample* unit, const std::int16_t*
     }
 }
 
+/// The sums of one sample with either digit.
+struct SampleSums {
+  std::int32_t Of[2] = {};
+  LOOP_INLINE void Add(const Sample* unit, int sample, const SlotLine::Digits& digits) {
+    const std::int32_t even = SampleIn(unit, sample, 0), odd = SampleIn(unit, sample, 1);
+    Of[0] += even * digits.High[0] + odd * digits.High[1];
+    Of[1] += even * digits.Low[0] + odd * digits.Low[1];
+  }
+  LOOP_INLINE std::int32_t High() const { return Of[0]; }
+  LOOP_INLINE std::int32_t Low() const { return Of[1]; }
+};
+
 #endif
-
-LOOP_INLINE Sample ExactSample(const SlotSums& sums, std::ptrdiff_t unit, int sample);
-LOOP_INLINE void StoreUnit(const SlotSums& sums, std::ptrdiff_t unit, Bytes samples);
-NOINLINE LOOP void SettleUnitPlainly(const SlotSums& sums, std::ptrdiff_t unit, std::uint32_t doubts);
-
-/// Sums as samples less Middle, cut off.
-LOOP_INLINE Bytes WholeOf(Numbers low, Numbers high) {
-  return Packed(low >> SlotLine::FractionBits, high >> SlotLine::FractionBits);
-}
-
-/// Makes some units, and notes for each which of its samples are in doubt.
-template <int Units>
-LOOP_INLINE void SumUnits(const SlotSums& sums, std::ptrdiff_t unit, std::uint32_t* doubts) {
-  const SlotLine& line = *sums.Line;
-  Sums made[Units * 4];
-  for (Sums& sum : made) sum = Sums{} + line.Start;
-  for (std::int32_t s = 0; s < line.Count; ++s) {
-    const auto digits = DigitsOf(line.Of[s].High);
-    const Sample* slot = sums.Slots[s] + unit * UnitBytes;
-    for (int u = 0; u < Units; ++u) AddProducts(made + u * 4, slot + u * UnitBytes, digits);
-  }
-  for (int u = 0; u < Units; ++u) {
-    const Sums* sum = made + u * 4;
-    const Numbers low = Saturated(sum[0] >> line.Shift, sum[1] >> line.Shift);
-    const Numbers high = Saturated(sum[2] >> line.Shift, sum[3] >> line.Shift);
-    const Bytes upper = WholeOf(low, high);
-    StoreUnit(sums, unit + u, upper ^ Sample(SlotLine::Middle));
-    if (line.Gap == 0) continue;
-    const Numbers gap = Numbers{} + std::int16_t(line.Gap);
-    doubts[u] = Difference(upper, WholeOf(Less(low, gap), Less(high, gap)));
-  }
-}
-
-/// Makes a sample with both digits.
-LOOP_INLINE Sample SettledSample(const SlotSums& sums, std::ptrdiff_t unit, int sample) {
-  const SlotLine& line = *sums.Line;
-  std::int32_t high = 0, low = 0;
-  for (std::int32_t s = 0; s < line.Count; ++s) {
-    const SlotLine::Digits& digits = line.Of[s];
-    const Sample* slot = sums.Slots[s] + unit * UnitBytes;
-    const std::int32_t even = SampleIn(slot, sample, 0), odd = SampleIn(slot, sample, 1);
-    high += even * digits.High[0] + odd * digits.High[1];
-    low += even * digits.Low[0] + odd * digits.Low[1];
-  }
-  const std::int32_t upper = (high << line.Left) + (low >> line.Right) + line.FineStart;
-  const int shift = line.FineShift + SlotLine::FractionBits;
-  const std::int32_t whole = upper >> shift;
-  if (whole == (upper - line.FineGap) >> shift) return Clamp(whole + SlotLine::Middle);
-  return ExactSample(sums, unit, sample);
-}
-
-/// Makes a unit much of which is in doubt with both digits.
-NOINLINE LOOP void SettleUnit(const SlotSums& sums, std::ptrdiff_t unit) {
-  const SlotLine& line = *sums.Line;
-  Sums high[4] = {}, upper[4] = {}, lower[4];
-  for (std::int32_t s = 0; s < line.Count; ++s) {
-    AddProducts(high, sums.Slots[s] + unit * UnitBytes, DigitsOf(line.Of[s].High));
-    AddProducts(upper, sums.Slots[s] + unit * UnitBytes, DigitsOf(line.Of[s].Low));
-  }
-  for (int k = 0; k < 4; ++k) {
-    upper[k] = (high[k] << line.Left) + (upper[k] >> line.Right) + line.FineStart;
-    lower[k] = (upper[k] - line.FineGap) >> line.FineShift;
-    upper[k] = upper[k] >> line.FineShift;
-  }
-  const Bytes whole = WholeOf(Saturated(upper[0], upper[1]), Saturated(upper[2], upper[3]));
-  StoreUnit(sums, unit, whole ^ Sample(SlotLine::Middle));
-  const std::uint32_t doubts =
-      Difference(whole, WholeOf(Saturated(lower[0], lower[1]), Saturated(lower[2], lower[3])));
-  if (doubts != 0) SettleUnitPlainly(sums, unit, doubts);
-}
-
-/// Makes what is in doubt of a unit.
-LOOP_INLINE void Settle(const SlotSums& sums, std::ptrdiff_t unit, std::uint32_t doubts) {
-  if (__builtin_popcount(doubts) > Width / 4) return SettleUnit(sums, unit);
-  for (; doubts != 0; doubts &= doubts - 1) {
-    const int sample = __builtin_ctz(doubts);
-    if (const std::ptrdiff_t at = unit * Width + sample; at < sums.Samples)
-      sums.Into[at] = SettledSample(sums, unit, sample);
-  }
-}
-
-LOOP_INLINE bool HasDoubts(const SlotLine& line) { return line.Gap != 0; }
 
 }
 }

@@ -22,7 +22,7 @@ TurnedRows::TurnedRows(const ScalePair& pair, const ContributionTable& table, st
 }
 
 bool TurnedRows::Fits() {
-  const std::int32_t groupSlots = GroupPixels / Prepared.Loops->LinesInSlot;
+  constexpr std::int32_t groupSlots = GroupPixels / LinesInSlot;
   Kept = (Prepared.Lines.MostSlots(1) + groupSlots - 1) / groupSlots + 1;
   const auto slotBytes = std::size_t(Pair->Channels * Prepared.Loops->Width * SlotLoops::SampleBytes);
   constexpr std::size_t alignment = 64;
