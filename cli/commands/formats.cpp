@@ -9,17 +9,17 @@ namespace picturezor::cli {
 namespace {
 
 int Formats() {
-  std::printf("%-10s %-26s %-5s %-6s %-5s %-6s %-5s %-6s %-6s %s\n", "type", "names", "reads", "writes",
-              "gray", "alpha", "CMYK", "pages", "parts", "stream");
+  std::printf("%-10s %-5s %-6s %-5s %-6s %-5s %-6s %-6s %-7s %s\n", "type", "reads", "writes", "gray",
+              "alpha", "CMYK", "pages", "parts", "stream", "names");
   for (const FileType* type : FileTypes()) {
     std::string names;
     for (const std::string_view ending : type->Extensions) names.append(ending).push_back(' ');
     const auto yes = [](bool has) { return has ? "yes" : "-"; };
     const auto holds = [&](auto matches) { return yes(std::ranges::any_of(type->Holds, matches)); };
-    std::printf("%-10s %-26s %-5s %-6s %-5s %-6s %-5s %-6s %-6s %s\n", type->Name, names.c_str(), "yes",
-                yes(type->Create), holds([](Format format) { return WithoutAlpha(format) == Format::G; }),
-                holds(HasAlpha), holds([](Format format) { return WithoutAlpha(format) == Format::CMYK; }),
-                yes(type->Several), yes(type->Parts), yes(type->InOrder));
+    std::printf("%-10s %-5s %-6s %-5s %-6s %-5s %-6s %-6s %-7s %s\n", type->Name, "yes", yes(type->Create),
+                holds([](Format format) { return WithoutAlpha(format) == Format::G; }), holds(HasAlpha),
+                holds([](Format format) { return WithoutAlpha(format) == Format::CMYK; }), yes(type->Several),
+                yes(type->Parts), yes(type->InOrder), names.c_str());
   }
   return Done;
 }
