@@ -17,6 +17,8 @@ from .recipe import Recipe
 
 # Bytes that a picture weighs beside those of its file: what it costs however small it is.
 _EVERY_PICTURE = 1 << 16
+# Seconds after which workers of this machine are given up. Those of a cluster may come at any time.
+_WITHOUT_WORKERS = 180
 # Groups for each hand of a worker: one in work, one that waits beside it.
 _AHEAD = 2
 
@@ -93,7 +95,7 @@ class _Groups:
 
 
 class _Batch:
-    def __init__(self, client, journal, recipe, job, fail_fast, seconds, progress, stop, report):
+    def __init__(self, client, journal, recipe, job, fail_fast, seconds, progress, stop, report, own):
         from distributed import as_completed
 
         self._client, self._journal, self._recipe, self._job = client, journal, recipe, job
@@ -108,6 +110,8 @@ class _Batch:
         self._suspects = collections.deque()  # Pictures whose group's workers died
         self._unfit = {}  # Address of a worker: what keeps it from working
         self._alone = False
+        self._own, self._seen = own, time.monotonic()
+        self._known, self._asked = {}, 0.0  # The workers, and when they were asked for
         self._results = as_completed(with_results=True, loop=client.loop, raise_errors=False)
 
     def work(self):
@@ -131,11 +135,18 @@ class _Batch:
                 future.release()
 
     def _workers(self):
-        return self._client.scheduler_info()["workers"]
+        # The scheduler is asked, so not too often.
+        if time.monotonic() - self._asked > 1:
+            self._known, self._asked = self._client.scheduler_info()["workers"], time.monotonic()
+        return self._known
 
     def _fill(self):
         """Keeps the workers busy, and the engine's list of tasks short however many pictures there are."""
         workers = self._workers()
+        if workers:
+            self._seen = time.monotonic()
+        elif self._own and time.monotonic() - self._seen > _WITHOUT_WORKERS:
+            raise _Stopped("the workers died and don't come back")
         fit = {address: about for address, about in workers.items() if address not in self._unfit}
         if workers and not fit:
             raise _Stopped("no machine is left to work on: " + next(iter(self._unfit.values())))
@@ -201,8 +212,11 @@ def _local_client(workers):
     import dask
     from distributed import Client, LocalCluster
 
-    # A task that takes two workers along is given up.
-    dask.config.set({"distributed.scheduler.allowed-failures": 1})
+    # A task that takes two workers along is given up. Nobody looks at profiles of what only waits for a command.
+    dask.config.set({"distributed.scheduler.allowed-failures": 1, "distributed.worker.profile.interval": "1s",
+                     "distributed.worker.profile.cycle": "10s",
+                     # A machine that is very busy may take long to bring a worker back.
+                     "distributed.comm.timeouts.connect": "120s"})
     cluster = LocalCluster(n_workers=workers, threads_per_worker=1, dashboard_address="127.0.0.1:0",
                            silence_logs="CRITICAL")
     return Client(cluster)
@@ -265,7 +279,8 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
                    "threads": max(1, len(os.sched_getaffinity(0)) // workers) if own else None}
             _send_along()
             try:
-                _Batch(client, book, recipe, job, fail_fast, task_seconds, progress, stop, outcome).work()
+                _Batch(client, book, recipe, job, fail_fast, task_seconds, progress, stop, outcome,
+                       bool(own)).work()
                 if own:
                     # One that is just coming back would complain of a scheduler that is gone.
                     with contextlib.suppress(TimeoutError):

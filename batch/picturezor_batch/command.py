@@ -149,11 +149,11 @@ def _summary(report):
 
 def main(arguments=None):
     """Gives the exit code."""
-    import dask
     from tqdm import tqdm
 
-    # What the engine has to tell of its workers is told here in the batch's own words.
-    dask.config.set({"logging": {"distributed": "critical", "asyncio": "critical"}})
+    # What the engine has to tell of its workers is told here in the batch's own words. Workers read these too.
+    os.environ.setdefault("DASK_LOGGING__DISTRIBUTED", "critical")
+    os.environ.setdefault("DASK_LOGGING__ASYNCIO", "critical")
 
     client = None
     try:

@@ -17,8 +17,8 @@ RECIPE = "crop --rect 3,3,150,110\nfilter unsharp # sharper"
 
 
 def wait_for(happens):
-    """Until it gives something true, which comes back; a minute is as good as never."""
-    end = time.monotonic() + 60
+    """Until it gives something true, which comes back; five minutes are as good as never."""
+    end = time.monotonic() + 300
     while not (found := happens()):
         assert time.monotonic() < end, "it never happened"
         time.sleep(0.02)
@@ -49,7 +49,7 @@ class Batch:
     def run(self, *arguments, code=0):
         """Gives what it says on standard output and on standard error."""
         process = self.start(*arguments)
-        out, error = process.communicate(timeout=120)
+        out, error = process.communicate(timeout=400)
         assert process.returncode == code, error.decode()
         return out.decode(), error.decode()
 

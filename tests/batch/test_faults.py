@@ -60,7 +60,7 @@ def slow(batch):
 
 
 def finished(process):
-    out, error = process.communicate(timeout=120)
+    out, error = process.communicate(timeout=400)
     return process.returncode, out.decode(), error.decode()
 
 
