@@ -133,6 +133,13 @@ OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
   for (const std::string& note : Upright.Notes) session.Note(file, note);
 }
 
+std::unique_ptr<flow::Rows> OpenedImage::Rows(Session& session, const flow::Chain& chain) {
+  std::function<std::unique_ptr<ImageReader>()> again;
+  // Standard input comes once.
+  if (File != "-") again = [&session, file = File] { return OpenFor(session, file); };
+  return flow::Through({std::move(Reader), again}, chain, {session.Stores, session.Threads}, session.Bar);
+}
+
 Target::Target(Session& session, const std::filesystem::path& file)
     : File(file), Spool(session.Stores.TempDirectory), Type(TypeToWrite(file, session.TypeName)) {
   const WriteOptions& asked = session.Writing;

@@ -71,8 +71,8 @@ struct OpenedImage {
   OpenedImage(Session& session, const std::filesystem::path& file);
   PictureSize Size() const { return {Upright.Width, Upright.Height, Upright.Pixels}; }
   flow::Shape Shape() const { return {Upright.Width, Upright.Height, Upright.Pixels, Upright.Density}; }
-  /// Reads all of it, once.
-  void ReadInto(Session& session, const Picture& picture) { files::ReadInto(picture, *Reader, session.Bar); }
+  /// All of its rows, upright, after some operations, once.
+  std::unique_ptr<flow::Rows> Rows(Session& session, const flow::Chain& chain = {});
 };
 
 /// The file that a command writes. Made before the work, so that one that can't be written shows early.
@@ -90,12 +90,12 @@ class Target {
              Progress& progress);
   /// Writes and completes the file. `info` tells what else goes into it.
   void Write(Session& session, const Picture& picture, Format format, ImageInfo info);
+  /// For the rows, as pixels of `format`. `info` tells what else goes into the file.
+  std::unique_ptr<ImageWriter> Writer(const Session& session, Format format, ImageInfo info, int threads);
   /// The file stands under its name from now on.
   void Commit();
 
  private:
-  std::unique_ptr<ImageWriter> Writer(const Session& session, Format format, ImageInfo info, int threads);
-
   std::filesystem::path File, Spool;
   const FileType& Type;
   std::unique_ptr<files::Output> Output;

@@ -4,18 +4,25 @@
 #include <cmath>
 
 #include "failure.h"
+#include "step.h"
+#include "step_options.h"
 
 namespace picturezor::cli {
 
+std::unique_ptr<const flow::Operation> ScaleTo(Session& session, const Extent& size, bool draft) {
+  return steps::MakeOperation(
+      *steps::FindStep("scale"),
+      std::map<std::string, steps::Value>{
+          {"width", std::int64_t{size.Width}}, {"height", std::int64_t{size.Height}}, {"draft", draft}},
+      SurroundingsOf(session));
+}
+
 HostPicture SmallPicture(Session& session, OpenedImage& image, std::int32_t width, std::int32_t height) {
-  const PictureSize whole = image.Size();
-  const auto pictures = MakePictures(session.Stores, {whole, {width, height, whole.Of}});
-  image.ReadInto(session, pictures[0]);
-  const bool sameSize = width == whole.Width && height == whole.Height;
-  const Picture& small = pictures[sameSize ? 0 : 1];
-  if (!sameSize && !small.Scale(pictures[0], {}, Kernel::Lanczos3, width, height))
-    throw Failure(image.File, "it can't be scaled");
-  HostPicture picture = small.CopyPictureWithMask();
+  flow::Chain chain;
+  if (width != image.Upright.Width || height != image.Upright.Height)
+    chain.push_back(ScaleTo(session, {width, height}, false));
+  const auto rows = image.Rows(session, chain);
+  HostPicture picture = flow::Gather(*rows, session.Stores, session.Bar).CopyPictureWithMask();
   if (!picture) throw Failure(image.File, "no picture can be made of it");
   return picture;
 }

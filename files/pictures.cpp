@@ -1,6 +1,5 @@
 #include "pictures.h"
 
-#include <fcntl.h>
 #include <sys/statvfs.h>
 #include <unistd.h>
 
@@ -41,49 +40,27 @@ std::int64_t MemoryOf(const PictureSize& size) {
   return (std::int64_t{size.Width} * BytesPerPixel(size.Of) + 63) / 64 * 64 * size.Height;
 }
 
-/// Takes the room on the disk now, so that a full disk shows here and not in the middle of the work.
-void Reserve(const std::filesystem::path& file, std::int64_t bytes, const std::filesystem::path& directory) {
-  const int descriptor = open(file.c_str(), O_WRONLY | O_CLOEXEC);
-  if (descriptor < 0) throw Failure(directory, std::strerror(errno));
-  const bool reserved = fallocate(descriptor, 0, 0, bytes) == 0;
-  const int reason = errno;
-  close(descriptor);
-  if (!reserved && reason != EOPNOTSUPP)
-    throw Failure(directory, std::string("no room for a temporary file of ") + Megabytes(bytes) + ": " +
-                                 std::strerror(reason));
-}
+/// The module keeps smaller pictures than this in memory of its own, and takes blocks of no more than that.
+constexpr std::int64_t MostOfItsOwn = INT32_MAX, MostOfBlocks = sizeof(void*) > 4 ? UINT32_MAX : INT32_MAX;
 
 Picture MakeMapped(const PictureSize& size, const std::filesystem::path& directory) {
   const std::int64_t page = std::max<std::int64_t>(sysconf(_SC_PAGESIZE), 4096);
   const std::int64_t row = (std::int64_t{size.Width} * BytesPerPixel(size.Of) + page - 1) / page * page;
   const std::int64_t bytes = row * size.Height + page;
-  struct statvfs disk {};
-  if (statvfs(directory.c_str(), &disk) != 0)
-    throw Failure(directory, std::string("no temporary file can be made there: ") + std::strerror(errno));
-  const auto free = std::int64_t(disk.f_bavail) * std::int64_t(disk.f_frsize);
-  if (bytes > free)
-    throw Failure(directory, SizeText(size) + " need a temporary file of " + Megabytes(bytes) +
-                                 ", but only " + Megabytes(free) +
-                                 " are free; --temp-dir names another place");
-  const PrivateDirectory own(directory);
-  const std::filesystem::path file = own.Path() / "pixels";
-  RemoveOnDeath(file);
-  const struct Unlink {
-    const std::filesystem::path& File;
-    ~Unlink() {
-      unlink(File.c_str());
-      KeepOnDeath(File);
-    }
-  } nameless{file};
-  Picture picture = Picture::Mapped(file, size.Width, size.Height, size.Of);
+  RequireRoom(directory, bytes, size);
+  const int nameless = NamelessFile(directory);
+  // The module opens it once more, and takes all of its room.
+  const Picture picture =
+      Picture::Mapped("/proc/self/fd/" + std::to_string(nameless), size.Width, size.Height, size.Of);
+  close(nameless);
   if (!picture.Valid())
     throw Failure(directory, "no temporary file of " + Megabytes(bytes) + " can be made there");
-  Reserve(file, bytes, directory);
   return picture;
 }
 
 Picture MakeInMemory(const PictureSize& size) {
-  Picture picture(size.Width, size.Height, size.Of);
+  const Picture picture = MemoryOf(size) > MostOfItsOwn ? Picture::InBlock(size.Width, size.Height, size.Of)
+                                                        : Picture(size.Width, size.Height, size.Of);
   if (!picture.Valid()) throw Failure("not enough memory for " + SizeText(size));
   return picture;
 }
@@ -146,6 +123,17 @@ void ReadUpright(const Picture& picture, ImageReader& reader, Progress& progress
 
 }
 
+void RequireRoom(const std::filesystem::path& directory, std::int64_t bytes, const PictureSize& size) {
+  struct statvfs disk {};
+  if (statvfs(directory.c_str(), &disk) != 0)
+    throw Failure(directory, std::string("no temporary file can be made there: ") + std::strerror(errno));
+  const auto free = std::int64_t(disk.f_bavail) * std::int64_t(disk.f_frsize);
+  if (bytes > free)
+    throw Failure(directory, SizeText(size) + " need a temporary file of " + Megabytes(bytes) +
+                                 ", but only " + Megabytes(free) +
+                                 " are free; --temp-dir names another place");
+}
+
 std::int64_t DefaultMemoryLimit() { return FreeMemory() / 2; }
 
 std::int64_t ParseBytes(const std::string& text) {
@@ -168,8 +156,7 @@ std::int64_t ParseBytes(const std::string& text) {
 }
 
 std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector<PictureSize>& sizes) {
-  // The module keeps pictures in memory below this, and needs this many rows for a mapped one.
-  constexpr std::int64_t mostInMemory = std::int64_t{1} << 31;
+  // The module needs this many rows for a mapped picture.
   constexpr std::int32_t fewestMapped = 5;
   std::vector<std::size_t> order(sizes.size());
   std::iota(order.begin(), order.end(), 0);
@@ -180,7 +167,7 @@ std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector
   for (const std::size_t i : order) {
     const PictureSize& size = sizes[i];
     const std::int64_t bytes = MemoryOf(size);
-    const bool fits = options.Kind != Store::Mapped && bytes < mostInMemory &&
+    const bool fits = options.Kind != Store::Mapped && bytes <= MostOfBlocks &&
                       (options.Kind == Store::Memory || used + bytes <= options.MemoryLimit);
     if (fits || size.Height < fewestMapped) {
       used += bytes;
@@ -188,7 +175,8 @@ std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector
         throw Failure(SizeText(size) + " need " + Megabytes(bytes) + " of memory, more than is free");
       pictures[i] = MakeInMemory(size);
     } else if (options.Kind == Store::Memory) {
-      throw Failure(SizeText(size) + " are too many for --store memory, which ends at 2 GB a picture");
+      throw Failure(SizeText(size) + " are too many for --store memory, which ends at " +
+                    Megabytes(MostOfBlocks) + " a picture");
     } else {
       pictures[i] = MakeMapped(size, options.TempDirectory);
     }

@@ -31,6 +31,10 @@ struct PictureSize {
   Format Of = Format::Unknown;
 };
 
+/// Throws Failure where the disk under a directory has no room for a temporary file of so many bytes for
+/// pixels of that size.
+void RequireRoom(const std::filesystem::path& directory, std::int64_t bytes, const PictureSize& size);
+
 /// The pictures that a command needs, zeroed. The smallest go to memory as long as the limit allows. A mapped
 /// one has its room on the disk from the start and its file has no name any more, so nothing can be left
 /// behind. Throws Failure where there is no room.

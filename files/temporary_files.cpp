@@ -57,6 +57,8 @@ void DieOfFullDisk(int) {
   _exit(CodeOfFullDisk);
 }
 
+constexpr char OpenFiles[] = "/proc/self/fd/";
+
 /// No signal comes between making a file and naming it.
 class SignalsHeldBack {
  public:
@@ -129,15 +131,19 @@ OutputFile::OutputFile(const std::filesystem::path& target) : Output(target), Re
   if (there && S_ISDIR(about.st_mode)) throw Failure(target, "a directory");
   if (there && !S_ISREG(about.st_mode)) throw Failure(target, "not a regular file");
   if (there && access(Real.c_str(), W_OK) != 0) throw Failure(target, std::strerror(errno));
-  // Short, since a name may be as long as the system allows already.
-  std::string name = (Real.parent_path() / ".picturezor-XXXXXX").string();
-  const SignalsHeldBack held;
-  File = mkostemp(name.data(), O_CLOEXEC);
-  if (File < 0) throw Failure(target, std::strerror(errno));
-  Temporary = name;
-  RemoveOnDeath(Temporary);
   const mode_t mask = umask(0);
   umask(mask);
+  const std::filesystem::path directory = Real.has_parent_path() ? Real.parent_path() : ".";
+  // Not every file system has files without a name, and there is one way only to name them later.
+  if (access(OpenFiles, X_OK) == 0) File = open(directory.c_str(), O_TMPFILE | O_RDWR | O_CLOEXEC, 0600);
+  if (File < 0) {
+    const SignalsHeldBack held;
+    std::string name = TemporaryName();
+    File = mkostemp(name.data(), O_CLOEXEC);
+    if (File < 0) throw Failure(target, std::strerror(errno));
+    Temporary = name;
+    RemoveOnDeath(Temporary);
+  }
   if (fchmod(File, there ? about.st_mode & 07777 : 0666 & ~mask) != 0) {
     // A file system without permissions has none to set.
   }
@@ -149,7 +155,28 @@ OutputFile::~OutputFile() {
   KeepOnDeath(Temporary);
 }
 
+std::string OutputFile::TemporaryName() const {
+  // Short, since a name may be as long as the system allows already.
+  return (Real.parent_path() / ".picturezor-XXXXXX").string();
+}
+
+void OutputFile::GetName() {
+  std::string name = TemporaryName();
+  const std::string file = OpenFiles + std::to_string(File);
+  const SignalsHeldBack held;
+  // The name of a file that is made and goes away again is free.
+  const int place = mkostemp(name.data(), O_CLOEXEC);
+  if (place < 0) throw Failure(Name, std::strerror(errno));
+  close(place);
+  unlink(name.c_str());
+  if (linkat(AT_FDCWD, file.c_str(), AT_FDCWD, name.c_str(), AT_SYMLINK_FOLLOW) != 0)
+    throw Failure(Name, std::strerror(errno));
+  Temporary = name;
+  RemoveOnDeath(Temporary);
+}
+
 void OutputFile::Commit() {
+  if (Temporary.empty()) GetName();
   const int file = std::exchange(File, -1);
   if (close(file) != 0) throw Failure(Name, std::strerror(errno));
   if (rename(Temporary.c_str(), Real.c_str()) != 0) throw Failure(Name, std::strerror(errno));
@@ -158,6 +185,9 @@ void OutputFile::Commit() {
 }
 
 int NamelessFile(const std::filesystem::path& directory) {
+  const int nameless = open(directory.c_str(), O_TMPFILE | O_EXCL | O_RDWR | O_CLOEXEC, 0600);
+  if (nameless >= 0) return nameless;
+  // Not every file system has them.
   std::string name = (directory / "picturezor-XXXXXX").string();
   const SignalsHeldBack held;
   const int file = mkostemp(name.data(), O_CLOEXEC);

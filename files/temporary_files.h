@@ -17,8 +17,9 @@ void KeepOnDeath(const std::filesystem::path& file);
 /// $TMPDIR, or /var/tmp, which lies on a disk where /tmp may lie in memory.
 std::filesystem::path DefaultTempDirectory();
 
-/// A file that comes to stand under its target's name when it is complete, and not before. Until then it is
-/// beside it under a name of its own, and goes away with this object.
+/// A file that comes to stand under its target's name when it is complete, and not before. Until then it has
+/// no name where the file system allows that, or one of its own beside the target, and goes away with this
+/// object.
 class OutputFile final : public Output {
  public:
   /// Throws Failure where the target can't be written.
@@ -27,6 +28,9 @@ class OutputFile final : public Output {
   void Commit() override;
 
  private:
+  std::string TemporaryName() const;
+  void GetName();
+
   std::filesystem::path Real, Temporary;
 };
 

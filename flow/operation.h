@@ -2,6 +2,7 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <vector>
 
 #include "image_file.h"
 #include "pictures.h"
@@ -63,6 +64,12 @@ class Operation {
   virtual std::optional<Rect> Cuts() const { return std::nullopt; }
   /// Where a reader may give a smaller picture instead of the source.
   virtual std::optional<Draft> Drafted(const Shape& source) const;
+  /// Where the work is nothing else than to turn or mirror the source: how a file would lie, 1 to 8 as in
+  /// EXIF, that holds the source and shows the result.
+  virtual std::optional<int> Turns() const { return std::nullopt; }
+  /// The same as several operations that need less memory, one after the other, where the rows in order don't
+  /// do because source or result are so large.
+  virtual std::vector<std::unique_ptr<const Operation>> Parts(const Shape&) const { return {}; }
   /// The result of a whole picture, or of a band of rows with those in reach. In place where that can be: the
   /// source may come back changed, and is lost otherwise. The source may be a view. Throws files::Failure
   /// where it can't be done.

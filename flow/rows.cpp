@@ -78,6 +78,12 @@ class RowsOfPicture final : public Rows {
   const std::uint8_t* Samples = nullptr;
 };
 
+Shape StoredShapeOf(const OpenFile& file) {
+  const files::ImageInfo& info = file.Reader->Info();
+  const Rect part = file.Part.value_or(Rect{0, 0, info.Width, info.Height});
+  return {part.Width, part.Height, info.Pixels, info.Density};
+}
+
 }
 
 std::size_t Rows::RowBytes() const { return std::size_t(Of.Width) * std::size_t(BytesPerPixel(Of.Of)); }
@@ -94,10 +100,9 @@ void ReadRows(Rows& rows, std::uint8_t* room, std::ptrdiff_t stride, std::int32_
 
 Shape ShapeOf(const OpenFile& file) {
   files::ImageInfo info = file.Reader->Info();
-  if (file.Part) {
-    info.Width = file.Part->Width;
-    info.Height = file.Part->Height;
-  }
+  const Shape stored = StoredShapeOf(file);
+  info.Width = stored.Width;
+  info.Height = stored.Height;
   info = files::Upright(info);
   return {info.Width, info.Height, info.Pixels, info.Density};
 }
@@ -107,7 +112,7 @@ RowSource RowsOf(OpenFile file) {
     std::mutex Access;
     OpenFile File;
   };
-  const Shape shape = ShapeOf(file);
+  const Shape shape = StoredShapeOf(file);
   const files::ImageInfo& info = file.Reader->Info();
   const Rect part = file.Part.value_or(Rect{0, 0, info.Width, info.Height});
   const bool anywhere = file.Reader->StartsAnywhere() && file.Again;

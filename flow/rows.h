@@ -55,7 +55,8 @@ struct OpenFile {
 /// What its picture is once it stands upright.
 Shape ShapeOf(const OpenFile& file);
 
-/// The rows of a file, whose orientation is 1 or 2, upright. Behind the last row the file is read to its end.
+/// The rows of a file as they are stored, but those of orientation 2 upright. Behind the last row the file is
+/// read to its end.
 RowSource RowsOf(OpenFile file);
 /// The rows of a picture in one of the formats of files. One thread at a time reads them.
 RowSource RowsOf(const Picture& picture, const Shape& shape);

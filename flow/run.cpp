@@ -10,6 +10,7 @@
 #include "failure.h"
 #include "in_format.h"
 #include "threads.h"
+#include "turned_rows.h"
 
 namespace picturezor::flow {
 
@@ -17,10 +18,19 @@ namespace {
 
 /// Bytes that bands take where they need no more.
 constexpr std::int64_t FewBandBytes = 32 << 20;
+/// Pictures that take less are turned in memory, if there may be so much.
+constexpr std::int64_t FewTurnedBytes = 32 << 20;
 /// Bytes of rows that go to a writer together.
 constexpr std::int64_t RowsAtOnceBytes = 1 << 20;
 
+/// Larger ones can't stand on a range of addresses.
+constexpr std::int64_t MostArriving = UINT32_MAX;
+
 using Kind = Dependence::Kind;
+
+std::int64_t BytesOf(const Shape& shape) {
+  return std::int64_t{shape.Width} * shape.Height * BytesPerPixel(shape.Of);
+}
 
 int ThreadsOf(const RunOptions& options) { return options.Threads > 0 ? options.Threads : Processors(); }
 
@@ -29,9 +39,10 @@ class Stream {
  public:
   Stream(OpenFile file, const RunOptions& options, files::Progress& progress)
       : Of(ShapeOf(file)), Options(options), Report(progress) {
-    const bool asItComes = file.Reader->Info().Orientation <= 2 && options.Stores.Kind == files::Store::Auto;
-    if (asItComes) {
+    const int orientation = file.Reader->Info().Orientation;
+    if (options.Stores.Kind == files::Store::Auto && (orientation <= 2 || IsLarge())) {
       Coming = RowsOf(std::move(file));
+      if (orientation > 2) Turn(orientation);
     } else {
       Whole = files::MakePictures(options.Stores, {{Of.Width, Of.Height, Of.Of}})[0];
       if (file.Part) file.Reader = files::PartOf(std::move(file.Reader), *file.Part);
@@ -56,8 +67,19 @@ class Stream {
 
   void Add(const Operation& work) {
     const Shape result = work.Result(Of);
-    const Kind kind = Options.Stores.Kind == files::Store::Auto ? work.DependsOn(Of).Of : Kind::Whole;
-    if (kind != Kind::Bands || !JoinsBands(work)) {
+    const bool streams = Options.Stores.Kind == files::Store::Auto;
+    const Kind kind = streams ? work.DependsOn(Of).Of : Kind::Whole;
+    if (kind == Kind::InOrder && IsTooLarge(result)) {
+      auto parts = work.Parts(Of);
+      const bool any = !parts.empty();
+      for (auto& part : parts) Add(*Kept->emplace_back(std::move(part)));
+      if (any) return;
+    }
+    const int turned = streams && IsLarge() ? work.Turns().value_or(1) : 1;
+    if (kind == Kind::Whole && turned > 2) {
+      FlushBands();
+      Turn(turned);
+    } else if (kind != Kind::Bands || !JoinsBands(work)) {
       FlushBands();
       if (kind == Kind::InOrder && Coming)
         ApplyInOrder(work);
@@ -69,6 +91,8 @@ class Stream {
 
   std::unique_ptr<Rows> Take() {
     FlushBands();
+    // Nobody goes back from here on.
+    if (Turned) Turned->ReadOnce();
     // Where nothing is left to do they are read ahead.
     if (Coming && !ReadAhead) AddBands(BandChain({}, Of));
     return Coming ? Coming->From(0) : RowsOf(Whole, Of).From(0);
@@ -97,6 +121,24 @@ class Stream {
   }
 
  private:
+  bool IsLarge() const { return BytesOf(Of) > std::min(FewTurnedBytes, Options.Stores.MemoryLimit / 2); }
+
+  /// Whether rows can't arrive in a picture, or a result would have to be mapped.
+  bool IsTooLarge(const Shape& result) const {
+    const std::int64_t row = (BytesOf({Of.Width, 1, Of.Of, {}}) + 63) / 64 * 64;
+    return row * Of.Height > MostArriving || BytesOf(result) > Options.Stores.MemoryLimit;
+  }
+
+  /// All rows are read, and come as those of the upright picture.
+  void Turn(int orientation) {
+    if (!Coming) Coming = RowsOf(std::exchange(Whole, {}), Of);
+    if (Turned) Turned->ReadOnce();
+    Standing = Picture();
+    Turned = std::make_shared<TurnedRows>(*Coming, orientation, Options.Stores, ThreadsOf(Options), Report);
+    Coming = Turned->Source();
+    ReadAhead = false;
+  }
+
   const Shape& BandSource() const { return Bands.empty() ? Of : BandsFrom; }
 
   /// Whether an operation can be done on bands together with those before it, or at least by itself.
@@ -136,7 +178,7 @@ class Stream {
     const int threads = ThreadsOf(Options);
     const BandSizes sizes = ChooseBands(chain, threads, MemoryFor(chain));
     Standing = Picture();
-    const auto from = [=, source = *Coming](std::int64_t first) {
+    const auto from = [=, source = *Coming, kept = Kept](std::int64_t first) {
       return std::make_unique<BandRows>(source, chain, threads, sizes, first);
     };
     Coming = RowSource{chain.Result(), from, Coming->Anywhere};
@@ -190,6 +232,7 @@ class Stream {
     source.RequireAll();
     if (failed) std::rethrow_exception(failed);
     Coming.reset();
+    Turned.reset();
     ReadAhead = false;
   }
 
@@ -198,8 +241,10 @@ class Stream {
     stores.MemoryLimit /= std::max(1, work.Pictures());
     if (Coming) {
       Standing = Picture();
+      if (Turned) Turned->ReadOnce();
       Whole = Gather(*Coming->From(0), stores, Report);
       Coming.reset();
+      Turned.reset();
       ReadAhead = false;
     }
     Report.Begin("working");
@@ -215,12 +260,17 @@ class Stream {
   }
 
   std::optional<RowSource> Coming;
+  /// What those come from, if it was turned.
+  std::shared_ptr<TurnedRows> Turned;
   /// Whether those come from bands, which read ahead themselves.
   bool ReadAhead = false;
   /// The source itself, where that is a picture in memory and nothing was done to it yet.
   Picture Standing;
   Picture Whole;
   Shape Of;
+  /// Operations that were made on the way, for as long as rows come.
+  std::shared_ptr<std::vector<std::unique_ptr<const Operation>>> Kept =
+      std::make_shared<std::vector<std::unique_ptr<const Operation>>>();
   std::vector<const Operation*> Bands;
   Shape BandsFrom;
   const RunOptions& Options;

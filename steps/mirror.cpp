@@ -12,6 +12,7 @@ class Mirroring final : public flow::Operation {
   flow::Dependence DependsOn(const flow::Shape&) const override {
     return {.Of = Vertical ? flow::Dependence::Kind::Whole : flow::Dependence::Kind::Bands};
   }
+  std::optional<int> Turns() const override { return !Vertical ? 2 : Horizontal ? 3 : 4; }
   int Pictures() const override { return 1; }
   Picture Apply(Picture source, const flow::Workplace&) const override {
     if (Horizontal) source.HMirror();

@@ -21,9 +21,7 @@ class Rotating final : public flow::Operation {
 
   flow::Shape Result(const flow::Shape& source) const override {
     // Quarters of a turn, and within 45 degrees what is left.
-    double angle = std::fmod(Angle, 360.0);
-    if (angle < 0) angle += 360;
-    if (angle == 360) angle = 0;
+    const double angle = Within360();
     const int quarters = angle > 315 ? 0 : int(std::ceil((angle - 45) / 90));
     double rest = angle - 90 * quarters;
     if (angle > 315) rest = angle;
@@ -41,6 +39,15 @@ class Rotating final : public flow::Operation {
     result.Height = std::int32_t(height);
     return result;
   }
+  flow::Dependence DependsOn(const flow::Shape&) const override {
+    return {.Of = Turns() == 1 ? flow::Dependence::Kind::Bands : flow::Dependence::Kind::Whole};
+  }
+  std::optional<int> Turns() const override {
+    const double angle = Within360();
+    if (std::fmod(angle, 90) != 0) return std::nullopt;
+    constexpr int counterClockwise[] = {1, 8, 3, 6};
+    return counterClockwise[int(angle / 90)];
+  }
   /// The picture, what it becomes, and what stands between two steps on the way.
   int Pictures() const override { return 4; }
   Picture Apply(Picture source, const flow::Workplace& at) const override {
@@ -53,6 +60,12 @@ class Rotating final : public flow::Operation {
   }
 
  private:
+  double Within360() const {
+    double angle = std::fmod(Angle, 360.0);
+    if (angle < 0) angle += 360;
+    return angle == 360 ? 0 : angle;
+  }
+
   const double Angle;
   Picture::Background Corners;
 };

@@ -3,6 +3,7 @@
 #include <map>
 
 #include "all_steps.h"
+#include "scale_passes.h"
 
 namespace picturezor::steps {
 
@@ -61,6 +62,11 @@ class Scaling final : public flow::Operation {
     rest->Width = size.Width;
     rest->Height = size.Height;
     return flow::Draft{{smaller * size.Width, smaller * size.Height}, std::move(rest)};
+  }
+  std::vector<std::unique_ptr<const flow::Operation>> Parts(const flow::Shape& source) const override {
+    if (Fast) return {};
+    const flow::Shape size = Result(source);
+    return flow::ScalePasses(By, size.Width, size.Height);
   }
   Picture Apply(Picture source, const flow::Workplace& at) const override {
     const flow::Shape size = Result({source.Width(), source.Height(), source.ImageFormat(), {}});

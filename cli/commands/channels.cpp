@@ -37,10 +37,21 @@ int Channels(Session& session, const ChannelsOptions& options) {
     targets.push_back(std::make_unique<Target>(session, file));
     targets.back()->Start(size.Width, size.Height);
   }
-  const auto pictures = MakePictures(session.Stores, {size});
-  source.ReadInto(session, pictures[0]);
-  for (std::size_t i = 0; i < targets.size(); ++i)
-    targets[i]->Write(session, pictures[0].Channel(std::int32_t(i)), Format::G, source.Upright);
+  const auto rows = source.Rows(session);
+  std::vector<std::unique_ptr<ImageWriter>> writers;
+  for (const auto& target : targets)
+    writers.push_back(target->Writer(session, Format::G, source.Upright, session.Threads));
+  const std::size_t channels = writers.size();
+  Bytes row(rows->RowBytes()), channel(row.size() / channels);
+  session.Bar.Begin("writing", size.Height);
+  for (std::int32_t y = 0; y < size.Height; ++y, session.Bar.Step()) {
+    flow::ReadRows(*rows, row.data(), 0, 1);
+    for (std::size_t c = 0; c < channels; ++c) {
+      for (std::size_t x = 0; x < channel.size(); ++x) channel[x] = row[x * channels + c];
+      writers[c]->WriteRow(channel.data());
+    }
+  }
+  for (const auto& writer : writers) writer->Finish();
   for (const auto& target : targets) target->Commit();
   return Done;
 }

@@ -17,17 +17,33 @@ std::string SizeAndFormat(const PictureSize& size) {
   return std::to_string(size.Width) + " x " + std::to_string(size.Height) + " " + Describe(size.Of);
 }
 
-std::int64_t DifferingPixels(const Picture& a, const Picture& b) {
-  const auto pixel = std::size_t(a.PixelSize()), row = pixel * std::size_t(a.Width());
-  std::int64_t count = 0;
-  for (std::int32_t y = 0; y < a.Height(); ++y) {
-    const MemoryBlock rowOfA = a.RawRow(y), rowOfB = b.RawRow(y);
-    if (!rowOfA || !rowOfB) throw Failure("a row of a picture can't be reached");
-    const std::uint8_t *atA = rowOfA.Start(), *atB = rowOfB.Start();
-    for (std::size_t at = 0; at < row; at += pixel)
-      count += !std::equal(atA + at, atA + at + pixel, atB + at);
+struct Difference {
+  std::int64_t Total = 0, Pixels = 0;
+};
+
+/// Of pictures of one size and format; nothing where there is no way to compare them.
+std::optional<Difference> DifferenceOf(flow::Rows& a, flow::Rows& b, Progress& progress) {
+  constexpr std::size_t bytesTogether = 1 << 20;
+  const flow::Shape& shape = a.About();
+  const std::size_t row = a.RowBytes(), pixel = std::size_t(BytesPerPixel(shape.Of));
+  const auto together = std::clamp<std::int32_t>(std::int32_t(bytesTogether / row), 1, shape.Height);
+  Bytes rowsOfA(row * std::size_t(together)), rowsOfB(rowsOfA.size());
+  const auto read = [&](flow::Rows& rows, Bytes& into, std::int32_t count) {
+    flow::ReadRows(rows, into.data(), std::ptrdiff_t(row), count);
+    return Picture(MemoryBlock::Over(into), shape.Width, count, shape.Of, std::int32_t(row));
+  };
+  Difference difference;
+  progress.Begin("comparing", shape.Height);
+  for (std::int32_t y = 0; y < shape.Height; y += together) {
+    const std::int32_t count = std::min(together, shape.Height - y);
+    const std::int64_t total = read(a, rowsOfA, count).CompareImages(read(b, rowsOfB, count));
+    if (total < 0) return std::nullopt;
+    difference.Total += total;
+    for (std::size_t at = 0; total > 0 && at < row * std::size_t(count); at += pixel)
+      difference.Pixels += !std::equal(&rowsOfA[at], &rowsOfA[at] + pixel, &rowsOfB[at]);
+    progress.Step(count);
   }
-  return count;
+  return difference;
 }
 
 int Compare(Session& session, const CompareOptions& options) {
@@ -38,16 +54,15 @@ int Compare(Session& session, const CompareOptions& options) {
   };
   if (a.Size().Width != b.Size().Width || a.Size().Height != b.Size().Height || a.Size().Of != b.Size().Of)
     refuse();
-  const auto pictures = MakePictures(session.Stores, {a.Size(), b.Size()});
-  a.ReadInto(session, pictures[0]);
-  b.ReadInto(session, pictures[1]);
-  const std::int64_t total = pictures[0].CompareImages(pictures[1]);
-  if (total < 0) refuse();
-  const std::int64_t differing = total ? DifferingPixels(pictures[0], pictures[1]) : 0;
-  const std::int64_t pixels = std::int64_t{a.Size().Width} * a.Size().Height;
+  const PictureSize size = a.Size();
+  const auto rowsOfA = a.Rows(session), rowsOfB = b.Rows(session);
+  const auto difference = DifferenceOf(*rowsOfA, *rowsOfB, session.Bar);
+  if (!difference) refuse();
+  const auto [total, differing] = *difference;
+  const std::int64_t pixels = std::int64_t{size.Width} * size.Height;
   session.Bar.Clear();
   std::printf("total difference:  %lld\n", static_cast<long long>(total));
-  std::printf("mean per sample:   %.6f\n", double(total) / double(pixels * ChannelsOf(a.Size().Of)));
+  std::printf("mean per sample:   %.6f\n", double(total) / double(pixels * ChannelsOf(size.Of)));
   std::printf("differing pixels:  %lld of %lld (%.4f %%)\n", static_cast<long long>(differing),
               static_cast<long long>(pixels), 100.0 * double(differing) / double(pixels));
   return total ? Different : Done;

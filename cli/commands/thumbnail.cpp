@@ -123,12 +123,7 @@ void Make(Session& session, const Thumbnail& one, int threads) {
   Target target(session, one.Out);
   flow::Chain chain;
   if (one.Size.Width != image.Upright.Width || one.Size.Height != image.Upright.Height)
-    chain.push_back(
-        steps::MakeOperation(*steps::FindStep("scale"),
-                             std::map<std::string, steps::Value>{{"width", std::int64_t{one.Size.Width}},
-                                                                 {"height", std::int64_t{one.Size.Height}},
-                                                                 {"draft", true}},
-                             SurroundingsOf(session)));
+    chain.push_back(ScaleTo(session, one.Size, true));
   if (WithoutAlpha(image.Upright.Pixels) == Format::CMYK) chain.push_back(std::make_unique<InLight>());
   Silence silent;
   const Format colours = HasAlpha(image.Upright.Pixels) ? Format::RGBA : Format::RGB;

@@ -4,9 +4,9 @@
 #include "exif.h"
 #include "failure.h"
 #include "file_types.h"
-#include "tiff_handle.h"
 #include "tiff_notes.h"
 #include "tiff_pages.h"
+#include "tiff_planes.h"
 #include "tiff_writer.h"
 
 namespace picturezor::files {
@@ -28,156 +28,10 @@ double MostPixelsPerByte(std::uint16_t compression, std::int64_t width, double b
   }
 }
 
-/// How the samples of a file lie, and where rows come from.
-struct Layout {
-  std::int64_t Width = 0, Height = 0;
-  std::uint16_t Bits = 1, Samples = 1, Photometric = 0, Compression = 0;
-  bool Planar = false, Tiled = false, Associated = false;
-  int Colours = 0;
-  /// The sample that is alpha, or -1.
-  int AlphaAt = -1;
-  /// Samples that stand side by side.
-  int Interleaved() const { return Planar ? 1 : Samples; }
-  int Planes() const { return Planar ? Samples : 1; }
-  std::size_t RowBytes(std::int64_t pixels) const {
-    return std::size_t((pixels * Interleaved() * Bits + 7) / 8);
-  }
-};
-
-/// Gives the decoded rows of one plane in order, packed as in the file, 16-bit samples in the machine's
-/// order.
-class PlaneSource {
- public:
-  virtual ~PlaneSource() = default;
-  virtual const std::uint8_t* Row(std::int64_t y) = 0;
-};
-
-/// Strips of any compression. libtiff holds one strip as it is compressed.
-class DecodedStrips : public PlaneSource {
- public:
-  DecodedStrips(const Input& input, int plane, std::int64_t memoryLimit)
-      : File(TIFFHandle::Open(input, memoryLimit)), Plane(std::uint16_t(plane)) {
-    if (File->Get<std::uint16_t>(TIFFTAG_COMPRESSION, 1) == COMPRESSION_JPEG)
-      File->Set(TIFFTAG_JPEGCOLORMODE, JPEGCOLORMODE_RGB);
-    File->ReadingPixels();
-    // By the number of its samples a pixel, a row can be far larger than the picture made of it.
-    const std::uint64_t rowBytes = TIFFScanlineSize64(*File);
-    RequireWithinLimit(input.Name(), std::int64_t(rowBytes), memoryLimit, "a row of this TIFF");
-    Line.resize(std::size_t(rowBytes));
-    RowsPerStrip = std::max<std::uint32_t>(1, File->Get<std::uint32_t>(TIFFTAG_ROWSPERSTRIP, UINT32_MAX));
-  }
-
-  const std::uint8_t* Row(std::int64_t y) override {
-    // The rows of a strip come one after the other.
-    const std::int64_t strip = y - y % RowsPerStrip;
-    for (std::int64_t row = Next >= strip && Next <= y ? Next : strip; row <= y; ++row)
-      File->Check(TIFFReadScanline(*File, Line.data(), std::uint32_t(row), Plane) == 1);
-    Next = y + 1;
-    return Line.data();
-  }
-
- private:
-  std::unique_ptr<TIFFHandle> File;
-  std::uint16_t Plane;
-  std::int64_t RowsPerStrip, Next = 0;
-  Bytes Line;
-};
-
-/// Strips without compression are read row by row, however large they are.
-class PlainStrips : public PlaneSource {
- public:
-  PlainStrips(const Input& input, const TIFFHandle& file, const Layout& layout, int plane)
-      : From(input), Header(file), Of(layout) {
-    RowsPerStrip =
-        std::min<std::int64_t>(file.Get<std::uint32_t>(TIFFTAG_ROWSPERSTRIP, UINT32_MAX), layout.Height);
-    FirstStrip = plane * ((layout.Height + RowsPerStrip - 1) / RowsPerStrip);
-    Line.resize(layout.RowBytes(layout.Width));
-    Reversed = file.Get<std::uint16_t>(TIFFTAG_FILLORDER, FILLORDER_MSB2LSB) == FILLORDER_LSB2MSB;
-  }
-
-  const std::uint8_t* Row(std::int64_t y) override {
-    const auto strip = std::uint32_t(FirstStrip + y / RowsPerStrip);
-    const std::uint64_t at = std::uint64_t(y % RowsPerStrip) * Line.size();
-    const std::uint64_t start = TIFFGetStrileOffset(Header, strip);
-    const std::uint64_t size = TIFFGetStrileByteCount(Header, strip);
-    Header.Check();
-    if (at + Line.size() > size || start > std::uint64_t(From.Size()))
-      throw Failure(From.Name(), "corrupt TIFF: a strip is too short for its rows");
-    if (From.ReadAt(std::int64_t(start + at), Line) < Line.size())
-      throw Failure(From.Name(), "the TIFF file is cut off");
-    if (Reversed) TIFFReverseBits(Line.data(), tmsize_t(Line.size()));
-    if (Of.Bits == 16 && TIFFIsByteSwapped(Header))
-      TIFFSwabArrayOfShort(reinterpret_cast<std::uint16_t*>(Line.data()), tmsize_t(Line.size() / 2));
-    return Line.data();
-  }
-
- private:
-  Input From;
-  const TIFFHandle& Header;
-  Layout Of;
-  std::int64_t RowsPerStrip, FirstStrip;
-  Bytes Line;
-  bool Reversed;
-};
-
-/// A row of tiles at a time.
-class TileBand : public PlaneSource {
- public:
-  TileBand(const Input& input, const Layout& layout, int plane, std::int64_t memoryLimit)
-      : File(TIFFHandle::Open(input, memoryLimit)), Of(layout), Plane(std::uint16_t(plane)) {
-    if (layout.Compression == COMPRESSION_JPEG) File->Set(TIFFTAG_JPEGCOLORMODE, JPEGCOLORMODE_RGB);
-    File->ReadingPixels();
-    TileWidth = File->Get<std::uint32_t>(TIFFTAG_TILEWIDTH, 0);
-    TileHeight = File->Get<std::uint32_t>(TIFFTAG_TILELENGTH, 0);
-    if (TileWidth < 1 || TileHeight < 1 || layout.Bits * layout.Interleaved() * TileWidth % 8 != 0)
-      throw Failure(input.Name(), "corrupt TIFF: tiles of a size that can't be");
-    TileRow = layout.RowBytes(TileWidth);
-    Across = (layout.Width + TileWidth - 1) / TileWidth;
-    // Short pictures don't fill their tiles.
-    const std::int64_t rows = std::min(TileHeight, layout.Height);
-    RequireWithinLimit(input.Name(), std::int64_t(TileRow) * (Across * rows + TileHeight), memoryLimit,
-                       "a TIFF with tiles of this size");
-    BandRow = TileRow * std::size_t(Across);
-    Band.resize(BandRow * std::size_t(rows));
-    Tile.resize(std::size_t(TIFFTileSize64(*File)));
-    if (Tile.size() < TileRow * std::size_t(TileHeight))
-      throw Failure(input.Name(), "corrupt TIFF: tiles of a size that can't be");
-  }
-
-  const std::uint8_t* Row(std::int64_t y) override {
-    if (y < Top || y >= Top + TileHeight) Fill(y - y % TileHeight);
-    return Band.data() + BandRow * std::size_t(y % TileHeight);
-  }
-
- private:
-  void Fill(std::int64_t y) {
-    Top = y;
-    const std::int64_t rows = std::min(TileHeight, Of.Height - y);
-    for (std::int64_t across = 0; across < Across; ++across) {
-      const std::uint32_t tile =
-          TIFFComputeTile(*File, std::uint32_t(across * TileWidth), std::uint32_t(y), 0, Plane);
-      const tmsize_t got = TIFFReadEncodedTile(*File, tile, Tile.data(), tmsize_t(Tile.size()));
-      File->Check(got == tmsize_t(Tile.size()));
-      for (std::int64_t row = 0; row < rows; ++row)
-        std::memcpy(Band.data() + BandRow * std::size_t(row) + TileRow * std::size_t(across),
-                    Tile.data() + TileRow * std::size_t(row), TileRow);
-    }
-  }
-
-  std::unique_ptr<TIFFHandle> File;
-  Layout Of;
-  std::uint16_t Plane;
-  std::int64_t TileWidth, TileHeight, Across = 0;
-  /// The first row of the band; far away as long as there is none.
-  std::int64_t Top = INT64_MIN / 2;
-  std::size_t TileRow = 0, BandRow = 0;
-  Bytes Band, Tile;
-};
-
 class TIFFReader : public ImageReader {
  public:
-  TIFFReader(const Input& input, std::int64_t memoryLimit)
-      : From(input), Path(input.Name()), File(TIFFHandle::Open(input, memoryLimit)) {
+  TIFFReader(const Input& input, const ReadOptions& options)
+      : From(input), Path(input.Name()), File(TIFFHandle::Open(input, options.MemoryLimit)) {
     RequireWholeDirectory();
     ReadLayout();
     RequirePlausible(Path, Of.Width, Of.Height, input.Size(),
@@ -189,16 +43,10 @@ class TIFFReader : public ImageReader {
     ReadExtras();
     for (int plane = 0; plane < Of.Planes(); ++plane) {
       // Samples that nobody asks for need no rows.
-      if (Of.Planar && plane >= Of.Colours && plane != Of.AlphaAt)
-        Sources.emplace_back();
-      else if (Of.Tiled)
-        Sources.push_back(std::make_unique<TileBand>(input, Of, plane, memoryLimit));
-      else if (Of.Compression == COMPRESSION_NONE)
-        Sources.push_back(std::make_unique<PlainStrips>(input, *File, Of, plane));
-      else
-        Sources.push_back(std::make_unique<DecodedStrips>(input, plane, memoryLimit));
+      const bool wanted = !Of.Planar || plane < Of.Colours || plane == Of.AlphaAt;
+      Planes.push_back(wanted ? OpenPlane(input, *File, Of, plane, options) : nullptr);
     }
-    Lines.resize(Sources.size());
+    Lines.resize(Planes.size());
   }
 
   const FileType& Type() const override { return TIFFType; }
@@ -208,6 +56,8 @@ class TIFFReader : public ImageReader {
     About.Height = part.Height;
     Left = part.X;
     NextRow = part.Y;
+    for (const auto& plane : Planes)
+      if (plane) plane->Select(part);
     return true;
   }
 
@@ -218,14 +68,38 @@ class TIFFReader : public ImageReader {
            File->Get<std::uint32_t>(TIFFTAG_ROWSPERSTRIP, UINT32_MAX) <= few;
   }
 
-  void ReadRow(std::uint8_t* row) override {
-    for (std::size_t i = 0; i < Sources.size(); ++i)
-      if (Sources[i]) Lines[i] = Sources[i]->Row(NextRow);
-    ++NextRow;
+  void ReadRow(std::uint8_t* row) override { ReadRows(row, 0, 1); }
+
+  void ReadRows(std::uint8_t* rows, std::ptrdiff_t stride, std::int32_t count) override {
+    if (IsPacked()) {
+      const auto pixel = std::size_t(Of.Samples);
+      Planes[0]->ReadRows(NextRow, pixel * std::size_t(Left - Planes[0]->FirstColumn()),
+                          pixel * std::size_t(About.Width), rows, stride, count);
+      NextRow += count;
+    } else {
+      for (std::int32_t y = 0; y < count; ++y, ++NextRow) Convert(rows + y * stride);
+    }
+    for (std::int32_t y = 0; Of.Associated && y < count; ++y)
+      TakeAlphaOut(rows + y * stride, About.Width, ChannelsOf(About.Pixels));
+  }
+
+  /// libtiff has read all that belongs to the picture.
+  void Finish() override {}
+
+ private:
+  /// Whether pixels stand in the file as they are given.
+  bool IsPacked() const {
+    return Of.Bits == 8 && !Of.Planar && Of.Samples == ChannelsOf(About.Pixels) &&
+           Of.Photometric != PHOTOMETRIC_PALETTE && Of.Photometric != PHOTOMETRIC_MINISWHITE;
+  }
+
+  /// The next row out of what stands in the file.
+  void Convert(std::uint8_t* row) {
+    for (std::size_t i = 0; i < Planes.size(); ++i)
+      if (Planes[i]) Lines[i] = Planes[i]->Row(NextRow);
+    Skipped = Left - Planes[0]->FirstColumn();
     const int channels = ChannelsOf(About.Pixels);
-    if (AsStored()) {
-      std::memcpy(row, Lines[0] + Left * channels, std::size_t(About.Width) * std::size_t(channels));
-    } else if (Of.Photometric == PHOTOMETRIC_PALETTE) {
+    if (Of.Photometric == PHOTOMETRIC_PALETTE) {
       for (std::int64_t x = 0; x < About.Width; ++x)
         std::memcpy(row + x * channels, Palette[Raw(x, 0) & 255].data(), 3);
     } else {
@@ -234,18 +108,7 @@ class TIFFReader : public ImageReader {
         for (std::int64_t x = 0; x < About.Width; ++x)
           row[x * channels] = std::uint8_t(255 - row[x * channels]);
     }
-    if (Of.AlphaAt >= 0 && !AsStored()) CopySamples(row + channels - 1, channels, Of.AlphaAt);
-    if (Of.Associated) TakeAlphaOut(row, About.Width, channels);
-  }
-
-  /// libtiff has read all that belongs to the picture.
-  void Finish() override {}
-
- private:
-  /// Whether a row of the file is one of the picture.
-  bool AsStored() const {
-    return Of.Bits == 8 && !Of.Planar && Of.Samples == ChannelsOf(About.Pixels) &&
-           Of.Photometric != PHOTOMETRIC_PALETTE && Of.Photometric != PHOTOMETRIC_MINISWHITE;
+    if (Of.AlphaAt >= 0) CopySamples(row + channels - 1, channels, Of.AlphaAt);
   }
 
   /// libtiff overlooks a cut in the last bytes of a directory.
@@ -358,7 +221,8 @@ class TIFFReader : public ImageReader {
   /// A sample as it stands in the file; `sample` counts within what is interleaved.
   int Raw(std::int64_t x, int sample) const {
     const std::uint8_t* line = Lines[Of.Planar ? std::size_t(sample) : 0];
-    const std::int64_t at = Of.Planar ? Left + x : (Left + x) * Of.Samples + sample;
+    const std::int64_t column = Skipped + x;
+    const std::int64_t at = Of.Planar ? column : column * Of.Samples + sample;
     if (Of.Bits == 8) return line[at];
     if (Of.Bits == 16) {
       std::uint16_t value;
@@ -384,11 +248,13 @@ class TIFFReader : public ImageReader {
   Input From;
   std::filesystem::path Path;
   std::unique_ptr<TIFFHandle> File;
-  Layout Of;
+  TIFFLayout Of;
   std::vector<std::array<std::uint8_t, 3>> Palette;
-  std::vector<std::unique_ptr<PlaneSource>> Sources;
+  std::vector<std::unique_ptr<TIFFPlane>> Planes;
   std::vector<const std::uint8_t*> Lines;
   std::int64_t NextRow = 0, Left = 0;
+  /// Columns of the lines in front of the part.
+  std::int64_t Skipped = 0;
 };
 
 }
@@ -409,8 +275,8 @@ const FileType TIFFType{
     .Several = true,
     .Parts = true,
     .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return OpenTIFFPage(input, options, [limit = options.MemoryLimit](const Input& page) {
-        return std::make_unique<TIFFReader>(page, limit);
+      return OpenTIFFPage(input, options, [options](const Input& page) {
+        return std::make_unique<TIFFReader>(page, options);
       });
     },
     .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,

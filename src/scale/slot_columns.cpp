@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "image/stores.h"
+
 namespace zor {
 namespace {
 
@@ -9,11 +11,20 @@ constexpr std::ptrdiff_t Alignment = 64;
 /// Bytes of the rows that are kept: they stay in the second-level cache, unless a line looks at very many.
 constexpr std::size_t CacheRoom = 384 << 10, MostRoom = 3 << 20;
 constexpr std::size_t NarrowStripe = 1024, NarrowestStripe = 256;
+/// The same where the source may come from afar, which a large one on a caller's block does.
+constexpr std::size_t FarRoom = 48 << 20;
+constexpr std::int64_t LargeSource = 16 << 20;
 /// Bytes of the slots that a few lines look at, a run of units of each: they stay in the first-level cache.
 constexpr std::ptrdiff_t RunRoom = 24 << 10;
 
 std::ptrdiff_t RoundedUp(std::ptrdiff_t count, std::ptrdiff_t unit) {
   return (count + unit - 1) / unit * unit;
+}
+
+/// Every stripe walks the whole source again, which has to be read for it anew where it isn't in our memory.
+std::size_t RoomFor(const PictureData& source) {
+  if (source.IsMapping) return MostRoom;
+  return !source.Samples->Memory && source.TotalSize >= LargeSource ? FarRoom : CacheRoom;
 }
 
 }
@@ -45,8 +56,7 @@ bool ColumnPlan::ChooseStripe() {
   const auto fits = [&](std::size_t room) {
     return room / (SlotLoops::SampleBytes * std::size_t(SlotCount) + std::size_t(loops.Width));
   };
-  // Every stripe walks the whole source again, which a mapped one has to be read for.
-  std::size_t samples = fits(Pass && Context.Source->IsMapping ? MostRoom : CacheRoom);
+  std::size_t samples = fits(Pass ? RoomFor(*Context.Source) : CacheRoom);
   if (samples < NarrowStripe) samples = std::min(NarrowStripe, fits(MostRoom));
   if (samples < NarrowestStripe) return false;
   const std::int32_t unit = Pass ? Pass->ColumnUnit() : 1;

@@ -50,6 +50,36 @@ void WriteBytes(const std::filesystem::path& file, const Bytes& bytes) {
       .write(reinterpret_cast<const char*>(bytes.data()), std::streamsize(bytes.size()));
 }
 
+void WriteEmptyTIFF(const std::filesystem::path& file, std::uint32_t width, std::uint32_t height,
+                    std::uint32_t whiteFrom) {
+  const std::uint32_t tags[][3] = {{256, 4, width}, {257, 4, height}, {258, 3, 8},
+                                   {259, 3, 1},     {262, 3, 1},      {273, 4, 8},
+                                   {277, 3, 1},     {278, 4, height}, {279, 4, width * height}};
+  Bytes directory;
+  const auto put = [](Bytes& bytes, std::uint32_t value, int count) {
+    for (int i = 0; i < count; ++i) bytes.push_back(std::uint8_t(value >> 8 * i));
+  };
+  put(directory, std::size(tags), 2);
+  for (const auto& [tag, type, value] : tags) {
+    put(directory, tag, 2);
+    put(directory, type, 2);
+    put(directory, 1, 4);
+    put(directory, value, 4);
+  }
+  put(directory, 0, 4);
+  Bytes header = {'I', 'I', 42, 0};
+  put(header, 8 + width * height, 4);
+  WriteBytes(file, header);
+  std::filesystem::resize_file(file, 8 + std::uintmax_t{width} * std::min(whiteFrom, height));
+  std::ofstream stream(file, std::ios::binary | std::ios::app);
+  const std::string white(width, char(255));
+  for (std::uint32_t y = whiteFrom; y < height; ++y) stream << white;
+  stream.close();
+  std::filesystem::resize_file(file, 8 + std::uintmax_t{width} * height);
+  std::ofstream(file, std::ios::binary | std::ios::app)
+      .write(reinterpret_cast<const char*>(directory.data()), std::streamsize(directory.size()));
+}
+
 Bytes Profile(const std::string& space) {
   // libpng takes no notice of one that gets very short when it is compressed.
   Bytes profile = Noise(532, 1, 1).Samples;

@@ -61,6 +61,11 @@ struct TIFFExtras {
 void WriteTIFF(const std::filesystem::path& file, const Raster& raster, const TIFFExtras& extras = {});
 Raster ReadTIFF(const std::filesystem::path& file);
 
+/// A gray TIFF without compression, below 4 GiB and black, which takes no room on the disk; but white from a
+/// row on.
+void WriteEmptyTIFF(const std::filesystem::path& file, std::uint32_t width, std::uint32_t height,
+                    std::uint32_t whiteFrom = UINT32_MAX);
+
 Bytes ReadBytes(const std::filesystem::path& file);
 void WriteBytes(const std::filesystem::path& file, const Bytes& bytes);
 /// A colour profile of 532 bytes without content, for "RGB " or "GRAY".

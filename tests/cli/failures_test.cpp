@@ -13,33 +13,7 @@ namespace {
 using testing::ElementsAre;
 using testing::HasSubstr;
 
-class Failures : public CommandTest {
- protected:
-  /// A gray TIFF without compression, full of zeros that take no room on the disk.
-  void WriteEmptyTIFF(const std::string& name, std::uint32_t width, std::uint32_t height) {
-    const std::uint32_t tags[][3] = {{256, 4, width}, {257, 4, height}, {258, 3, 8},
-                                     {259, 3, 1},     {262, 3, 1},      {273, 4, 8},
-                                     {277, 3, 1},     {278, 4, height}, {279, 4, width * height}};
-    Bytes directory;
-    const auto put = [&](std::uint32_t value, int bytes) {
-      for (int i = 0; i < bytes; ++i) directory.push_back(std::uint8_t(value >> 8 * i));
-    };
-    put(std::size(tags), 2);
-    for (const auto& [tag, type, value] : tags) {
-      put(tag, 2);
-      put(type, 2);
-      put(1, 4);
-      put(value, 4);
-    }
-    put(0, 4);
-    const std::uint32_t at = 8 + width * height;
-    WriteBytes(At(name), {'I', 'I', 42, 0, std::uint8_t(at), std::uint8_t(at >> 8), std::uint8_t(at >> 16),
-                          std::uint8_t(at >> 24)});
-    std::filesystem::resize_file(At(name), at);
-    std::ofstream(At(name), std::ios::binary | std::ios::app)
-        .write(reinterpret_cast<const char*>(directory.data()), std::streamsize(directory.size()));
-  }
-};
+using Failures = CommandTest;
 
 TEST_F(Failures, AFileThatIsCutAnywhereIsRefused) {
   const Raster picture = Waves(48, 32, 3);
@@ -190,22 +164,42 @@ TEST_F(Failures, NoRoomOnTheDisk) {
   const Outcome outcome = Run({"convert", "in.png", "-o", "out.png", "--store", "mapped"}, 100'000);
   EXPECT_EQ(outcome.Code, 2);
   EXPECT_THAT(outcome.Error, HasSubstr("no temporary file of 2 MB can be made there"));
+  const Outcome turned =
+      Run({"rotate", "in.png", "--angle", "90", "-o", "out.png", "--memory-limit", "9K"}, 100'000);
+  EXPECT_EQ(turned.Code, 2);
+  EXPECT_EQ(turned.Error, "picturezor: " + Temporary.string() + ": a temporary file: File too large\n");
+}
+
+/// Whether a process has a file open in a directory beside the one that it reads.
+bool Writes(pid_t process, const std::filesystem::path& directory, const std::filesystem::path& read) {
+  std::error_code gone;
+  const std::filesystem::path files = "/proc/" + std::to_string(process) + "/fd";
+  for (std::filesystem::directory_iterator file(files, gone), end; !gone && file != end;
+       file.increment(gone)) {
+    const auto target = std::filesystem::read_symlink(*file, gone);
+    if (!gone && target.string().starts_with(directory.string() + "/") && target != read) return true;
+  }
+  return false;
 }
 
 TEST_F(Failures, ASignalLeavesNothingBehind) {
-  WriteEmptyTIFF("big.tif", 16000, 16000);
-  for (const int signal : {SIGTERM, SIGINT, SIGHUP}) {
-    const int null = open("/dev/null", O_RDWR);
-    const pid_t process =
-        Start({"convert", "big.tif", "--store", "mapped", "--format", "rgba", "-o", "out.png"}, null, null);
-    close(null);
-    // Its file of output is there once it is past the command line.
-    while (Files().size() < 2 && kill(process, 0) == 0) usleep(1000);
-    kill(process, signal);
-    EXPECT_EQ(WaitFor(process), -signal);
-    EXPECT_THAT(Files(), ElementsAre("big.tif"));
-    EXPECT_TRUE(std::filesystem::is_empty(Temporary));
-  }
+  WriteEmptyTIFF(At("big.tif"), 16000, 16000);
+  const Arguments ways[] = {{"convert", "--store", "mapped", "--format", "rgba"},
+                            {"rotate", "--angle", "90", "--memory-limit", "1M"},
+                            {"filter", "blur", "--radius", "9", "--memory-limit", "1M"}};
+  for (const int signal : {SIGTERM, SIGINT, SIGHUP, SIGKILL})
+    for (Arguments arguments : ways) {
+      SCOPED_TRACE(testing::PrintToString(arguments) + ", " + std::to_string(signal));
+      for (const char* more : {"big.tif", "-o", "out.png"}) arguments.push_back(more);
+      const int null = open("/dev/null", O_RDWR);
+      const pid_t process = Start(arguments, null, null);
+      close(null);
+      while (!Writes(process, Directory, At("big.tif")) && kill(process, 0) == 0) usleep(1000);
+      kill(process, signal);
+      EXPECT_EQ(WaitFor(process), -signal);
+      EXPECT_THAT(Files(), ElementsAre("big.tif"));
+      EXPECT_TRUE(std::filesystem::is_empty(Temporary));
+    }
 }
 
 }

@@ -36,12 +36,14 @@ struct Made final : Operation {
   std::function<Picture(const Picture&, const Workplace&)> Work;
   Dependence Needs{};
   std::function<void(Shape&)> Change{};
+  std::optional<int> Turned{};
 
   Made(Dependence needs, std::function<Picture(const Picture&, const Workplace&)> work,
        std::function<void(Shape&)> change = {})
       : Work(std::move(work)), Needs(needs), Change(std::move(change)) {}
   Shape Result(const Shape& source) const override;
   Dependence DependsOn(const Shape&) const override { return Needs; }
+  std::optional<int> Turns() const override { return Turned; }
   Picture Apply(Picture source, const Workplace& at) const override { return Work(source, at); }
 };
 

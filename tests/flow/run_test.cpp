@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 
 #include "flow_test_support.h"
+#include "scale_passes.h"
 
 namespace picturezor::flow {
 namespace {
@@ -48,9 +49,19 @@ std::unique_ptr<Made> Shade() {
                                 });
 }
 std::unique_ptr<Made> Turn() {
-  return std::make_unique<Made>(
+  auto turn = std::make_unique<Made>(
       Dependence{}, [](const Picture& picture, const Workplace&) { return picture.Rotate90(); },
       [](Shape& shape) { std::swap(shape.Width, shape.Height); });
+  turn->Turned = 8;
+  return turn;
+}
+std::unique_ptr<Made> Flip() {
+  auto flip = std::make_unique<Made>(Dependence{}, [](const Picture& picture, const Workplace&) {
+    picture.VMirror();
+    return picture;
+  });
+  flip->Turned = 4;
+  return flip;
 }
 std::unique_ptr<Made> Scale(std::int32_t width, std::int32_t height) {
   return std::make_unique<Made>(
@@ -100,8 +111,13 @@ TEST(Run, GivesTheBytesOfWholePictures) {
       {"wide", {90001, 7}, ChainOf(Blur(2), Dither())},
       {"tall", {3, 50001, Format::G}, ChainOf(Blur(20), Dither())},
       {"mirrored", {201, 500, Format::GA, 2}, ChainOf(Invert())},
-      {"upside down", {200, 500, Format::RGB, 4}, ChainOf(Blur(3))},
-      {"on its side", {200, 500, Format::CMYK, 6}, ChainOf(Invert(), Crop({1, 2, 300, 150}))},
+      {"orientation 3", {199, 501, Format::RGB, 3}, ChainOf()},
+      {"orientation 4", {200, 500, Format::RGB, 4}, ChainOf(Blur(3))},
+      {"orientation 5", {317, 203, Format::CMYKA, 5}, ChainOf(Blur(3))},
+      {"orientation 6", {200, 500, Format::CMYK, 6}, ChainOf(Invert(), Crop({1, 2, 300, 150}))},
+      {"orientation 7", {90, 701, Format::GA, 7}, ChainOf()},
+      {"orientation 8", {7001, 9, Format::G, 8}, ChainOf(Turn())},
+      {"flipped", {200, 700}, ChainOf(Blur(3), Flip(), Scale(150, 500), Flip())},
       {"scaled", {900, 1200}, ChainOf(Scale(301, 400))},
       {"scaled from anywhere",
        {.Width = 901, .Height = 6007, .StartsAnywhere = true},
@@ -126,6 +142,28 @@ TEST(Run, GivesTheBytesOfWholePictures) {
             << threads << " threads, " << memory << " bytes";
       }
   }
+}
+
+// Catches passes that round, or number channels, otherwise than the class does.
+TEST(ScalePasses, GiveTheBytesOfAWholeScale) {
+  for (const Format format : {Format::G, Format::GA, Format::RGB, Format::RGBA, Format::CMYK, Format::CMYKA})
+    for (const Kernel kernel : {Kernel::Box, Kernel::Lanczos3, Kernel::Mitchell})
+      for (const auto& [width, height] : {std::pair{37, 203}, {301, 40}, {150, 170}}) {
+        const MadeFile file{200, 180, format};
+        const auto whole = std::make_unique<Made>(
+            Dependence{},
+            [=, w = width, h = height](const Picture& picture, const Workplace&) {
+              const Picture scaled(w, h, format);
+              return scaled.Scale(picture, {}, kernel, w, h) ? scaled : Picture();
+            },
+            [w = width, h = height](Shape& shape) { shape.Width = w, shape.Height = h; });
+        Chain chain;
+        chain.push_back(std::make_unique<Made>(*whole));
+        const RunOptions options{.Stores = {.MemoryLimit = 50'000, .TempDirectory = testing::TempDir()}};
+        EXPECT_TRUE(Result(file, ScalePasses(kernel, width, height), options) ==
+                    Result(file, chain, InMemory()))
+            << int(format) << ' ' << int(kernel) << ' ' << width;
+      }
 }
 
 // Catches a temporary file where none is needed: there is no place for one.
