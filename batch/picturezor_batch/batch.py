@@ -110,7 +110,7 @@ class _Batch:
         self._suspects = collections.deque()  # Pictures whose group's workers died
         self._unfit = {}  # Address of a worker: what keeps it from working
         self._alone = False
-        self._own, self._seen = own, time.monotonic()
+        self._own, self._seen, self._called = own, time.monotonic(), time.monotonic()
         self._known, self._asked = {}, 0.0  # The workers, and when they were asked for
         self._results = as_completed(with_results=True, loop=client.loop, raise_errors=False)
 
@@ -147,6 +147,10 @@ class _Batch:
             self._seen = time.monotonic()
         elif self._own and time.monotonic() - self._seen > _WITHOUT_WORKERS:
             raise _Stopped("the workers died and don't come back")
+        if self._own and time.monotonic() - self._called > 20:
+            # The engine doesn't start a worker again that died while it was starting, unless it is asked.
+            self._own.scale(len(self._own.worker_spec))
+            self._called = time.monotonic()
         fit = {address: about for address, about in workers.items() if address not in self._unfit}
         if workers and not fit:
             raise _Stopped("no machine is left to work on: " + next(iter(self._unfit.values())))
@@ -280,7 +284,7 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
             _send_along()
             try:
                 _Batch(client, book, recipe, job, fail_fast, task_seconds, progress, stop, outcome,
-                       bool(own)).work()
+                       own and own.cluster).work()
                 if own:
                     # One that is just coming back would complain of a scheduler that is gone.
                     with contextlib.suppress(TimeoutError):
