@@ -257,7 +257,7 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
     where = shutil.which(command or "picturezor")
     if not where:
         raise BatchFailure(f"{command or 'picturezor'}: there is no such command")
-    recipe.check(where, absolute(pattern.of(b"/picture")))
+    recipe.check(where, absolute(pattern.of(b"/picture.png")))
     try:
         os.makedirs(pattern.directory, exist_ok=True)
     except OSError as error:

@@ -29,7 +29,9 @@ def inputs(names):
         if isinstance(given, bytes):
             yield name
         elif glob.has_magic(name) and not os.path.lexists(name):
-            found = sorted(one for one in glob.iglob(name, recursive=True) if not os.path.isdir(one))
+            # Where results lie among inputs, the journal does too.
+            found = sorted(one for one in glob.iglob(name, recursive=True) if not os.path.isdir(one)
+                           and not os.path.basename(one).startswith(b"picturezor-batch.sqlite"))
             if not found:
                 raise UsageFailure(f"{os.fsdecode(name)}: no file has such a name")
             yield from found
