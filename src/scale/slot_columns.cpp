@@ -24,7 +24,8 @@ std::ptrdiff_t RoundedUp(std::ptrdiff_t count, std::ptrdiff_t unit) {
 /// Every stripe walks the whole source again, which has to be read for it anew where it isn't in our memory.
 std::size_t RoomFor(const PictureData& source) {
   if (source.IsMapping) return MostRoom;
-  return !source.Samples->Memory && source.TotalSize >= LargeSource ? FarRoom : CacheRoom;
+  // A source that was closed meanwhile has no samples.
+  return source.Samples && !source.Samples->Memory && source.TotalSize >= LargeSource ? FarRoom : CacheRoom;
 }
 
 }

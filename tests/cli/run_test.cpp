@@ -152,7 +152,7 @@ TEST_F(Runs, AreCompletedByTheShell) {
       {"scale in.png --kernel lan", "lanczos3 lanczos8"},
       {"filter so", "solarize soft-blur"},
       {"filter blur --it", "--iterations"},
-      {"run in.png --st", "--steps --store"},
+      {"run in.png --ste", "--steps"},
       {"run in.png -o out.png crop --re", "--rect"},
       {"run in.png -o out.png crop --rect 0,0,5,5 : filt", "filter"},
       {"run in.png -o out.png crop --rect 0,0,5,5 : filter uns", "unsharp"},
