@@ -61,7 +61,7 @@ def test_failures(tmp_path, lake):
     for call, raised in ((lambda: pz.open(tmp_path / "none.png"), pz.Error), (lambda: pz.open(b""), pz.Error),
                          (lambda: pz.open(tmp_path / "text.png"), pz.Error),
                          (lambda: pz.open(lake.read_bytes()[:5000]), pz.Error),
-                         (lambda: pz.open(lake, page=1), ValueError), (lambda: pz.open(lake, page=-1), ValueError),
+                         (lambda: pz.open(lake, page=1), pz.Error), (lambda: pz.open(lake, page=-1), ValueError),
                          (lambda: pz.open(3), TypeError),
                          (lambda: pz.open(io.StringIO("text")), ValueError),
                          (lambda: pz.open(lake, memory_limit="many"), ValueError),
