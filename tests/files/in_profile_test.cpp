@@ -26,7 +26,7 @@ class FourPixels final : public ImageReader {
 };
 
 // The numbers are those of sRGB's primaries in Adobe RGB (1998) and of their luminance, after IEC 61966-2-1
-// and Adobe's specification. Catches channels in another order, alpha that is converted, a lost profile.
+// and the publication of that space. Catches channels in another order, alpha that is converted, a lost profile.
 TEST(Profiles, CarryColoursOver) {
   const struct {
     const char* Name;
