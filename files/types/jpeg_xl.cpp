@@ -134,7 +134,8 @@ class JPEGXLReader : public WholeReader {
   void TakeProfile() {
     const JxlPixelFormat format = PixelsOf(About.Pixels);
     std::size_t size = 0;
-    JxlColorEncoding colours;
+    // Of a gray picture's, the decoder sets no primaries.
+    JxlColorEncoding colours{};
     // sRGB is what pixels without a profile are.
     if (JxlDecoderGetColorAsEncodedProfile(Decoder.get(), &format, JXL_COLOR_PROFILE_TARGET_DATA, &colours) ==
             JXL_DEC_SUCCESS &&
