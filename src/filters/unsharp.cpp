@@ -49,6 +49,8 @@ struct WholePush {
   static constexpr int MostHairs = 12;
   std::array<Hair, MostHairs> Hairs{};
   int HairCount = 0;
+  /// From the first, the lowest, to the highest.
+  std::uint16_t HairReach = 0;
 
   static std::optional<WholePush> Of(double factor, std::int32_t threshold);
 
@@ -97,6 +99,7 @@ bool WholePush::FindHairs(double factor) {
     if (from == 1) continue;
     if (HairCount == MostHairs) return false;
     Hairs[std::size_t(HairCount++)] = {std::int16_t(d), std::int16_t(from)};
+    HairReach = std::uint16_t(d - Hairs[0].Difference);
   }
   return true;
 }
@@ -141,11 +144,26 @@ void PushRunWhole(Sample* __restrict samples, const Sample* beside, const Sample
   }
 }
 
+/// Hairs belong to a few differences, which soft places don't have: each block is looked at before.
+void PushBlocks(Sample* samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count,
+                const WholePush& push) {
+  constexpr std::ptrdiff_t block = 256;
+  const std::int16_t lowest = push.Hairs[0].Difference;
+  const std::uint16_t reach = push.HairReach;
+  for (std::ptrdiff_t at = 0; at < count; at += block) {
+    const std::ptrdiff_t end = std::min(count, at + block);
+    std::uint16_t found = 0;
+    for (std::ptrdiff_t i = at; i < end; ++i)
+      found |= std::uint16_t(std::uint16_t(samples[i] - beside[i] - lowest) <= reach);
+    found ? PushRunWhole<WholePush::MostHairs>(samples + at, beside + at, mask + at, end - at, push)
+          : PushRunWhole<0>(samples + at, beside + at, mask + at, end - at, push);
+  }
+}
+
 void PushRow(Sample* samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count,
              const WholePush& push) {
-  if (push.HairCount == 0) return OnBestTarget<PushRunWhole<0>>(samples, beside, mask, count, push);
-  if (push.HairCount <= 4) return OnBestTarget<PushRunWhole<4>>(samples, beside, mask, count, push);
-  OnBestTarget<PushRunWhole<WholePush::MostHairs>>(samples, beside, mask, count, push);
+  push.HairCount == 0 ? OnBestTarget<PushRunWhole<0>>(samples, beside, mask, count, push)
+                      : OnBestTarget<PushBlocks>(samples, beside, mask, count, push);
 }
 
 /// The formula as a table by both samples, for planes that lie in other ways and for pictures that share
