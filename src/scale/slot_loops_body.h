@@ -86,7 +86,8 @@ NOINLINE LOOP void SumPlain(const SlotSums& sums) {
 
 /// What is whole of sums, between 0 and 255.
 LOOP_INLINE Bytes WholeOf(const Sums* sums, int bits) {
-  return Packed(Saturated(sums[0] >> bits, sums[1] >> bits), Saturated(sums[2] >> bits, sums[3] >> bits));
+  return Packed(Saturated(Shifted(sums[0], bits), Shifted(sums[1], bits)),
+                Saturated(Shifted(sums[2], bits), Shifted(sums[3], bits)));
 }
 /// A bit for each sample that would be another one if its sum were less by `gap`.
 LOOP_INLINE Bits DoubtsOf(Bytes whole, const Sums* sums, std::int32_t gap, int bits) {

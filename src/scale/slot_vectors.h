@@ -117,6 +117,16 @@ LOOP_INLINE Bits Difference(Bytes a, Bytes b) {
 
 #endif
 
+/// Sums divided by 2^bits and rounded down.
+LOOP_INLINE Sums Shifted(Sums sums, int bits) {
+#if VectorBytes > 16
+  // With a count for each number this is one step on all processors, with one for all it is two on some.
+  return Sums(WIDE(srav_epi32)(Register(sums), WIDE(set1_epi32)(bits)));
+#else
+  return sums >> bits;
+#endif
+}
+
 constexpr int UnitBytes = Width * SlotLoops::SampleBytes;
 
 }
