@@ -98,6 +98,7 @@ LOOP_INLINE Bits DoubtsOf(Bytes whole, const Sums* sums, std::int32_t gap, int b
 template <int Units>
 LOOP_INLINE void AddSlot(Sums* sums, const Sample* slot, const std::int16_t* two) {
   const auto digits = DigitsOf(two);
+  UNROLL
   for (int u = 0; u < Units; ++u) AddProducts(sums + u * 4, slot + u * UnitBytes, digits);
 }
 
@@ -108,14 +109,18 @@ LOOP_INLINE void SumUnits(const SlotSums& sums, std::ptrdiff_t unit, Bits* doubt
   Sums made[Units * 4];
   const std::ptrdiff_t from = unit * UnitBytes;
   if (line.TopCount == 0) {
+    UNROLL
     for (Sums& sum : made) sum = Sums{} + line.Start;
   } else {
+    UNROLL
     for (Sums& sum : made) sum = Sums{};
     for (std::int32_t t = 0; t < line.TopCount; ++t)
       AddSlot<Units>(made, sums.Slots[line.FirstTop + t] + from, line.Top[t]);
+    UNROLL
     for (Sums& sum : made) sum = (sum << SlotLine::TopShift) + line.Start;
   }
   for (std::int32_t s = 0; s < line.Count; ++s) AddSlot<Units>(made, sums.Slots[s] + from, line.Of[s].High);
+  UNROLL
   for (int u = 0; u < Units; ++u) {
     const Bytes whole = WholeOf(made + u * 4, line.Shift);
     StoreUnit(sums, unit + u, whole);

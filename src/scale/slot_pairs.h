@@ -37,6 +37,7 @@ LOOP_INLINE Numbers DigitsOf(const std::int16_t* two) {
   return Numbers(Sums{} + both);
 }
 LOOP_INLINE void AddProducts(Sums* sums, const Sample* unit, Numbers digits) {
+  UNROLL
   for (int k = 0; k < 4; ++k) {
     const auto numbers = Load<Register>(unit + k * Width);
 #ifdef VNNI

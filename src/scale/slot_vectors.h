@@ -22,6 +22,10 @@
 #endif
 #endif
 
+/// Before a loop over vectors that are so few that they stay in registers, which the compiler sees once the
+/// loop is gone.
+#define UNROLL _Pragma("GCC unroll 16")
+
 namespace zor {
 namespace {
 
