@@ -18,6 +18,8 @@ STYLE = """
 .bar>span{display:block;height:100%;border-radius:3px}
 .bar>.ahead{background:#2e9e5b}.bar>.behind{background:#d1762b}
 img{border-radius:4px}
+/* The theme's own blue is hard to read on its dark ground. */
+[data-md-color-scheme=slate]{--md-typeset-a-color:#9fb0ff}
 """
 
 
