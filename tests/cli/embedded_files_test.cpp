@@ -28,9 +28,10 @@ TEST_F(EmbeddedFiles, HoldEveryColour) {
   for (const auto& [format, inFile] : cases) {
     const Picture picture = NoisePicture(format);
     SaveImage(At("a.tif"), picture);
-    const Picture read = LoadImage(At("a.tif"));
-    EXPECT_EQ(read.ImageFormat(), inFile);
-    EXPECT_EQ(read.DataStringInFormat(inFile), picture.DataStringInFormat(inFile));
+    for (const Picture& read : {LoadImage(At("a.tif")), DecodeImage(EncodeImage("tif", picture))}) {
+      EXPECT_EQ(read.ImageFormat(), inFile);
+      EXPECT_EQ(read.DataStringInFormat(inFile), picture.DataStringInFormat(inFile));
+    }
   }
   SaveImage(At("view.png"), NoisePicture(Format::RGB).ClipImage({2, 3, 4, 2}).MirroredView());
   EXPECT_EQ(ReadPNG(At("view.png")).Height, 2);
@@ -57,6 +58,10 @@ TEST_F(EmbeddedFiles, SayWhatCantBeDone) {
   EXPECT_THROW(SaveImage(At("a.png"), NoisePicture(Format::Scaling3)), std::runtime_error);
   EXPECT_THROW(SaveImage(At("a.gif"), NoisePicture(Format::G)), std::runtime_error);
   EXPECT_THROW(SaveImage(At("no/a.png"), NoisePicture(Format::G)), std::runtime_error);
+  EXPECT_THROW(EncodeImage("gif", NoisePicture(Format::G)), std::runtime_error);
+  EXPECT_THROW(DecodeImage({}), std::runtime_error);
+  const Bytes png = EncodeImage("png", NoisePicture(Format::G));
+  EXPECT_THROW(DecodeImage(std::span(png).first(40)), std::runtime_error);
   WritePNG(At("wide.png"), Noise(32768, 1, 1));
   EXPECT_THROW(LoadHostPicture(At("wide.png")), std::runtime_error);
   EXPECT_EQ(Files(), (std::vector<std::string>{"wide.png"}));
