@@ -73,8 +73,8 @@ function addScaleBar(viewer, width, perMetre) {
   return bar;
 }
 
-function openPyramid(element, images, pyramid, more = {}) {
-  const viewer = OpenSeadragon({
+function makeViewer(element, images) {
+  window.viewer = OpenSeadragon({
     id: element,
     prefixUrl: images,
     drawer: "canvas",
@@ -83,8 +83,12 @@ function openPyramid(element, images, pyramid, more = {}) {
     maxZoomPixelRatio: 16,
     visibilityRatio: 0.5,
     gestureSettingsMouse: { clickToZoom: false, dblClickToZoom: true },
-    ...more,
   });
+  return window.viewer;
+}
+
+function openPyramid(element, images, pyramid) {
+  const viewer = makeViewer(element, images);
   const padded = pyramid.layout === "xyz";
   viewer.addHandler("open", () => {
     if (!padded) return;
@@ -99,6 +103,4 @@ function openPyramid(element, images, pyramid, more = {}) {
     if (pyramid.perMetre > 0) addScaleBar(viewer, width, pyramid.perMetre);
     document.querySelector(`#${element} .openseadragon-canvas`)?.focus();
   });
-  window.viewer = viewer;
-  return viewer;
 }

@@ -8,17 +8,7 @@ let selection = null;
 // Counts what makes tiles look otherwise: adjustments, and parts that have come to be there.
 let version = 0;
 
-const viewer = OpenSeadragon({
-  id: "viewer",
-  prefixUrl: "openseadragon/images/",
-  drawer: "canvas",
-  showNavigator: true,
-  showRotationControl: false,
-  maxZoomPixelRatio: 16,
-  visibilityRatio: 0.5,
-  gestureSettingsMouse: { clickToZoom: false, dblClickToZoom: true },
-});
-window.viewer = viewer;
+const viewer = makeViewer("viewer", "openseadragon/images/");
 let scaleBar = null;
 
 function adjustments() {
