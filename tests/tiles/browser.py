@@ -287,6 +287,17 @@ class Browser(unittest.TestCase):
                 self.assertGreaterEqual(status("/", body=b"x" * 100000)[0], 400)
             self.assertEqual(status("/")[0], 200)
 
+    def test_smaller_copies_in_a_file_are_shown(self):
+        for more, made in (([], True), (["--pyramid"], False)):
+            run("convert", self.folder / "plain.ppm", "--tile", 128, *more, "-o", self.folder / "levels.tif")
+            with self.subTest(more), viewing(self.folder / "levels.tif") as (address, process):
+                while not json.load(urllib.request.urlopen(address + "pictures/0/state"))["done"]:
+                    time.sleep(0.01)
+                mapped = pathlib.Path(f"/proc/{process.pid}/maps").read_text().splitlines()
+                nameless = [at for at in mapped if tempfile.gettempdir() in at and at.endswith("(deleted)")]
+                self.assertEqual(bool(nameless), made)
+                self.assertEqual(urllib.request.urlopen(address + "pictures/0/tile/1/0/0").status, 200)
+
     def test_an_ended_server_leaves_nothing(self):
         # Not read in parts, so a pyramid is made in temporary files.
         run("scale", self.folder / "plain.ppm", "--width", 6000, "--fast", "-o", self.folder / "large.png")
