@@ -1,5 +1,5 @@
-"""What scripts/docs adds to the pages: the README in front, the files of the project that pages link to, and bars beside
-the figures of a race."""
+"""What scripts/docs adds to the pages: the README in front, the files of the project that pages link to, the reference
+that scripts/reference has made, and bars beside the figures of a race."""
 
 import pathlib
 import re
@@ -65,6 +65,9 @@ def on_files(files, config):
     add("index.md", (ROOT / "README.md").read_bytes())
     add("contributing.md", (ROOT / "CONTRIBUTING.md").read_bytes())
     add("site.css", STYLE.encode())
+    reference = ROOT / "build/reference/html"
+    for page in sorted(reference.rglob("*.*")):
+        add(f"reference/{page.relative_to(reference)}", page.read_bytes())
     for page in [ROOT / "README.md", ROOT / "CONTRIBUTING.md", *sorted((ROOT / "docs").glob("*.md"))]:
         for _, link, _ in LINK.findall(page.read_text()):
             target = (page.parent / link).resolve()

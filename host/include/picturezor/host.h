@@ -19,6 +19,7 @@ class ModuleError : public std::runtime_error {
 /// An exception that the module raised in the host.
 class HostException : public std::runtime_error {
  public:
+  /// Of the class that is named.
   HostException(std::string className, const std::string& message)
       : std::runtime_error(message), Name(std::move(className)) {}
   /// "OutOfBoundsException" or "NilObjectException".
@@ -54,12 +55,15 @@ class Host {
     int BytesOfDepth24 = 3;
   };
 
+  ///@{
   /// Loads the module; once more with the same path does nothing. Throws ModuleError.
   static void Load(const std::filesystem::path& module, const Options& options);
   static void Load(const std::filesystem::path& module) { Load(module, Options()); }
+  ///@}
   /// Loads the module named by the environment variable PICTUREZOR_MODULE, or else the one beside this
   /// library or program, or where an installation puts it.
   static void Load();
+  /// Whether a module has been loaded; it stays so.
   static bool IsLoaded();
 
   /// Called when the module lets other host threads run; empty for nothing. An exception that it throws comes
@@ -78,32 +82,51 @@ class Host {
 
   /// What is alive now. A program that has dropped all it holds sees zeros.
   struct Alive {
+    ///@{
+    /// How many.
     int Objects = 0, Strings = 0, MemoryBlocks = 0;
+    ///@}
+    ///@{
     /// Descriptions of pictures that are open, GWorlds, and times that pixels were locked and not unlocked.
     int OpenDescriptions = 0, GWorlds = 0, PixelLocks = 0;
+    ///@}
+    /// All of them.
     bool operator==(const Alive&) const = default;
   };
+  /// What is alive now, counted over all threads.
   static Alive Count();
   /// Objects of one class that are alive.
   static int CountOf(std::string_view className);
 
   /// A row as the module declares it.
   struct MethodInfo {
+    /// As in "HMirror" or "Channel(index as integer) as PictureZOR".
     std::string Declaration;
+    /// As they stand in the row.
     std::uintptr_t Flags;
+    /// Whether the method can stand on the left of an assignment.
     bool Assignable;
   };
+  /// A property as the module declares it.
   struct PropertyInfo {
+    ///@{
+    /// As the module writes them.
     std::string Name, Type;
+    ///@}
+    /// As they stand in the row.
     std::uintptr_t Flags;
+    /// Whether it can be set.
     bool Writable;
   };
+  ///@{
   /// The vocabulary of a class, in the order of its tables. Throws ModuleError for an unknown class.
   static std::vector<MethodInfo> Methods(std::string_view className);
   static std::vector<MethodInfo> SharedMethods(std::string_view className);
   static std::vector<PropertyInfo> Properties(std::string_view className);
+  ///@}
   /// The value of a constant, as its declaration says. Throws ModuleError for an unknown one.
   static std::int64_t Constant(std::string_view className, std::string_view name);
+  /// The names of a class's constants with their values, as the module declares them.
   static std::vector<std::string> ConstantDeclarations(std::string_view className);
 };
 

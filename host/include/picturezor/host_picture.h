@@ -4,9 +4,15 @@
 
 namespace picturezor {
 
+/// A colour; black at first.
 struct Color {
+  ///@{
+  /// 0 to 255.
   std::uint8_t Red = 0, Green = 0, Blue = 0;
+  ///@}
+  /// 0xRRGGBB.
   std::int32_t Packed() const { return Red << 16 | Green << 8 | Blue; }
+  /// All three.
   bool operator==(const Color&) const = default;
 };
 
@@ -15,24 +21,35 @@ struct Color {
 /// ModuleError.
 class HostPicture : public Object {
  public:
+  /// Nil.
   HostPicture() = default;
+  /// The picture that an object of the host is; nothing is checked.
   explicit HostPicture(Object object) : Object(std::move(object)) {}
+  ///@{
   /// A white picture in the form of this host's pictures, or in one of its own. Throws std::invalid_argument
   /// for a size that can't be.
   HostPicture(std::int32_t width, std::int32_t height);
   HostPicture(std::int32_t width, std::int32_t height, PictureForm form);
+  ///@}
 
+  /// Columns.
   std::int32_t Width() const;
+  /// Rows.
   std::int32_t Height() const;
+  /// How its pixels are held.
   PictureForm Form() const;
 
+  ///@{
   /// Throws std::out_of_range outside the picture. In a GWorld of 16 bits a colour keeps its upper 5 bits.
   Color Pixel(std::int32_t x, std::int32_t y) const;
   void SetPixel(std::int32_t x, std::int32_t y, Color color) const;
+  ///@}
+  ///@{
   /// All pixels, row by row, as red, green and blue. Throws std::invalid_argument for another number of
   /// bytes.
   Bytes RGB() const;
   void SetRGB(std::span<const std::uint8_t> bytes) const;
+  ///@}
 
   /// The mask; nil where there is none.
   HostPicture Mask() const;
@@ -48,14 +65,19 @@ class HostPicture : public Object {
 /// Pixels in QuickDraw's way, as `CopyGWorld` makes them.
 class GWorld : public Object {
  public:
+  /// Nil.
   GWorld() = default;
+  /// The GWorld that an object of the host holds.
   explicit GWorld(Object object) : Object(std::move(object)) {}
 
+  /// Columns.
   std::int32_t Width() const;
+  /// Rows.
   std::int32_t Height() const;
   /// Bits of a pixel: 8 gray; 24 red, green, blue, behind a byte 255 where a pixel takes 4 bytes; 32 alpha,
   /// red, green, blue.
   std::int32_t Depth() const;
+  /// Bytes of a pixel, 1 to 4.
   std::int32_t PixelBytes() const;
   /// A row's pixels. Throws std::out_of_range.
   Bytes Row(std::int32_t y) const;
