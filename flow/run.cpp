@@ -81,7 +81,8 @@ class Stream {
       Turn(turned);
     } else if (kind != Kind::Bands || !JoinsBands(work)) {
       FlushBands();
-      if (kind == Kind::InOrder && Coming)
+      // One processor gains nothing from rows that arrive while it works, but where they need no memory.
+      if (kind == Kind::InOrder && Coming && (ThreadsOf(Options) > 1 || IsLarge()))
         ApplyInOrder(work);
       else
         ApplyWhole(work);

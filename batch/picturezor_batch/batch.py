@@ -65,7 +65,8 @@ def _planned(names, pattern):
 
 class _Groups:
     """Makes groups of the pictures that are left: as many as take a worker `seconds` by what was measured so far,
-    and fewer towards the end, so that all workers end together."""
+    and fewer towards the end, so that all workers end together, but none for less than a tenth of that: a group costs
+    something, too."""
 
     def __init__(self, rows, weight, seconds):
         self._rows, self._left, self._seconds = iter(rows), weight, seconds
@@ -83,7 +84,8 @@ class _Groups:
         """Rows of the journal's plan; none at the end. `hands` are pictures that may be in work at a time."""
         most = 0.0  # One picture, as long as nothing is known.
         if self._spent > 0:
-            most = min(self._made / self._spent * self._seconds, self._left / (2 * hands))
+            usual = self._made / self._spent * self._seconds
+            most = min(usual, max(self._left / (2 * hands), min(usual / 10, self._left / hands)))
         group, weight = [], 0
         for row in self._rows:
             group.append(row)

@@ -20,6 +20,7 @@ class _Command:
         # A file without a name, which the child opens as its steps.
         steps = os.memfd_create("steps")
         self._errors = os.memfd_create("errors")
+        self._told = b""
         try:
             os.write(steps, job["steps"])
             # The child ends with its worker, also when that is killed.
@@ -40,21 +41,25 @@ class _Command:
         finally:
             os.close(steps)
 
-    def ask(self, source, target):
-        """Makes a picture. Gives its pixels and an empty text, or 0 and what went wrong. Throws EOFError with the
-        reason where the process has ended."""
+    def send(self, source, target):
+        """Tells the next picture; the command may still be at others. Throws EOFError with the reason where the
+        process has ended."""
         try:
             self._process.stdin.write(source + b"\0" + target + b"\0")
             self._process.stdin.flush()
-            answer = b""
-            while not answer.endswith(b"\0"):
-                part = os.read(self._process.stdout.fileno(), 1 << 16)
-                if not part:
-                    raise EOFError
-                answer += part
-        except (EOFError, BrokenPipeError):
+        except BrokenPipeError:
             raise EOFError(self._last_words()) from None
-        word, _, rest = answer[:-1].partition(b" ")
+
+    def answer(self):
+        """Waits for the first picture that isn't answered yet. Gives its pixels and an empty text, or 0 and what went
+        wrong. Throws EOFError with the reason where the process has ended at it."""
+        while b"\0" not in self._told:
+            part = os.read(self._process.stdout.fileno(), 1 << 16)
+            if not part:
+                raise EOFError(self._last_words())
+            self._told += part
+        answer, _, self._told = self._told.partition(b"\0")
+        word, _, rest = answer.partition(b" ")
         if word != b"done":
             return 0, os.fsdecode(rest)
         width, height = rest.split()
@@ -98,15 +103,20 @@ def make_group(job, pairs):
     hands = worker.state.nthreads
     limit = job["memory_limit"] or worker.memory_manager.memory_limit
     threads = job["threads"] or max(1, len(os.sched_getaffinity(0)) // hands)
-    answers, fault, command = [], "", None
+    answers, fault, command, sent = [], "", None, 0
     try:
-        for source, target in pairs:
+        for number, (source, target) in enumerate(pairs):
             start = time.perf_counter()
             pixels = 0
             try:
-                os.makedirs(os.path.dirname(target), exist_ok=True)
-                command = command or _Command(job, limit and limit // hands, threads)
-                pixels, message = command.ask(source, target)
+                if not command:
+                    command, sent = _Command(job, limit and limit // hands, threads), number
+                # It goes on with the next one while its answer to this one is dealt with.
+                for ahead in pairs[sent:number + 2]:
+                    os.makedirs(os.path.dirname(ahead[1]), exist_ok=True)
+                    command.send(*ahead)
+                    sent += 1
+                pixels, message = command.answer()
             except EOFError as end:
                 message = str(end)
                 command.close()

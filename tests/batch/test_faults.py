@@ -21,24 +21,24 @@ here = pathlib.Path({here!r})
 names = b""
 while part := os.read(0, 1 << 16):
     names += part
-    if names.count(b"\\0") < 2:
-        continue
-    if b"POISON" in names:
-        os.kill(os.getppid(), signal.SIGKILL)
-        sys.exit()
-    if b"/in/WAIT" in names and not (here / "go").exists():
-        (here / "waits.part").write_text(str(os.getppid()))
-        (here / "waits.part").rename(here / "waits")
-        while not (here / "go").exists():
-            if os.getppid() == 1:
-                sys.exit()
-            signal.sigtimedwait([], 0.02)
-    real.stdin.write(names)
-    real.stdin.flush()
-    names, answer = b"", b""
-    while not answer.endswith(b"\\0"):
-        answer += os.read(real.stdout.fileno(), 1 << 16)
-    os.write(1, answer)
+    while names.count(b"\\0") > 1:
+        source, target, names = names.split(b"\\0", 2)
+        if b"POISON" in source:
+            os.kill(os.getppid(), signal.SIGKILL)
+            sys.exit()
+        if b"/in/WAIT" in source and not (here / "go").exists():
+            (here / "waits.part").write_text(str(os.getppid()))
+            (here / "waits.part").rename(here / "waits")
+            while not (here / "go").exists():
+                if os.getppid() == 1:
+                    sys.exit()
+                signal.sigtimedwait([], 0.02)
+        real.stdin.write(source + b"\\0" + target + b"\\0")
+        real.stdin.flush()
+        answer = b""
+        while not answer.endswith(b"\\0"):
+            answer += os.read(real.stdout.fileno(), 1 << 16)
+        os.write(1, answer)
 """
 
 
