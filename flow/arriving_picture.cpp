@@ -23,6 +23,8 @@ namespace {
 
 /// A cursor is so far ahead of its reader, and keeps so much behind it.
 constexpr std::int64_t BytesAhead = 4 << 20, BytesBehind = 8 << 20;
+/// Smaller pictures are gone through several times, in stripes that fit a cache, and so are kept whole.
+constexpr std::int64_t BytesKeptWhole = 16 << 20;
 constexpr std::int64_t MostChunkBytes = 1 << 20;
 constexpr std::int64_t RowUnit = 64;
 /// Readers that touch a place together are some.
@@ -100,7 +102,7 @@ void ArrivingPicture::Reserve(int cursors) {
   TotalBytes = RowSize * From.Of.Height;
   ChunkBytes = std::clamp(RoundedUp(TotalBytes / 16, page), RoundedUp(64 << 10, page), MostChunkBytes);
   Ahead = BytesAhead / ChunkBytes;
-  Behind = BytesBehind / ChunkBytes;
+  Behind = (TotalBytes <= BytesKeptWhole ? BytesKeptWhole : BytesBehind) / ChunkBytes;
   Chunks.resize(std::size_t((TotalBytes + ChunkBytes - 1) / ChunkBytes));
   // Those that are kept, and the one that is being filled.
   const std::int64_t slots = std::min(Ahead + Behind + 2, std::int64_t(Chunks.size()) + 1);

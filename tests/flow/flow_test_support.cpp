@@ -23,6 +23,7 @@ class MadeReader final : public files::ImageReader {
   }
   void ReadRow(std::uint8_t* row) override {
     if (NextRow >= Of.FailsAt) throw files::Failure("the file ends in row " + std::to_string(NextRow));
+    if (Of.RowsRead) ++*Of.RowsRead;
     std::uint32_t state = Of.Seed * 2654435761u + std::uint32_t(NextRow++) * 40503u;
     for (std::int32_t i = 0; i < Of.Width * BytesPerPixel(Of.Of); ++i) {
       state = state * 1664525u + 1013904223u;

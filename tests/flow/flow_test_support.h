@@ -1,4 +1,5 @@
 #pragma once
+#include <atomic>
 #include <functional>
 
 #include "failure.h"
@@ -15,6 +16,8 @@ struct MadeFile {
   /// The row at which reading fails; none by default.
   std::int32_t FailsAt = INT32_MAX;
   bool StartsAnywhere = false, OpensAgain = true;
+  /// Counts the rows that are read, if it is given.
+  std::atomic<int>* RowsRead = nullptr;
   OpenFile Open() const;
 };
 

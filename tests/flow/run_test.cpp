@@ -175,6 +175,16 @@ TEST(Run, NeedsADiskOnlyWhereAPictureHasToStandWhole) {
   EXPECT_THROW(Result(file, ChainOf(Turn()), noDisk), files::Failure);
 }
 
+// Catches a file that is decoded anew for each stripe of a scale: larger pictures are scaled in one.
+TEST(Run, ReadsAFileOnce) {
+  for (const int height : {700, 1900, 3000}) {
+    std::atomic<int> rowsRead = 0;
+    const MadeFile file{.Width = 2560, .Height = height, .RowsRead = &rowsRead};
+    EXPECT_FALSE(Result(file, ChainOf(Scale(1200, height / 2)), {.Stores = {}, .Threads = 2}).empty());
+    EXPECT_EQ(rowsRead, height);
+  }
+}
+
 /// Stops the work after some steps.
 struct Impatient final : files::Progress {
   int Left;
