@@ -77,6 +77,10 @@ TEST(OilFilter, TakesWideRanges) {
       }
     const auto best = std::size_t(std::ranges::max_element(counts) - counts.begin());
     EXPECT_EQ(Packed(picture.OilFilter({}, 64, range))[140 * 300 + 150], sums[best] / counts[best]) << range;
+    // One class has all of a column's rows.
+    const Picture even(3, 300, Format::G);
+    even.FillRect(200);
+    EXPECT_EQ(Packed(even.OilFilter({}, 64, range)), Samples(900, 200)) << range;
   }
 }
 

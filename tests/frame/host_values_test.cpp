@@ -76,8 +76,10 @@ TEST_F(HostValues, StringsOfWideUnitsBecomeUTF8) {
 
 TEST_F(HostValues, BlocksHoldCopies) {
   const std::uint8_t bytes[] = {1, 2, 3};
-  const MemoryBlock block{Object::Adopt(zor::MemoryBlockFromBytes(bytes, 3))};
-  EXPECT_EQ(Samples(block.Data().begin(), block.Data().end()), (Samples{1, 2, 3}));
+  for (const int size : {1, 3}) {
+    const MemoryBlock block{Object::Adopt(zor::MemoryBlockFromBytes(bytes, size))};
+    EXPECT_EQ(Samples(block.Data().begin(), block.Data().end()), Samples(bytes, bytes + size));
+  }
   EXPECT_EQ(zor::MemoryBlockFromBytes(nullptr, 3), nullptr);
   EXPECT_EQ(zor::MemoryBlockFromBytes(bytes, 0), nullptr);
   EXPECT_EQ(zor::MemoryBlockFromBytes(bytes, -1), nullptr);
