@@ -1,5 +1,6 @@
 #pragma once
 #include "scale/fixed_point_rows.h"
+#include "scale/slot_lines.h"
 
 namespace zor {
 
@@ -14,6 +15,7 @@ struct alignas(VectorBytes) FixedPointRows::GroupPattern {
   std::uint8_t Index[VectorBytes];
   std::int32_t Bias[Lanes];
   std::uint32_t Doubtful[Lanes];
+  Flat OfFlat[Lanes];
 
   const std::int8_t* Weights() const { return reinterpret_cast<const std::int8_t*>(this + 1); }
   std::int8_t* Weights() { return reinterpret_cast<std::int8_t*>(this + 1); }

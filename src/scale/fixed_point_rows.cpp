@@ -215,6 +215,7 @@ struct GroupMaker {
       const std::uint32_t doubtful = line.Fits ? line.Of.Doubtful : 1U << FixedPointLine::Bits;
       std::fill_n(pattern.Bias + p * Channels, Channels, bias);
       std::fill_n(pattern.Doubtful + p * Channels, Channels, doubtful);
+      std::fill_n(pattern.OfFlat + p * Channels, Channels, line.Of.OfFlat);
     }
   }
   /// Writes the digits of one line's shares into the weights of its group, four taps at a time.

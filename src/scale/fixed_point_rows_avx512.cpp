@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <bit>
+#include <cstring>
 
 #include "scale/fixed_point_groups.h"
 #include "scale/quotients.h"
@@ -137,22 +138,40 @@ struct GroupRunner {
     }
   }
 
-  /// Makes the samples in doubt by the plain form.
+  /// Whether all source pixels of a line are the same, whatever stands between them: then every channel is
+  /// flat.
+  static bool IsFlat(const FixedPointRows& plan, const Contribution& line, const Sample* from) {
+    const std::ptrdiff_t step = plan.Pair.Source.Step, more = line.Last() - line.First;
+    const Sample* first = from + plan.Lead + line.First * step;
+    return more == 0 ||
+           std::memcmp(first, first + step, std::size_t((more - 1) * step + plan.Spread + 1)) == 0;
+  }
+
+  /// Makes the samples in doubt: those of flat runs, which are all, and the others by the plain form.
   [[gnu::noinline, gnu::cold]] static void Settle(const FixedPointRows& plan,
                                                   const FixedPointRows::ColumnGroup& group,
                                                   std::uint32_t doubt, const Sample* from, Sample* into,
                                                   const PixelOrder& order) {
     const PlaneList& planes = plan.Pair.Source;
+    int looked = -1;
+    bool flat = false;
     for (; doubt != 0; doubt &= doubt - 1) {
       const int lane = std::countr_zero(doubt), pixel = lane / plan.Pair.Channels;
       const int channel = lane % plan.Pair.Channels;
       if (pixel >= group.Columns) return;
       const Contribution& line = plan.Table[group.FirstColumn + pixel];
       const Sample* plane = from + planes.Offset[channel];
-      double sum = 0.0;
-      for (std::int32_t i = 0; i < line.Count; ++i)
-        sum += double(line.Entries[i].Weight) * plane[std::ptrdiff_t{line.PixelAt(i)} * planes.Step];
-      const Sample sample = ExactQuotient(sum, line.Sum);
+      if (pixel != looked) flat = IsFlat(plan, line, from);
+      looked = pixel;
+      Sample sample;
+      if (const Flat of = group.Pattern->OfFlat[lane]; flat && of != Flat::Unknown) {
+        sample = Sample(plane[std::ptrdiff_t{line.First} * planes.Step] - (of == Flat::Falls ? 1 : 0));
+      } else {
+        double sum = 0.0;
+        for (std::int32_t i = 0; i < line.Count; ++i)
+          sum += double(line.Entries[i].Weight) * plane[std::ptrdiff_t{line.PixelAt(i)} * planes.Step];
+        sample = ExactQuotient(sum, line.Sum);
+      }
       for (int b = 0; b < order.Count; ++b)
         if (order.Channel[b] == channel) into[pixel * order.Count + b] = sample;
     }

@@ -86,6 +86,26 @@ Lattice LatticeOf(const Contribution& line) {
   return {units / divisor, disturbance};
 }
 
+namespace {
+
+/// What a flat run becomes, if that is the same for all values but 0.
+Flat OfFlatRun(const Contribution& line) {
+  double sum = 0.0;
+  // Up to 16 weights below 2 that are multiples of 2^-40, times 255: none of the sums has more than 53 bits.
+  bool exact = line.Count <= 16;
+  for (std::int32_t i = 0; i < line.Count; ++i) {
+    const double weight = line.Entries[i].Weight, units = weight * 0x1p40;
+    exact = exact && std::fabs(weight) < 2.0 && double(std::int64_t(units)) == units;
+    sum += weight;
+  }
+  const double above = sum - double(line.Sum);
+  // With shares of 64 in all at most.
+  if (!exact && !(std::fabs(above) > double(line.Sum) * (line.Count + 3) * 0x1p-46)) return Flat::Unknown;
+  return above < 0.0 ? Flat::Falls : Flat::Stays;
+}
+
+}
+
 bool CopiesOneLine(const Contribution& line) {
   return line.Count == 1 && line.Entries[0].Weight == line.Sum && line.Sum != 0.0F;
 }
@@ -103,7 +123,7 @@ bool AlwaysInDoubt(const Contribution& line) {
 }
 
 bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLine& made) {
-  made = {0, 0};
+  made = {0, 0, Flat::Unknown};
   if (line.Count == 0) return true;
   if (CopiesOneLine(line)) {
     shares[0] = 1 << FixedPointLine::Bits;
@@ -130,7 +150,7 @@ bool MakeFixedPoint(const Contribution& line, std::int32_t* shares, FixedPointLi
   // A sum lies between the two; what happens on the way to it may pass 32 bits, and comes back.
   const double farthest = std::fmax(sizes.Positive, sizes.Negative) * 255.0 + tooLarge + tooSmall;
   if (!(farthest < 2147483647.0) || !(tooLarge + tooSmall < One / 2)) return false;
-  made = {std::int32_t(tooSmall), std::uint32_t(tooLarge + tooSmall) + 1};
+  made = {std::int32_t(tooSmall), std::uint32_t(tooLarge + tooSmall) + 1, OfFlatRun(line)};
   return true;
 }
 
@@ -178,22 +198,6 @@ struct LineDigits {
     return true;
   }
 };
-
-/// What a flat run becomes, if that is the same for all values but 0.
-Flat OfFlatRun(const Contribution& line) {
-  double sum = 0.0;
-  // Up to 16 weights below 2 that are multiples of 2^-40, times 255: none of the sums has more than 53 bits.
-  bool exact = line.Count <= 16;
-  for (std::int32_t i = 0; i < line.Count; ++i) {
-    const double weight = line.Entries[i].Weight, units = weight * 0x1p40;
-    exact = exact && std::fabs(weight) < 2.0 && double(std::int64_t(units)) == units;
-    sum += weight;
-  }
-  const double above = sum - double(line.Sum);
-  // With shares of 64 in all at most.
-  if (!exact && !(std::fabs(above) > double(line.Sum) * (line.Count + 3) * 0x1p-46)) return Flat::Unknown;
-  return above < 0.0 ? Flat::Falls : Flat::Stays;
-}
 
 /// The bounds of q' - q in the units of the shares, which are `unit` of those that they were added up in.
 struct Bounds {
