@@ -8,6 +8,7 @@ import subprocess
 
 import pytest
 from conftest import COMMAND, wait_for
+from distributed import Client
 
 # Stands for the command. The first picture of its name waits with its worker until it is let go; with POISON in its
 # name it takes the worker along.
@@ -82,6 +83,9 @@ class Cluster:
                            "--local-directory", str(batch.directory / f"worker{number}")],
                           stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
             for number, words in enumerate(before)]
+        # A batch ends where the only worker that is there yet can't work.
+        with Client(self.address) as client:
+            client.wait_for_workers(len(before), timeout=300)
 
     def end(self):
         for process in [*self.workers, self.scheduler]:
