@@ -6,6 +6,7 @@
 #include "scale/slot_pairs.h"
 
 namespace zor {
+// Of each instruction set its own. NOLINTNEXTLINE(cert-dcl59-cpp,google-build-namespaces)
 namespace {
 
 constexpr int GroupSlots = GroupPixels / LinesInSlot;

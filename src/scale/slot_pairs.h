@@ -1,6 +1,7 @@
 // How the numbers of a slot lie, and sums of them; for slot_loops_body.h.
 
 namespace zor {
+// Of each instruction set its own. NOLINTNEXTLINE(cert-dcl59-cpp,google-build-namespaces)
 namespace {
 
 #ifdef WIDE

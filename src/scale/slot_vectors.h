@@ -27,6 +27,7 @@
 #define UNROLL _Pragma("GCC unroll 16")
 
 namespace zor {
+// Of each instruction set its own. NOLINTNEXTLINE(cert-dcl59-cpp,google-build-namespaces)
 namespace {
 
 constexpr int Width = VectorBytes, Parts = Width / 16;
