@@ -168,7 +168,8 @@ Stream Input::Open() const {
       position.get(), "rb",
       {.read = Position::Read, .write = nullptr, .seek = Position::Seek, .close = Position::Close}));
   if (!stream) throw Failure(Name(), std::strerror(errno));
-  position.release();
+  // It is the stream's from here on.
+  static_cast<void>(position.release());
   std::setvbuf(stream.get(), nullptr, _IOFBF, BufferBytes);
   return stream;
 }

@@ -81,7 +81,7 @@ class Stream {
       Turn(turned);
     } else if (kind != Kind::Bands || !JoinsBands(work)) {
       FlushBands();
-      // One processor gains nothing from rows that arrive while it works, but where they need no memory.
+      // To one processor rows that arrive while it works only save memory.
       if (kind == Kind::InOrder && Coming && (ThreadsOf(Options) > 1 || IsLarge()))
         ApplyInOrder(work);
       else

@@ -1,6 +1,7 @@
 """What a worker does with a group of pictures. Sent along with the work, so that a worker needs nothing but the
 engine and the command; so it uses the standard library and the engine alone."""
 
+import errno
 import os
 import shutil
 import signal
@@ -93,6 +94,17 @@ def _machine_fault(message, source, target):
     return ""
 
 
+def _directory_faults(target):
+    """Makes a result's directory. Gives what stands in the way of this one, and what does on this machine."""
+    try:
+        os.makedirs(os.path.dirname(target), exist_ok=True)
+    except OSError as error:
+        if error.errno in (errno.EEXIST, errno.ENOTDIR, errno.ENAMETOOLONG):
+            return str(error), ""
+        return "", str(error)
+    return "", ""
+
+
 def make_group(job, pairs):
     """Makes the pictures of `pairs`, (source, target) in bytes, one after another. Gives the machine, the worker's
     address, for each picture (message, seconds, pixels), its message empty where it is done, and what keeps this
@@ -108,13 +120,24 @@ def make_group(job, pairs):
         for number, (source, target) in enumerate(pairs):
             start = time.perf_counter()
             pixels = 0
+            if not command:
+                sent = number
+            if sent == number:
+                message, fault = _directory_faults(target)
+                if fault:
+                    break
+                if message:
+                    answers.append((message, time.perf_counter() - start, 0))
+                    sent += 1
+                    continue
             try:
-                if not command:
-                    command, sent = _Command(job, limit and limit // hands, threads), number
+                command = command or _Command(job, limit and limit // hands, threads)
+                if sent == number:
+                    command.send(source, target)
+                    sent += 1
                 # It goes on with the next one while its answer to this one is dealt with.
-                for ahead in pairs[sent:number + 2]:
-                    os.makedirs(os.path.dirname(ahead[1]), exist_ok=True)
-                    command.send(*ahead)
+                if sent == number + 1 < len(pairs) and not any(_directory_faults(pairs[sent][1])):
+                    command.send(*pairs[sent])
                     sent += 1
                 pixels, message = command.answer()
             except EOFError as end:

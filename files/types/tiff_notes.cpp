@@ -120,7 +120,7 @@ void WriteTIFFNotes(TIFFHandle& file, int descriptor, const std::filesystem::pat
     const std::size_t at = size > 4 ? block.Number(entry + 8, 4) : entry + 8;
     if (std::ranges::find(Texts, tag) == std::end(Texts) || !block.Holds(at, std::size_t(size))) return;
     std::string text(block.At.begin() + std::ptrdiff_t(at), block.At.begin() + std::ptrdiff_t(at + size));
-    text = text.c_str();
+    text.erase(std::ranges::find(text, '\0'), text.end());
     if (!text.empty()) file.Set(tag, text.c_str());
   });
   if (!camera && !place) return;

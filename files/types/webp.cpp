@@ -87,9 +87,11 @@ class WebPReader : public WholeReader {
     options.use_threads = Options.Threads != 1;
     const Handle<WebPAnimDecoder, WebPAnimDecoderDelete> decoder(WebPAnimDecoderNew(&data, &options));
     std::uint8_t* canvas = nullptr;
-    for (int page = 0, time = 0; page <= Options.Page; ++page)
+    int page = 0, time = 0;
+    do {
       if (!decoder || !WebPAnimDecoderGetNext(decoder.get(), &canvas, &time))
         throw Failure(From.Name(), "corrupt WebP");
+    } while (page++ < Options.Page);
     std::memcpy(pixels, canvas, size);
   }
 

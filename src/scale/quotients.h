@@ -65,6 +65,7 @@ struct FixedPointLine {
   std::int32_t Bias;
   /// The sample is in doubt where the Bits low bits of the biased sum are below this, which is D + E.
   std::uint32_t Doubtful;
+  /// What flat runs become; unknown where nothing is ever in doubt.
   Flat OfFlat;
 };
 /// The shares of a line, one an entry. False where they don't fit, or the line is always in doubt.

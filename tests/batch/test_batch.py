@@ -85,7 +85,14 @@ def test_refused_before_any_work(batch, arguments, code, told):
 
 
 def test_lists_of_names_and_trees_of_results(batch):
-    names = sorted(os.listdir(os.fsencode(batch.directory / "in")))
-    (batch.directory / "list").write_bytes(b"".join(b"in/" + name + b"\0" for name in names))
-    batch.run("steps", "--inputs", "list", "-0", "-o", "tree/{dir}/{name}.png", "--command", COMMAND)
+    names = sorted(b"in/" + name for name in os.listdir(os.fsencode(batch.directory / "in")))
+    # A file stands where the directory of one result would.
+    for directory in ("tree", "other"):
+        (batch.directory / directory).mkdir()
+    (batch.directory / "tree/other").touch()
+    (batch.directory / "other/0.png").write_bytes((batch.directory / "in/0.png").read_bytes())
+    names.insert(3, b"other/0.png")
+    (batch.directory / "list").write_bytes(b"".join(name + b"\0" for name in names))
+    error = batch.run("steps", "--inputs", "list", "-0", "-o", "tree/{dir}/{name}.png", "--command", COMMAND, code=2)[1]
+    assert "other/0.png: " in error and "File exists" in error and len(error.splitlines()) == 1
     assert sums(batch.directory / "tree/in") == batch.expected

@@ -39,7 +39,7 @@ for program in by_cmake/outside by_cmake/outside_static ./by_pkg_config; do
 done
 
 python=usr/lib/python3/dist-packages
-if [ -d $python ]; then
+if grep -q '^PICTUREZOR_PYTHON:BOOL=ON' "$build/CMakeCache.txt"; then
   PYTHONPATH=$python /usr/bin/python3 -c "
 import picturezor as pz
 pz.open('lake.jpg').scale(percent=50, kernel='box').save('half.png')"

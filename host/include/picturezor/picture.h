@@ -145,7 +145,8 @@ class Picture : public Object {
 
   /// A new picture through the global factory, or in memory; nil for a size or format that can't be had.
   static Picture Create(std::int32_t width, std::int32_t height, Format format);
-  /// A new picture through this picture's factory, the global one, or in memory; nil as above.
+  /// A new picture through this picture's factory, the global one, or in memory; nil for a size or format
+  /// that can't be had.
   Picture CreatePicture(std::int32_t width, std::int32_t height, Format format) const;
   /// Bytes that a picture in memory takes; 0 for a size or format that is refused.
   static std::int64_t CalculateMemory(std::int32_t width, std::int32_t height, Format format);
@@ -353,8 +354,8 @@ class Picture : public Object {
                       std::int32_t sourceY) const;
   ///@}
   ///@{
-  /// The colours of `picture`, and red of its mask as alpha, 255 less it with `invertMask`; without a mask
-  /// white.
+  /// The colours of `picture`, and red of its mask as alpha, 255 less it with `invertMask`. A picture without
+  /// a mask counts as white.
   void DrawMaskedPictureRGB(const HostPicture& picture, bool invertMask = false) const;
   void DrawMaskedPictureRGB(const HostPicture& picture, std::int32_t x, std::int32_t y,
                             bool invertMask = false) const;
@@ -493,15 +494,16 @@ class Picture : public Object {
   /// A blur by less than a pixel: the neighbours count by the radius' fraction.
   Picture BoxBlurFractionalFilter(const Picture& dest, double radius) const;
   /// Two colours with a step between them where the picture, blurred by `radius`, passes `threshold`; the
-  /// step is `softness` wide, both with 1 for 255. Gives a new picture without alpha; `dest` receives the
-  /// first blur.
+  /// step is `softness` wide, both with 1 for 255. Gives a new picture without alpha; `dest`, which may not
+  /// be the picture itself, receives the first blur.
   Picture StampFilter(const Picture& dest, double radius, double threshold, double softness, Color black,
                       Color white) const;
   /// Pushes each sample away from that of `original`, a blurred copy as a rule, by 4 `amount` times their
   /// difference, in place; differences below `threshold` (in sample values) are left alone. False unless both
   /// have one size and format.
   bool UnsharpFilter(const Picture& original, double amount, std::int32_t threshold) const;
-  /// The mean of the most frequent among `levels` classes of values (1 to 256) within `range` pixels.
+  /// The mean of the most frequent among `levels` classes of values (1 to 256) within `range` pixels. Nil for
+  /// a `dest` with pixels of another size.
   Picture OilFilter(const Picture& dest, std::int32_t levels, std::int32_t range) const;
   /// Each pixel from a place up to `level` columns and rows away, by the process's `rand`. For gray and RGB.
   Picture DiffuseFilter(const Picture& dest, std::int32_t level) const;
