@@ -85,7 +85,7 @@ class ExifBlock {
   std::uint64_t SizeOf(std::size_t entry) const {
     constexpr std::array sizes = {0, 1, 1, 2, 4, 8, 1, 1, 2, 4, 8, 4, 8, 4};
     const std::uint32_t type = Number(entry + 2, 2);
-    return type < sizes.size() ? std::uint64_t{Number(entry + 4, 4)} * sizes[type] : 0;
+    return type < std::size(sizes) ? std::uint64_t{Number(entry + 4, 4)} * sizes[type] : 0;
   }
   void PutEntry(std::size_t entry, std::uint32_t tag, std::uint32_t type, std::uint32_t value) {
     Put(entry, 2, tag);

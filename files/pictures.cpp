@@ -50,7 +50,7 @@ Picture MakeMapped(const PictureSize& size, const std::filesystem::path& directo
   RequireRoom(directory, bytes, size);
   const int nameless = NamelessFile(directory);
   // The module opens it once more, and takes all of its room.
-  Picture picture =
+  const Picture picture =
       Picture::Mapped("/proc/self/fd/" + std::to_string(nameless), size.Width, size.Height, size.Of);
   close(nameless);
   if (!picture.Valid())
@@ -59,7 +59,7 @@ Picture MakeMapped(const PictureSize& size, const std::filesystem::path& directo
 }
 
 Picture MakeInMemory(const PictureSize& size) {
-  Picture picture = MemoryOf(size) > MostOfItsOwn ? Picture::InBlock(size.Width, size.Height, size.Of)
+  const Picture picture = MemoryOf(size) > MostOfItsOwn ? Picture::InBlock(size.Width, size.Height, size.Of)
                                                         : Picture(size.Width, size.Height, size.Of);
   if (!picture.Valid()) throw Failure("not enough memory for " + SizeText(size));
   return picture;

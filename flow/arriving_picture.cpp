@@ -256,7 +256,7 @@ void ArrivingPicture::ShowZeros() {
     EndProcess("picturezor: not enough memory for a picture that arrives\n");
 }
 
-void ArrivingPicture::Fail(std::exception_ptr reason) {
+void ArrivingPicture::Fail(const std::exception_ptr& reason) {
   {
     const std::lock_guard lock(Access);
     if (!Failed) Failed = reason;

@@ -51,7 +51,7 @@ class ArrivingPicture {
   /// Whether a cursor may go on.
   bool MayFill(const Cursor& cursor) const;
   void Fill(Cursor& cursor, std::int64_t chunk, std::uint8_t* into);
-  void Fail(std::exception_ptr reason);
+  void Fail(const std::exception_ptr& reason);
   void ShowZeros();
 
   const RowSource From;

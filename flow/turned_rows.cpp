@@ -103,7 +103,7 @@ TurnedRows::TurnedRows(const RowSource& source, int orientation, const files::St
     spare->Samples.resize(std::size_t(strips.RowsOfStrip * rowBytes));
     ReadRows(*rows, spare->Samples.data(), rowBytes, std::int32_t(spare->Rows.Count()));
     progress.Step(spare->Rows.Count());
-    work.Put(std::move(spare));
+    work.Put(std::exchange(spare, nullptr));
     if (int(work.Size()) > threads) spare = work.Take();
   }
   while (work.Size() > 0) work.Take();

@@ -56,8 +56,7 @@ struct Laid {
 class Combining final : public flow::Operation {
  public:
   Combining(const Values& values, const Surroundings& around)
-      : Stores(around.Stores), Overlay(values.Any("overlay"), around) {
-    At = values.Get<Integers>("at");
+      : Stores(around.Stores), At(values.Get<Integers>("at")), Overlay(values.Any("overlay"), around) {
     How.PreMultipliedSource = values.Flag("premultiplied");
     How.UseColours = true;
     if (values.Has("fore")) How.ForeColour = values.Get<Color>("fore");

@@ -13,10 +13,10 @@ class Rotating final : public flow::Operation {
  public:
   /// What fills the corners: the colour, its luma in gray pictures, no ink on paper that is white; and
   /// nothing where there is alpha.
-  Rotating(double angle, Color colour) : Angle(angle) {
-    const int gray = (colour.Red * 77 + colour.Green * 151 + colour.Blue * 28) >> 8;
-    Corners = {
-        .Red = colour.Red, .Green = colour.Green, .Blue = colour.Blue, .Gray = gray, .Black = 255 - gray};
+  Rotating(double angle, Color colour)
+      : Angle(angle), Corners{.Red = colour.Red, .Green = colour.Green, .Blue = colour.Blue} {
+    Corners.Gray = (colour.Red * 77 + colour.Green * 151 + colour.Blue * 28) >> 8;
+    Corners.Black = 255 - Corners.Gray;
   }
 
   flow::Shape Result(const flow::Shape& source) const override {

@@ -148,9 +148,7 @@ BoxLevels::Part BoxLevels::Reduce(const std::uint8_t* rows, std::ptrdiff_t strid
   const std::int32_t end = first + count;
   // The first row of each level that isn't complete.
   std::vector<std::int32_t> next;
-  for (const LevelPlan& level : Levels)
-    next.push_back(
-        std::int32_t(std::ranges::lower_bound(level.Rows, first, {}, &BoxLine::Last) - level.Rows.begin()));
+  for (const LevelPlan& level : Levels) next.push_back(FirstOpen(level, first));
   for (std::int32_t y = first; y < end; ++y) {
     Split(rows + (y - first) * stride, Width, Channels, scratch.Planes.data(), Width);
     for (int k = 0; k < Even; ++k) {
@@ -214,9 +212,20 @@ BoxLevels::Part BoxLevels::Reduce(const std::uint8_t* rows, std::ptrdiff_t strid
   return part;
 }
 
+std::int32_t BoxLevels::FirstOpen(const LevelPlan& level, std::int32_t first) {
+  return std::int32_t(std::ranges::lower_bound(level.Rows, first, {}, &BoxLine::Last) - level.Rows.begin());
+}
+
+void BoxLevels::BeginAt(std::int32_t first) {
+  for (LevelPlan& level : Levels) {
+    level.NextRow = FirstOpen(level, first);
+    level.Open.assign(std::size_t(level.Width) * std::size_t(Channels), 0);
+  }
+}
+
 void BoxLevels::Add(const Part& part,
                     const std::function<void(int, std::int32_t, const std::uint8_t*)>& onRow) {
-  for (std::size_t k = 0; k < Levels.size(); ++k) {
+  for (std::size_t k = 0; k < part.size(); ++k) {
     LevelPlan& level = Levels[k];
     const LevelPart& of = part[k];
     const std::size_t samples = std::size_t(level.Width) * std::size_t(Channels);

@@ -53,7 +53,11 @@ class BoxLevels {
   /// `count` rows of the source from `first` on. Several threads may do this at once.
   Part Reduce(const std::uint8_t* rows, std::ptrdiff_t stride, std::int32_t first, std::int32_t count,
               Scratch& scratch) const;
-  /// Takes the parts in the order of their rows. Gives the rows of the levels as they are complete.
+  /// The first part to come begins at row `first` of the source. A row of a level that began above is given
+  /// too, and is wrong.
+  void BeginAt(std::int32_t first);
+  /// Takes the parts in the order of their rows. Gives the rows of the levels as they are complete. Levels
+  /// that a part leaves out, or has nothing of, are left alone.
   void Add(const Part& part,
            const std::function<void(int level, std::int32_t y, const std::uint8_t* row)>& onRow);
 
@@ -61,6 +65,9 @@ class BoxLevels {
   struct LevelPlan;
 
   void ReduceRow(const LevelPlan& level, int k, Scratch& scratch, std::uint32_t* sums, bool adds) const;
+
+  /// The first row of a level that ends at a row of the source or below it.
+  static std::int32_t FirstOpen(const LevelPlan& level, std::int32_t first);
 
   const std::int32_t Width;
   const int Channels;

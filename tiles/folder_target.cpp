@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <cstring>
 #include <fstream>
+#include <sstream>
 #include <system_error>
 
 #include "failure.h"
@@ -43,21 +44,44 @@ void Rename(const path& from, const path& to) {
 
 }
 
-FolderTarget::FolderTarget(const path& parent, const std::string& name, const std::string& task, bool resume)
+UnfinishedFolder::UnfinishedFolder(const path& parent, const std::string& name)
     : Parent(parent),
       Unfinished(parent / (name + ".unfinished")),
       JournalName(Unfinished / "journal"),
       Name(name) {
   for (const char* ending : {"", "_files", ".dzi", ".html"}) RequireFree(Parent / (Name + ending));
+}
+
+void UnfinishedFolder::RequireFree(const path& file) const {
+  std::error_code failed;
+  if (std::filesystem::exists(std::filesystem::symlink_status(file, failed)))
+    throw Failure(file, "it is there already; remove it first, or choose another name");
+}
+
+void UnfinishedFolder::Commit() {
+  // What says that there is a pyramid comes last.
+  for (const char* ending : {"", "_files", ".html", ".dzi"}) {
+    const path file = Unfinished / (Name + ending);
+    if (!std::filesystem::exists(file)) continue;
+    RequireFree(Parent / (Name + ending));
+    Rename(file, Parent / (Name + ending));
+  }
+  std::filesystem::remove_all(Unfinished);
+}
+
+FolderTarget::FolderTarget(const path& parent, const std::string& name, const std::string& task, bool resume)
+    : UnfinishedFolder(parent, name) {
   bool goesOn = false;
   if (std::ifstream journal(JournalName); resume && journal) {
     std::string before;
     goesOn = std::getline(journal, before) && before == task;
-    int level = 0;
-    std::int32_t row = 0;
     // A line that was cut off has no end, and its row is made again.
-    for (std::string line; goesOn && std::getline(journal, line) && !journal.eof();)
-      if (std::sscanf(line.c_str(), "%d %d", &level, &row) == 2) Rows.insert({level, row});
+    for (std::string line; goesOn && std::getline(journal, line) && !journal.eof();) {
+      std::istringstream numbers(line);
+      int level = 0;
+      std::int32_t row = 0;
+      if (numbers >> level >> row) Rows.insert({level, row});
+    }
   }
   std::error_code failed;
   // Only what has a journal is ours to remove.
@@ -68,12 +92,6 @@ FolderTarget::FolderTarget(const path& parent, const std::string& name, const st
   const std::string start = goesOn ? "\n" : task + "\n";
   files::WriteAll(Journal->Descriptor(), {reinterpret_cast<const std::uint8_t*>(start.data()), start.size()},
                   JournalName);
-}
-
-void FolderTarget::RequireFree(const path& file) const {
-  std::error_code failed;
-  if (std::filesystem::exists(std::filesystem::symlink_status(file, failed)))
-    throw Failure(file, "it is there already; remove it first, or choose another name");
 }
 
 std::unique_ptr<files::Output> FolderTarget::Begin(const std::string& name) const {
@@ -90,14 +108,41 @@ void FolderTarget::AddRow(int level, std::int32_t row) {
 
 void FolderTarget::Commit() {
   Journal->Commit();
-  // What says that there is a pyramid comes last.
-  for (const char* ending : {"", "_files", ".html", ".dzi"}) {
-    const path file = Unfinished / (Name + ending);
-    if (!std::filesystem::exists(file)) continue;
-    RequireFree(Parent / (Name + ending));
-    Rename(file, Parent / (Name + ending));
+  UnfinishedFolder::Commit();
+}
+
+SharedFolderTarget::SharedFolderTarget(const path& parent, const std::string& name, const std::string& task,
+                                       bool begins)
+    : UnfinishedFolder(parent, name) {
+  if (!begins && !std::filesystem::exists(JournalName)) throw Failure(Unfinished, "no part is made yet");
+  std::error_code failed;
+  std::filesystem::create_directories(Unfinished, failed);
+  if (failed) throw Failure(Unfinished, failed.message());
+  if (!std::filesystem::exists(JournalName)) {
+    // Another run may be just here, and write the same.
+    for (const auto& entry : std::filesystem::directory_iterator(Unfinished))
+      if (!entry.path().filename().string().starts_with(".picturezor-") && entry.path() != JournalName)
+        throw Failure(Unfinished, "something else is there");
+    files::OutputFile journal(JournalName);
+    const std::string line = task + "\n";
+    files::WriteAll(journal.Descriptor(), {reinterpret_cast<const std::uint8_t*>(line.data()), line.size()},
+                    JournalName);
+    journal.Commit();
   }
-  std::filesystem::remove_all(Unfinished);
+  std::ifstream journal(JournalName);
+  std::string before;
+  if (!std::getline(journal, before) || before != task)
+    throw Failure(Unfinished,
+                  "the unfinished pyramid of another image, or with other options; remove it first");
+}
+
+std::unique_ptr<files::Output> SharedFolderTarget::Begin(const std::string& name) const {
+  const path file = Unfinished / name;
+  std::error_code failed;
+  if (!std::filesystem::exists(Unfinished)) throw Failure(Unfinished, "it is gone");
+  std::filesystem::create_directories(file.parent_path(), failed);
+  if (failed) throw Failure(file.parent_path(), failed.message());
+  return std::make_unique<files::OutputFile>(file);
 }
 
 }

@@ -7,7 +7,9 @@
 #include "box_levels.h"
 #include "conveyor.h"
 #include "failure.h"
+#include "kept_sums.h"
 #include "page.h"
+#include "share.h"
 #include "step.h"
 #include "target.h"
 #include "threads.h"
@@ -42,9 +44,10 @@ struct Job {
 
 class Maker {
  public:
-  Maker(const flow::Shape& shape, const std::string& name, const files::FileType& type, TileTarget& target,
-        const TilesOptions& options)
-      : Grids({shape.Width, shape.Height}, options.How, options.Tile, options.Overlap),
+  Maker(const flow::Shape& shape, const Grid& grid, const Share& share, const std::string& name,
+        const files::FileType& type, TileTarget& target, const TilesOptions& options)
+      : Grids(grid),
+        Own(share),
         Name(name),
         Ending(type.Extensions.front()),
         Type(type),
@@ -59,58 +62,99 @@ class Maker {
     Writing.Threads = 1;
     files::RequireStorableSize(name + Ending, type, options.Tile + 2 * options.Overlap,
                                options.Tile + 2 * options.Overlap);
-    for (int level = 0; level < Grids.LevelCount(); ++level)
-      Levels.push_back(std::make_unique<TileRows>(Grids, level, files::ChannelsOf(shape.Of)));
+    for (int level = 0; level < Grids.LevelCount(); ++level) {
+      const auto& [first, end] = Own.Levels[std::size_t(level)];
+      Levels.push_back(std::make_unique<TileRows>(Grids, level, files::ChannelsOf(shape.Of), first, end));
+    }
+    for (int level = 1; level < Grids.LevelCount(); ++level) {
+      Smaller.push_back(Grids.Level(level));
+      Samples.push_back(std::size_t(Smaller.back().Width) * std::size_t(files::ChannelsOf(shape.Of)));
+    }
   }
 
-  const Grid& Cut() const { return Grids; }
   const std::string& TileEnding() const { return Ending; }
 
-  /// The picture itself, and with it all other levels by the kernel box.
-  void MakeAll(flow::Rows& rows, files::Progress& progress) {
-    std::vector<files::Extent> sizes;
-    for (int level = 1; level < Grids.LevelCount(); ++level) sizes.push_back(Grids.Level(level));
-    BoxLevels boxes(Grids.Level(0), files::ChannelsOf(LevelFormat), sizes);
+  /// The picture itself, out of the rows of its share, and with it the other levels by the kernel box. What
+  /// its own rows mean for levels that aren't made now is kept.
+  void MakeAll(flow::Rows& rows, files::Progress& progress, SumsWriter* keeper) {
+    BoxLevels boxes(Grids.Level(0), files::ChannelsOf(LevelFormat), Smaller);
+    boxes.BeginAt(Own.First);
     std::vector<decltype(boxes.MakeScratch())> scratch;
     for (int i = 0; i < Threads; ++i) scratch.push_back(boxes.MakeScratch());
-    const auto onRow = [this](int level, std::int32_t, const std::uint8_t* row) {
-      TileRows& into = *Levels[std::size_t(level) + 1];
-      std::copy_n(row, into.Filling()->RowBytes, into.Place());
-      Gathered(level + 1, 1);
+    const auto finish = [this, &boxes, keeper](BoxLevels::Part& part, bool own) {
+      const int left = Own.Shared - 1;
+      if (keeper && own) keeper->Add(part, left);
+      part.resize(std::size_t(left));
+      AddTo(boxes, part);
     };
-    MakeLevel(0, rows, progress, [&](std::int32_t first, std::int32_t count) {
-      struct Reduction {
-        std::shared_ptr<Band> Of;
-        BoxLevels::Part Part;
-      };
-      auto reduction = std::make_shared<Reduction>(Reduction{Levels[0]->Filling(), {}});
-      Put({[=, &boxes, &scratch](int thread) {
-             reduction->Part =
-                 boxes.Reduce(reduction->Of->Row(first), std::ptrdiff_t(reduction->Of->RowBytes), first,
-                              count, *scratch[std::size_t(thread)]);
-             reduction->Of.reset();
-           },
-           [=, &boxes] { boxes.Add(reduction->Part, onRow); }});
-    });
+    MakeLevel(0, Own.First, Own.End, rows, progress,
+              [&](std::shared_ptr<Band>&& band, std::int32_t first, std::int32_t count) {
+                struct Reduction {
+                  std::shared_ptr<Band> Of;
+                  BoxLevels::Part Part;
+                };
+                auto reduction = std::make_shared<Reduction>(Reduction{std::move(band), {}});
+                const bool own = first >= Own.FirstOwn && first < Own.EndOwn;
+                Put({[=, &boxes, &scratch](int thread) {
+                       reduction->Part =
+                           boxes.Reduce(reduction->Of->Row(first), std::ptrdiff_t(reduction->Of->RowBytes),
+                                        first, count, *scratch[std::size_t(thread)]);
+                       reduction->Of.reset();
+                     },
+                     [=] { finish(reduction->Part, own); }});
+              });
   }
 
-  /// One level alone.
+  /// One level alone, whole.
   void MakeOne(int level, flow::Rows& rows, files::Progress& progress) {
-    MakeLevel(level, rows, progress, [](std::int32_t, std::int32_t) {});
+    MakeLevel(level, 0, Grids.Level(level).Height, rows, progress,
+              [](std::shared_ptr<Band>&&, std::int32_t, std::int32_t) {});
+  }
+
+  /// The levels that all parts have left.
+  void Join(const SharedFolderTarget& from, const std::string& task, files::Progress& progress) {
+    BoxLevels boxes(Grids.Level(0), files::ChannelsOf(LevelFormat), Smaller);
+    progress.Begin("joining parts", Options.Parts);
+    for (std::int32_t number = 1; number <= Options.Parts; ++number, progress.Step()) {
+      SumsReader sums(from.PartName(number), task);
+      while (const auto part = sums.Next(Own.Shared - 1, Samples)) {
+        AddTo(boxes, *part);
+        while (Jobs.Size() > JobsAhead * std::size_t(Threads)) Finish();
+      }
+    }
+    while (Jobs.Size() > 0) Finish();
   }
 
  private:
+  void AddTo(BoxLevels& boxes, const BoxLevels::Part& part) {
+    boxes.Add(part, [this](int level, std::int32_t y, const std::uint8_t* row) {
+      TileRows& into = *Levels[std::size_t(level) + 1];
+      // Others have those above and below.
+      if (into.Done() || y != into.Next()) return;
+      std::copy_n(row, into.Filling()->RowBytes, into.Place());
+      Gathered(level + 1, 1);
+    });
+  }
+
   template <class OnRows>
-  void MakeLevel(int level, flow::Rows& rows, files::Progress& progress, OnRows&& onRows) {
+  void MakeLevel(int level, std::int32_t first, std::int32_t end, flow::Rows& rows, files::Progress& progress,
+                 OnRows&& onRows) {
     TileRows& into = *Levels[std::size_t(level)];
-    const std::int32_t height = Grids.Level(level).Height;
-    progress.Begin("making tiles", height);
-    while (into.Next() < height) {
-      const std::int32_t y = into.Next();
-      const std::int32_t count = std::min(into.Room(), RowsTogether - y % RowsTogether);
-      flow::ReadRows(rows, into.Place(), std::ptrdiff_t(into.Filling()->RowBytes), count);
-      onRows(y, count);
-      Gathered(level, count);
+    const std::size_t rowBytes = rows.RowBytes();
+    progress.Begin("making tiles", end - first);
+    for (std::int32_t y = first, count = 0; y < end; y += count) {
+      count = std::min(end - y, RowsTogether - y % RowsTogether);
+      for (const std::int32_t border : {into.Next(), Own.FirstOwn, Own.EndOwn})
+        if (border > y) count = std::min(count, border - y);
+      const bool forTiles = !into.Done() && y == into.Next();
+      if (forTiles) count = std::min(count, into.Room());
+      // Rows of a neighbour are needed for smaller levels alone.
+      auto band = forTiles ? into.Filling()
+                           : std::make_shared<Band>(Band{y, rowBytes, Bytes(rowBytes * std::size_t(count))});
+      flow::ReadRows(rows, band->Row(y), std::ptrdiff_t(rowBytes), count);
+      // No longer held here, since who is done with a band gives it back by that.
+      onRows(std::move(band), y, count);
+      if (forTiles) Gathered(level, count);
       progress.Step(count);
     }
     while (Jobs.Size() > 0) Finish();
@@ -130,7 +174,7 @@ class Maker {
   void Gathered(int level, std::int32_t count) {
     TileRows& rows = *Levels[std::size_t(level)];
     rows.Add(count);
-    for (;;) {
+    while (!rows.Done()) {
       // The band behind the next is still being cut into tiles. Only where the picture itself comes may other
       // jobs be taken meanwhile: those of smaller levels stand behind jobs that have been taken.
       while (level == 0 && rows.Room() == 0 &&
@@ -191,7 +235,8 @@ class Maker {
     return file;
   }
 
-  const Grid Grids;
+  const Grid& Grids;
+  const Share& Own;
   const std::string Name, Ending;
   const files::FileType& Type;
   TileTarget& Into;
@@ -200,6 +245,9 @@ class Maker {
   const Format TileFormat, LevelFormat;
   const TilePixels Pixels;
   std::vector<std::unique_ptr<TileRows>> Levels;
+  /// Of the levels behind the first: their sizes, and the samples of a row.
+  std::vector<files::Extent> Smaller;
+  std::vector<std::size_t> Samples;
   const int Threads;
   files::Conveyor<Job> Jobs;
 };
@@ -215,7 +263,7 @@ std::string TaskOf(const path& source, const flow::Shape& shape, const TilesOpti
   for (const std::int64_t number :
        {std::int64_t(changed), std::int64_t(shape.Width), std::int64_t(shape.Height), std::int64_t(shape.Of),
         std::int64_t(options.How), std::int64_t(options.Tile), std::int64_t(options.Overlap),
-        std::int64_t(options.Writing.Quality), std::int64_t(options.SkipBlank),
+        std::int64_t(options.Writing.Quality), std::int64_t(options.SkipBlank), std::int64_t(options.Parts),
         std::int64_t(options.Background.Red << 16 | options.Background.Green << 8 | options.Background.Blue)})
     task += std::to_string(number) + " ";
   task += options.Type + " " + options.Kernel + " " + whole.string();
@@ -230,15 +278,15 @@ std::unique_ptr<flow::Rows> WholeRows(flow::OpenFile file, const TilesOptions& o
   return flow::Through(std::move(file), {}, options.Running, progress);
 }
 
-void MakeLevels(Maker& maker, flow::OpenFile file, const path& source, const TilesOptions& options,
-                files::Progress& progress) {
+void MakeLevels(Maker& maker, const Grid& grid, flow::OpenFile file, const path& source,
+                const TilesOptions& options, files::Progress& progress) {
   const auto again = file.Again;
   const std::unique_ptr<flow::Rows> rows = WholeRows(std::move(file), options, progress);
-  if (options.Kernel == "box") return maker.MakeAll(*rows, progress);
+  if (options.Kernel == "box") return maker.MakeAll(*rows, progress, nullptr);
   if (!again) throw Failure(source, "only the kernel box makes all levels of what can't be read again");
   maker.MakeOne(0, *rows, progress);
-  for (int level = 1; level < maker.Cut().LevelCount(); ++level) {
-    const files::Extent size = maker.Cut().Level(level);
+  for (int level = 1; level < grid.LevelCount(); ++level) {
+    const files::Extent size = grid.Level(level);
     flow::Chain chain;
     chain.push_back(
         steps::MakeOperation(*steps::FindStep("scale"),
@@ -250,12 +298,24 @@ void MakeLevels(Maker& maker, flow::OpenFile file, const path& source, const Til
   }
 }
 
+void RequireDivisible(const Grid& grid, const path& source, int orientation, bool zip,
+                      const TilesOptions& options) {
+  if (zip) throw files::UsageFailure("--part: only a folder can be made by parts");
+  if (options.Resume) throw files::UsageFailure("--resume: parts go on by themselves");
+  if (options.Kernel != "box") throw files::UsageFailure("--part: only the kernel box makes parts");
+  if (orientation > 2) throw Failure(source, "it isn't stored upright, so it can't be made by parts");
+  if (options.Parts > grid.Down(0))
+    throw files::UsageFailure("--part: there are only " + std::to_string(grid.Down(0)) +
+                              " rows of tiles to divide");
 }
 
-void MakeTiles(flow::OpenFile file, const path& source, const path& target, const TilesOptions& options,
+}
+
+void MakeTiles(flow::OpenFile file, const path& source, const path& named, const TilesOptions& options,
                files::Progress& progress) {
   const files::FileType& type = TileType(options.Type);
   const flow::Shape shape = flow::ShapeOf(file);
+  const path target = named.has_filename() ? named : named.parent_path();
   const bool zip = EndsWith(target, ".zip") || EndsWith(target, ".szi");
   const bool described = options.How == Layout::DeepZoom && EndsWith(target, ".dzi");
   const std::string name = (zip || described ? target.stem() : target.filename()).string();
@@ -263,15 +323,36 @@ void MakeTiles(flow::OpenFile file, const path& source, const path& target, cons
   if (options.How != Layout::DeepZoom && options.Overlap > 0)
     throw files::UsageFailure("--overlap: only the layout deepzoom has that");
   if (zip && options.Resume) throw files::UsageFailure("--resume: only a folder can be gone on with");
+  const Grid grid({shape.Width, shape.Height}, options.How, options.Tile, options.Overlap);
+  const bool divided = options.Parts > 0;
+  if (divided) RequireDivisible(grid, source, file.Reader->Info().Orientation, zip, options);
+  const std::string task = TaskOf(source, shape, options);
   std::unique_ptr<TileTarget> into;
-  if (zip)
+  const SharedFolderTarget* shared = nullptr;
+  if (zip) {
     into = std::make_unique<ZipTarget>(target);
+  } else if (divided) {
+    auto folder = std::make_unique<SharedFolderTarget>(target.parent_path(), name, task, options.Part > 0);
+    shared = folder.get();
+    into = std::move(folder);
+  } else {
+    into = std::make_unique<FolderTarget>(target.parent_path(), name, task, options.Resume);
+  }
+  if (options.Part > 0 && HasSums(shared->PartName(options.Part), task)) return;
+  const bool joins = divided && options.Part == 0;
+  const Share share = joins ? RestOf(grid, options.Parts)
+                            : ShareOf(grid, divided ? options.Part - 1 : 0, divided ? options.Parts : 1);
+  Maker maker(shape, grid, share, name, type, *into, options);
+  if (options.Part > 0) {
+    SumsWriter sums(shared->PartName(options.Part), task);
+    maker.MakeAll(*flow::RowsOf(std::move(file)).From(share.First), progress, &sums);
+    // The tiles are there before the file that says so.
+    return sums.Commit();
+  }
+  if (joins)
+    maker.Join(*shared, task, progress);
   else
-    into = std::make_unique<FolderTarget>(target.parent_path(), name, TaskOf(source, shape, options),
-                                          options.Resume);
-  Maker maker(shape, name, type, *into, options);
-  MakeLevels(maker, std::move(file), source, options, progress);
-  const Grid& grid = maker.Cut();
+    MakeLevels(maker, grid, std::move(file), source, options, progress);
   const std::string id =
       (options.Address.empty() ? std::string("http://localhost") : options.Address) + "/" + name;
   WriteText(*into, grid.DescriptionName(name), grid.Description(maker.TileEnding(), id));

@@ -31,13 +31,17 @@ struct TilesOptions {
   bool Page = false;
   /// Goes on with a folder that was interrupted.
   bool Resume = false;
+  /// With Parts the work is divided among so many runs, which share a folder and may work at once: each makes
+  /// Part, 1 to Parts, and at the end one with Part 0 makes the smaller levels and completes the pyramid. It
+  /// has the same bytes as one that a single run makes. A part that is made already isn't made again.
+  std::int32_t Parts = 0, Part = 0;
   flow::RunOptions Running;
 };
 
 /// Makes an image pyramid called `target`: a folder, or one ZIP where the name ends in .zip or .szi. `source`
 /// names the file in what is told of it. The levels are those of Grid, each the `Scale` of the whole picture.
 /// With the kernel box the file is read once, and memory is taken for some rows of tiles of each level; with
-/// others it is read once for each level. Throws files::Failure.
+/// others it is read once for each level, and there are no parts. Throws files::Failure.
 void MakeTiles(flow::OpenFile file, const std::filesystem::path& source, const std::filesystem::path& target,
                const TilesOptions& options, files::Progress& progress);
 

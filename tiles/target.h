@@ -27,11 +27,24 @@ class TileTarget {
 
 /// A name's file or folder, and what stands for it until it is complete: NAME.unfinished, which stays where
 /// the work is interrupted.
-class FolderTarget final : public TileTarget {
+class UnfinishedFolder : public TileTarget {
  public:
-  /// `name` is what the names of all files begin with. `task` says what is done with what: with `resume` the
-  /// rows of an unfinished pyramid with the same task needn't be made again. Throws where the pyramid is
-  /// there already.
+  void Commit() override;
+
+ protected:
+  /// `name` is what the names of all files begin with. Throws where the pyramid is there already.
+  UnfinishedFolder(const std::filesystem::path& parent, const std::string& name);
+  void RequireFree(const std::filesystem::path& file) const;
+
+  const std::filesystem::path Parent, Unfinished, JournalName;
+  const std::string Name;
+};
+
+/// One that a single run fills.
+class FolderTarget final : public UnfinishedFolder {
+ public:
+  /// `task` says what is done with what: with `resume` the rows of an unfinished pyramid with the same task
+  /// needn't be made again.
   FolderTarget(const std::filesystem::path& parent, const std::string& name, const std::string& task,
                bool resume);
   std::unique_ptr<files::Output> Begin(const std::string& name) const override;
@@ -41,12 +54,23 @@ class FolderTarget final : public TileTarget {
   void Commit() override;
 
  private:
-  void RequireFree(const std::filesystem::path& file) const;
-
-  std::filesystem::path Parent, Unfinished, JournalName;
-  std::string Name;
   std::unique_ptr<files::Output> Journal;
   std::set<std::pair<int, std::int32_t>> Rows;
+};
+
+/// One that several runs fill, on one machine or many, and one of them commits. Each file is whole or not
+/// there, also where two runs make it.
+class SharedFolderTarget final : public UnfinishedFolder {
+ public:
+  /// Throws where the folder is that of another task; and without `begins` where it isn't there.
+  SharedFolderTarget(const std::filesystem::path& parent, const std::string& name, const std::string& task,
+                     bool begins);
+  std::unique_ptr<files::Output> Begin(const std::string& name) const override;
+  void Add(files::Output& file) override { file.Commit(); }
+  /// What a part, counted from 1, keeps for who joins them.
+  std::filesystem::path PartName(std::int32_t part) const {
+    return Unfinished / ("part-" + std::to_string(part));
+  }
 };
 
 /// One uncompressed ZIP, with 64 bits where it needs them. It stands under its name when it is complete.

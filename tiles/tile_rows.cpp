@@ -6,8 +6,14 @@
 
 namespace picturezor::tiles {
 
-TileRows::TileRows(const Grid& grid, int level, int channels)
-    : Of(grid), Level(level), RowBytes(std::size_t(grid.Level(level).Width) * std::size_t(channels)) {
+TileRows::TileRows(const Grid& grid, int level, int channels, std::int32_t first, std::int32_t end)
+    : Of(grid),
+      Level(level),
+      RowBytes(std::size_t(grid.Level(level).Width) * std::size_t(channels)),
+      TileRow(first),
+      EndTileRow(end) {
+  if (Done()) return;
+  NextRow = Begin();
   Start();
 }
 
@@ -26,9 +32,9 @@ void TileRows::Start() {
 }
 
 std::optional<TileRows::Complete> TileRows::Take() {
-  if (TileRow == Of.Down(Level) || Room() > 0) return std::nullopt;
-  Complete complete{Current, TileRow};
-  if (++TileRow < Of.Down(Level)) Start();
+  if (Done() || Room() > 0) return std::nullopt;
+  Complete complete{Current, TileRow++};
+  if (!Done()) Start();
   return complete;
 }
 

@@ -20,11 +20,13 @@ struct Band {
 /// Gathers the rows of a level until a row of tiles is complete, with what it shares with its neighbours.
 class TileRows {
  public:
-  TileRows(const Grid& grid, int level, int channels);
+  /// Those of some rows of tiles: `first` and on, up to `end`.
+  TileRows(const Grid& grid, int level, int channels, std::int32_t first, std::int32_t end);
 
   /// Where the next rows go, and how many of them fit.
   std::uint8_t* Place() { return Current->Row(NextRow); }
-  std::int32_t Room() const { return End() - NextRow; }
+  std::int32_t Room() const { return Done() ? 0 : End() - NextRow; }
+  bool Done() const { return TileRow == EndTileRow; }
   std::int32_t Next() const { return NextRow; }
   const std::shared_ptr<Band>& Filling() const { return Current; }
   /// So many rows are there.
@@ -47,7 +49,8 @@ class TileRows {
   const Grid& Of;
   const int Level;
   const std::size_t RowBytes;
-  std::int32_t TileRow = 0, NextRow = 0;
+  std::int32_t TileRow, NextRow = 0;
+  const std::int32_t EndTileRow;
   std::shared_ptr<Band> Current, Spare;
 };
 

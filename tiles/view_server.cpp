@@ -199,7 +199,7 @@ struct ViewServer::Implementation {
   }
 
   /// What goes wrong becomes a line of text, and a page shows it.
-  void Add(const char* place, std::function<void(const Request&, Response&)> handler) {
+  void Add(const char* place, const std::function<void(const Request&, Response&)>& handler) {
     Server.Get(place, [handler](const Request& request, Response& response) {
       const auto refuse = [&](int code, const std::string& reason) {
         response.status = code;

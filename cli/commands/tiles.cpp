@@ -20,6 +20,20 @@ struct Options {
 const std::map<std::string, Layout> Layouts{
     {"deepzoom", Layout::DeepZoom}, {"iiif", Layout::IIIF}, {"xyz", Layout::XYZ}};
 
+constexpr std::int32_t MostParts = 1 << 20;
+
+void SetPart(tiles::TilesOptions& making, const std::string& text) {
+  const std::size_t slash = text.find('/');
+  const auto number = [](const std::string& digits) {
+    int value = 0;
+    return CLI::detail::lexical_cast(digits, value) && value >= 1 && value <= MostParts ? value : 0;
+  };
+  making.Part = number(text.substr(0, slash));
+  making.Parts = slash == std::string::npos ? 0 : number(text.substr(slash + 1));
+  if (making.Part == 0 || making.Part > making.Parts)
+    throw UsageFailure("--part: " + text + " isn't a part like 2/5");
+}
+
 int Tiles(Session& session, Options options) {
   tiles::TilesOptions& making = options.Making;
   if (!options.Background.empty()) {
@@ -48,7 +62,9 @@ void AddTiles(CLI::App& app, Session& session) {
       "  picturezor tiles scan.tif -o scan --page\n"
       "  picturezor tiles scan.tif --layout iiif --address https://example.org/iiif -o scan\n"
       "  picturezor tiles map.png --layout xyz --format png --skip-blank -o map\n"
-      "  picturezor tiles scan.tif --tile 254 --overlap 1 -o scan.szi");
+      "  picturezor tiles scan.tif --tile 254 --overlap 1 -o scan.szi\n"
+      "  for part in 1 2 3; do picturezor tiles scan.tif -o scan --part $part/3; done\n"
+      "  picturezor tiles scan.tif -o scan --join 3");
   auto options = std::make_shared<Options>();
   command->add_option("IN", options->In, "Image to read")->required()->type_name("");
   command
@@ -97,9 +113,20 @@ void AddTiles(CLI::App& app, Session& session) {
   command->add_flag("--page", options->Making.Page,
                     "Add a page that shows it: NAME.html beside NAME.dzi, else NAME/index.html");
   command->add_flag("--resume", options->Making.Resume, "Go on with a folder that was interrupted");
+  CLI::Option* part =
+      command
+          ->add_option_function<std::string>(
+              "--part", [options](const std::string& text) { SetPart(options->Making, text); },
+              "Make part K of N only, from 1/N to N/N, at the same time or on several machines")
+          ->type_name("K/N");
   command
-      ->add_option("--threads", session.Threads,
-                   "Threads to work on; 0, the default, is one a processor")
+      ->add_option(
+          "--join", options->Making.Parts,
+          "Complete the pyramid when all N parts are made; with the options that they were made with")
+      ->type_name("N")
+      ->check(CLI::Range(1, MostParts))
+      ->excludes(part);
+  command->add_option("--threads", session.Threads, "Threads to work on; 0, the default, is one a processor")
       ->type_name("N")
       ->check(CLI::Range(0, 32));
   AddStoreOptions(*command, session);

@@ -200,6 +200,50 @@ TEST_F(Tiles, AreThereWhenTheyAreCompleteAndCanBeGoneOnWith) {
   EXPECT_FALSE(std::filesystem::exists(At("p.unfinished")));
 }
 
+// Catches seams between parts: rows of smaller levels that two of them share, tiles that overlap, sums that
+// are counted twice.
+TEST_F(Tiles, MadeByPartsAreTheSame) {
+  const struct {
+    int Width, Height, Channels;
+    std::vector<int> Parts;
+    std::vector<std::string> Options;
+  } cases[] = {
+      {300, 517, 3, {1, 2, 3, 9}, {"--tile", "64", "--overlap", "7"}},
+      {130, 333, 4, {5, 21}, {"--tile", "16", "--format", "png", "--skip-blank", "--layout", "xyz"}},
+      {77, 1023, 1, {4, 11}, {"--tile", "32", "--layout", "iiif", "--page"}},
+      {5, 4000, 2, {7}, {"--tile", "16", "--overlap", "15", "--format", "png"}},
+  };
+  for (const auto& [width, height, channels, counts, options] : cases) {
+    WriteTIFF(At("a.tif"), Noise(width, height, channels), {.RowsPerStrip = 9});
+    const auto command = [&](const std::string& name, const Arguments& more) {
+      Arguments all{"tiles", "a.tif", "-o", name};
+      all.insert(all.end(), options.begin(), options.end());
+      all.insert(all.end(), more.begin(), more.end());
+      return all;
+    };
+    Do(command("whole/p", {}));
+    for (const int parts : counts) {
+      SCOPED_TRACE(testing::Message() << height << " by " << parts);
+      const std::string of = "/" + std::to_string(parts);
+      const Arguments join{"--join", std::to_string(parts)};
+      for (int part = parts; part > 1; --part) Do(command("made/p/", {"--part", std::to_string(part) + of}));
+      Fail(command("made/p", join), parts > 1 ? "made/p.unfinished/part-1" : "made/p.unfinished", "made yet");
+      if (parts > 1)
+        Fail(command("made/p", {"--part", "1" + of, "--background", "010203"}), "made/p.unfinished",
+             "other options");
+      Do(command("made/p", {"--part", "1" + of}));
+      Do(command("made/p", join));
+      EXPECT_EQ(FilesBelow("made"), FilesBelow("whole"));
+      for (const std::string& name : FilesBelow("whole"))
+        EXPECT_EQ(ReadBytes(At("made/" + name)), ReadBytes(At("whole/" + name))) << name;
+      EXPECT_THAT(Run(command("made/p", {"--part", "1" + of})).Error,
+                  testing::HasSubstr("it is there already"));
+      std::filesystem::remove_all(At("made"));
+    }
+    std::filesystem::remove_all(At("whole"));
+  }
+}
+
 TEST_F(Tiles, RefuseWhatCantBe) {
   WritePNG(At("a.png"), Noise(20, 10, 3));
   WriteBytes(At("p_files"), {1});
@@ -208,7 +252,13 @@ TEST_F(Tiles, RefuseWhatCantBe) {
   for (const Arguments& wrong : {Arguments{"--format", "tif"},
                                  {"--layout", "iiif", "--overlap", "1"},
                                  {"--tile", "4"},
-                                 {"--kernel", "gauss"}}) {
+                                 {"--kernel", "gauss"},
+                                 {"--part", "1/2"},
+                                 {"--part", "2/1"},
+                                 {"--part", "1/1x"},
+                                 {"--part", "1/1", "--join", "1"},
+                                 {"--part", "1/1", "--resume"},
+                                 {"--part", "1/1", "--kernel", "cubic"}}) {
     Arguments command{"tiles", "a.png", "-o", "p"};
     command.insert(command.end(), wrong.begin(), wrong.end());
     EXPECT_EQ(Run(command).Code, 3) << wrong[1];
