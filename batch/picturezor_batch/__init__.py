@@ -3,5 +3,6 @@ so a result has the same bytes wherever it was made."""
 
 from .batch import Failed, Report, run
 from .failures import BatchFailure, UsageFailure
+from .pyramid import tiles
 
-__all__ = ["run", "Report", "Failed", "BatchFailure", "UsageFailure"]
+__all__ = ["run", "tiles", "Report", "Failed", "BatchFailure", "UsageFailure"]

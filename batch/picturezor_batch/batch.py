@@ -1,12 +1,8 @@
 """The work of a batch: groups of pictures on the workers of the engine, results in the journal."""
 
-import collections
-import contextlib
-import itertools
 import os
 import shutil
 import time
-import uuid
 from dataclasses import dataclass, field
 
 from . import worker
@@ -14,13 +10,10 @@ from .failures import BatchFailure
 from .journal import Journal
 from .names import Pattern, absolute, inputs as files_of
 from .recipe import Recipe
+from .work import Stopped, Work, workers_of
 
 # Bytes that a picture weighs beside those of its file: what it costs however small it is.
 _EVERY_PICTURE = 1 << 16
-# Seconds after which workers of this machine are given up. Those of a cluster may come at any time.
-_WITHOUT_WORKERS = 180
-# Groups for each hand of a worker: one in work, one that waits beside it.
-_AHEAD = 2
 
 
 @dataclass
@@ -45,10 +38,6 @@ class Report:
     seconds: float = 0.0
     stopped: str = ""
     failed: list = field(default_factory=list)
-
-
-class _Stopped(Exception):
-    """The batch ends before all is done."""
 
 
 def _planned(names, pattern):
@@ -96,138 +85,6 @@ class _Groups:
         return group
 
 
-class _Batch:
-    def __init__(self, client, journal, recipe, job, fail_fast, seconds, progress, stop, report, own):
-        from distributed import as_completed
-
-        self._client, self._journal, self._recipe, self._job = client, journal, recipe, job
-        self._fail_fast, self._progress, self._stop, self._report = fail_fast, progress, stop, report
-        to_do = journal.count("to do")
-        self._groups = _Groups(journal.to_do(), journal.weight() + to_do * _EVERY_PICTURE, seconds)
-        self._total = to_do
-        self._run = uuid.uuid4().hex[:8]
-        self._numbers = itertools.count()
-        self._in_work = {}  # Future: its rows
-        self._again = collections.deque()  # Groups that a machine couldn't do
-        self._suspects = collections.deque()  # Pictures whose group's workers died
-        self._unfit = {}  # Address of a worker: what keeps it from working
-        self._alone = False
-        self._own, self._seen, self._called = own, time.monotonic(), time.monotonic()
-        self._known, self._asked = {}, 0.0  # The workers, and when they were asked for
-        self._results = as_completed(with_results=True, loop=client.loop, raise_errors=False)
-
-    def work(self):
-        try:
-            while True:
-                self._fill()
-                if not self._in_work:
-                    if not self._suspects:
-                        return
-                    self._alone = True
-                    continue
-                if self._stop and self._stop.is_set():
-                    raise _Stopped("interrupted")
-                ready = self._results.next_batch(block=False)
-                for future, result in ready:
-                    self._take(future, result)
-                if not ready:
-                    time.sleep(0.02)
-        finally:
-            for future in self._in_work:
-                future.release()
-
-    def _workers(self):
-        # The scheduler is asked, so not too often.
-        if time.monotonic() - self._asked > 1:
-            self._known, self._asked = self._client.scheduler_info()["workers"], time.monotonic()
-        return self._known
-
-    def _fill(self):
-        """Keeps the workers busy, and the engine's list of tasks short however many pictures there are."""
-        workers = self._workers()
-        if workers:
-            self._seen = time.monotonic()
-        elif self._own and time.monotonic() - self._seen > _WITHOUT_WORKERS:
-            raise _Stopped("the workers died and don't come back")
-        if self._own and time.monotonic() - self._called > 20:
-            # The engine doesn't start a worker again that died while it was starting, unless it is asked.
-            self._own.scale(len(self._own.worker_spec))
-            self._called = time.monotonic()
-        fit = {address: about for address, about in workers.items() if address not in self._unfit}
-        if workers and not fit:
-            raise _Stopped("no machine is left to work on: " + next(iter(self._unfit.values())))
-        hands = sum(about["nthreads"] for about in fit.values()) or 1
-        # A suspect that is one indeed takes its worker along, and nothing else should be there then.
-        most = max(1, len(fit) // 2) if self._alone else _AHEAD * hands
-        while len(self._in_work) < most:
-            if self._alone:
-                group = [self._suspects.popleft()] if self._suspects else []
-            else:
-                group = self._again.popleft() if self._again else self._groups.next(hands)
-            if not group:
-                return
-            where = {"workers": list(fit), "allow_other_workers": False} if len(fit) < len(workers) else {}
-            future = self._client.submit(
-                worker.make_group, self._job, [row[:2] for row in group],
-                key=f"pictures-{self._run}-{next(self._numbers)}", pure=False, **where)
-            self._in_work[future] = group
-            self._results.add(future)
-
-    def _take(self, future, result):
-        group = self._in_work.pop(future)
-        if future.status == "finished":
-            self._take_answers(group, result)
-        elif future.status == "error":
-            error = result[1]
-            if type(error).__name__ != "KilledWorker":
-                raise BatchFailure(f"a worker can't do its work: {error!r}")
-            if self._alone:
-                self._put(group[0], "aside", "its workers died, so it is set aside")
-            self._suspects.extend([] if self._alone else group)
-        else:
-            self._in_work[future] = group
-            raise _Stopped("the scheduler has ended")
-
-    def _take_answers(self, group, result):
-        machine = result["machine"]
-        if result["fault"]:
-            self._unfit[result["worker"]] = f"{machine}: {result['fault']}"
-            rest = group[len(result["answers"]):]
-            if self._alone:
-                self._suspects.extend(rest)
-            else:
-                self._again.append(rest)
-        for row, (message, seconds, pixels) in zip(group, result["answers"]):
-            self._groups.learn(row, seconds)
-            self._put(row, "failed" if message else "done", message, seconds, pixels, machine)
-
-    def _put(self, row, result, message, seconds=0.0, pixels=0, machine=""):
-        self._journal.write(row, self._recipe.hash, result, message, seconds, pixels, machine)
-        if result == "done":
-            self._report.done += 1
-            self._report.pixels += pixels
-        else:
-            self._report.failed.append(Failed(row[0], message, machine, result == "aside"))
-        if self._progress:
-            self._progress(1, self._total)
-        if message and self._fail_fast:
-            raise _Stopped("an input failed")
-
-
-def _local_client(workers):
-    import dask
-    from distributed import Client, LocalCluster
-
-    # A task that takes two workers along is given up. Nobody looks at profiles of what only waits for a command.
-    dask.config.set({"distributed.scheduler.allowed-failures": 1, "distributed.worker.profile.interval": "1s",
-                     "distributed.worker.profile.cycle": "10s",
-                     # A machine that is very busy may take long to bring a worker back.
-                     "distributed.comm.timeouts.connect": "120s"})
-    cluster = LocalCluster(n_workers=workers, threads_per_worker=1, dashboard_address="127.0.0.1:0",
-                           silence_logs="CRITICAL")
-    return Client(cluster)
-
-
 def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_fast=False, memory_limit=None,
         temp_dir=None, writing=(), command=None, workers=None, task_seconds=2.0, progress=None, stop=None,
         report=None):
@@ -265,7 +122,6 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
     except OSError as error:
         raise BatchFailure(f"{os.fsdecode(pattern.directory)}: {error.strerror}") from None
     book = Journal(journal or os.path.join(os.fsdecode(pattern.directory), "picturezor-batch.sqlite"))
-    own = None
     try:
         book.plan(_planned(inputs, pattern))
         changed = book.settle(recipe.hash, redo)
@@ -274,25 +130,33 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
         outcome = Report(skipped=book.count("skipped"))
         outcome.failed = [Failed(source, message) for source, message in book.failed_before()]
         count = book.count("to do")
-        if fail_fast and outcome.failed:
-            outcome.stopped = "an input failed"
-        elif count:
-            workers = workers or len(os.sched_getaffinity(0))
-            if not client:
-                own = client = _local_client(min(workers, count))
-            job = {"steps": recipe.text, "writing": recipe.writing, "directory": os.getcwd(), "temp_dir": temp_dir,
-                   "memory_limit": memory_limit, "command": where if own or command else "picturezor",
-                   "threads": max(1, len(os.sched_getaffinity(0)) // workers) if own else None}
-            _send_along()
-            try:
-                _Batch(client, book, recipe, job, fail_fast, task_seconds, progress, stop, outcome,
-                       own and own.cluster).work()
-                if own:
-                    # One that is just coming back would complain of a scheduler that is gone.
-                    with contextlib.suppress(TimeoutError):
-                        client.wait_for_workers(min(workers, count), timeout=20)
-            except _Stopped as stopped:
-                outcome.stopped = str(stopped)
+
+        def answered(row, result, message, seconds, pixels, machine):
+            book.write(row, recipe.hash, result, message, seconds, pixels, machine)
+            if result == "done":
+                outcome.done += 1
+                outcome.pixels += pixels
+            else:
+                outcome.failed.append(Failed(row[0], message, machine, result == "aside"))
+            if progress:
+                progress(1, count)
+            if message and fail_fast:
+                raise Stopped("an input failed")
+
+        try:
+            if fail_fast and outcome.failed:
+                raise Stopped("an input failed")
+            if count:
+                workers = workers or len(os.sched_getaffinity(0))
+                job = {"steps": recipe.text, "writing": recipe.writing, "directory": os.getcwd(),
+                       "temp_dir": temp_dir, "memory_limit": memory_limit,
+                       "command": "picturezor" if client and not command else where,
+                       "threads": None if client else max(1, len(os.sched_getaffinity(0)) // workers)}
+                groups = _Groups(book.to_do(), book.weight() + count * _EVERY_PICTURE, task_seconds)
+                with workers_of(client, min(workers, count)) as (engine, own):
+                    Work(engine, groups, worker.make_group, job, lambda row: row[:2], answered, stop, own).do()
+        except Stopped as stopped:
+            outcome.stopped = str(stopped)
         outcome.unfinished = book.count("to do") + book.count("failed") - outcome.done - len(outcome.failed)
         outcome.seconds = time.monotonic() - start
         book.flush()
@@ -302,15 +166,4 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
             write_page(report, outcome, recipe, book, where)
         return outcome
     finally:
-        if own:
-            cluster = own.cluster
-            own.close()
-            cluster.close(timeout=5)
         book.close()
-
-
-def _send_along():
-    """Workers get the function itself, so that this package needn't be there."""
-    import cloudpickle
-
-    cloudpickle.register_pickle_by_value(worker)

@@ -13,6 +13,21 @@ import time
 MACHINE_FAULTS = ("No space left on device", "Disk quota exceeded", "Read-only file system", "no space left for")
 
 
+def _guarded(command):
+    """The words of a process that ends with its worker, also when that is killed."""
+    return (["setpriv", "--pdeathsig", "TERM"] if shutil.which("setpriv") else []) + command
+
+
+def _last_words(said, code):
+    """Why a command ended, out of what it wrote on standard error and its exit code."""
+    lines = said.decode(errors="replace").strip().splitlines()
+    if lines:
+        return lines[-1].removeprefix("picturezor: ")
+    if code < 0:
+        return f"the command was ended by signal {-code} ({signal.strsignal(-code)})"
+    return f"the command ended with code {code}"
+
+
 class _Command:
     """A process of the command that takes pair after pair of names. A picture that crashes takes it along, and
     nothing else."""
@@ -24,10 +39,8 @@ class _Command:
         self._told = b""
         try:
             os.write(steps, job["steps"])
-            # The child ends with its worker, also when that is killed.
-            guard = ["setpriv", "--pdeathsig", "TERM"] if shutil.which("setpriv") else []
-            arguments = [*guard, job["command"], "run", "--pairs", "-", "--steps", f"/dev/fd/{steps}", "--quiet",
-                         "--threads", str(threads), *job["writing"]]
+            arguments = _guarded([job["command"], "run", "--pairs", "-", "--steps", f"/dev/fd/{steps}", "--quiet",
+                                  "--threads", str(threads), *job["writing"]])
             if memory:
                 arguments += ["--memory-limit", str(memory)]
             if job["temp_dir"]:
@@ -68,12 +81,7 @@ class _Command:
 
     def _last_words(self):
         code = self._process.wait()
-        said = os.pread(self._errors, 1 << 12, 0).decode(errors="replace").strip().splitlines()
-        if said:
-            return said[-1].removeprefix("picturezor: ")
-        if code < 0:
-            return f"the command was ended by signal {-code} ({signal.strsignal(-code)})"
-        return f"the command ended with code {code}"
+        return _last_words(os.pread(self._errors, 1 << 12, 0), code)
 
     def close(self):
         try:
@@ -154,4 +162,33 @@ def make_group(job, pairs):
     finally:
         if command:
             command.close()
+    return {"machine": socket.gethostname(), "worker": worker.address, "answers": answers, "fault": fault}
+
+
+def make_parts(job, numbers):
+    """Makes parts of an image pyramid, or for the number 0 what completes it. Gives the same as make_group."""
+    from distributed import get_worker
+
+    worker = get_worker()
+    processors = len(os.sched_getaffinity(0))
+    answers, fault = [], ""
+    for number in numbers:
+        start = time.perf_counter()
+        share = ["--part", f"{number}/{job['parts']}"] if number else ["--join", str(job["parts"])]
+        # Nobody else is at work when all is put together.
+        threads = (job["threads"] or max(1, processors // worker.state.nthreads)) if number else processors
+        try:
+            done = subprocess.run(
+                _guarded([job["command"], "tiles", job["source"], "-o", job["target"], "--quiet", "--threads",
+                          str(threads), *share, *job["options"]]),
+                stdin=subprocess.DEVNULL, stdout=subprocess.DEVNULL, stderr=subprocess.PIPE, cwd=job["directory"],
+                start_new_session=True, env={**os.environ, "LC_ALL": "C"})
+        except OSError as error:
+            fault = str(error)
+            break
+        message = _last_words(done.stderr, done.returncode) if done.returncode else ""
+        fault = message and _machine_fault(message, job["source"], job["target"])
+        if fault:
+            break
+        answers.append((message, time.perf_counter() - start, 0))
     return {"machine": socket.gethostname(), "worker": worker.address, "answers": answers, "fault": fault}

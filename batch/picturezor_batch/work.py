@@ -1,0 +1,160 @@
+"""Tasks on the workers of the engine: which are at work, what they answer, and what becomes of those that die."""
+
+import collections
+import contextlib
+import itertools
+import os
+import time
+import uuid
+
+from . import worker
+from .failures import BatchFailure
+
+# Seconds after which workers of this machine are given up. Those of a cluster may come at any time.
+_WITHOUT_WORKERS = 180
+# Groups for each hand of a worker: one in work, one that waits beside it.
+_AHEAD = 2
+
+
+class Stopped(Exception):
+    """The work ends before all is done."""
+
+
+class Work:
+    """Rows, as the groups give them, each done once. `task` is the function of worker.py that does them: it gets `job`
+    and for each row what `told` makes of it. `answered(row, result, message, seconds, pixels, machine)` hears of each
+    in any order; result is done, failed or aside (given up, since workers died of it), message empty where it is done.
+    `own` is the cluster where it was started for this."""
+
+    def __init__(self, client, groups, task, job, told, answered, stop, own):
+        from distributed import as_completed
+
+        self._client, self._groups, self._task, self._job, self._told = client, groups, task, job, told
+        self._answered, self._stop = answered, stop
+        self._run = uuid.uuid4().hex[:8]
+        self._numbers = itertools.count()
+        self._in_work = {}  # Future: its rows
+        self._again = collections.deque()  # Groups that a machine couldn't do
+        self._suspects = collections.deque()  # Pictures whose group's workers died
+        self._unfit = {}  # Address of a worker: what keeps it from working
+        self._alone = False
+        self._own, self._seen, self._called = own, time.monotonic(), time.monotonic()
+        self._known, self._asked = {}, 0.0  # The workers, and when they were asked for
+        self._results = as_completed(with_results=True, loop=client.loop, raise_errors=False)
+
+    def do(self):
+        """Until all is done. Throws Stopped, and BatchFailure where no worker can do it."""
+        try:
+            while True:
+                self._fill()
+                if not self._in_work:
+                    if not self._suspects:
+                        return
+                    self._alone = True
+                    continue
+                if self._stop and self._stop.is_set():
+                    raise Stopped("interrupted")
+                ready = self._results.next_batch(block=False)
+                for future, result in ready:
+                    self._take(future, result)
+                if not ready:
+                    time.sleep(0.02)
+        finally:
+            for future in self._in_work:
+                future.release()
+
+    def _workers(self):
+        # The scheduler is asked, so not too often.
+        if time.monotonic() - self._asked > 1:
+            self._known, self._asked = self._client.scheduler_info()["workers"], time.monotonic()
+        return self._known
+
+    def _fill(self):
+        """Keeps the workers busy, and the engine's list of tasks short however many pictures there are."""
+        workers = self._workers()
+        if workers:
+            self._seen = time.monotonic()
+        elif self._own and time.monotonic() - self._seen > _WITHOUT_WORKERS:
+            raise Stopped("the workers died and don't come back")
+        if self._own and time.monotonic() - self._called > 20:
+            # The engine doesn't start a worker again that died while it was starting, unless it is asked.
+            self._own.scale(len(self._own.worker_spec))
+            self._called = time.monotonic()
+        fit = {address: about for address, about in workers.items() if address not in self._unfit}
+        if workers and not fit:
+            raise Stopped("no machine is left to work on: " + next(iter(self._unfit.values())))
+        hands = sum(about["nthreads"] for about in fit.values()) or 1
+        # A suspect that is one indeed takes its worker along, and nothing else should be there then.
+        most = max(1, len(fit) // 2) if self._alone else _AHEAD * hands
+        while len(self._in_work) < most:
+            if self._alone:
+                group = [self._suspects.popleft()] if self._suspects else []
+            else:
+                group = self._again.popleft() if self._again else self._groups.next(hands)
+            if not group:
+                return
+            where = {"workers": list(fit), "allow_other_workers": False} if len(fit) < len(workers) else {}
+            future = self._client.submit(
+                self._task, self._job, [self._told(row) for row in group],
+                key=f"pictures-{self._run}-{next(self._numbers)}", pure=False, **where)
+            self._in_work[future] = group
+            self._results.add(future)
+
+    def _take(self, future, result):
+        group = self._in_work.pop(future)
+        if future.status == "finished":
+            self._take_answers(group, result)
+        elif future.status == "error":
+            error = result[1]
+            if type(error).__name__ != "KilledWorker":
+                raise BatchFailure(f"a worker can't do its work: {error!r}")
+            if self._alone:
+                self._answered(group[0], "aside", "its workers died, so it is set aside", 0.0, 0, "")
+            self._suspects.extend([] if self._alone else group)
+        else:
+            self._in_work[future] = group
+            raise Stopped("the scheduler has ended")
+
+    def _take_answers(self, group, result):
+        machine = result["machine"]
+        if result["fault"]:
+            self._unfit[result["worker"]] = f"{machine}: {result['fault']}"
+            rest = group[len(result["answers"]):]
+            if self._alone:
+                self._suspects.extend(rest)
+            else:
+                self._again.append(rest)
+        for row, (message, seconds, pixels) in zip(group, result["answers"]):
+            self._groups.learn(row, seconds)
+            self._answered(row, "failed" if message else "done", message, seconds, pixels, machine)
+
+
+@contextlib.contextmanager
+def workers_of(client, count):
+    """The client, and the cluster behind it where it is started here, with `count` workers on this machine."""
+    # Workers get the functions themselves, so that this package needn't be there.
+    import cloudpickle
+
+    cloudpickle.register_pickle_by_value(worker)
+    if client:
+        yield client, None
+        return
+    import dask
+    from distributed import Client, LocalCluster
+
+    # A task that takes two workers along is given up. Nobody looks at profiles of what only waits for a command.
+    dask.config.set({"distributed.scheduler.allowed-failures": 1, "distributed.worker.profile.interval": "1s",
+                     "distributed.worker.profile.cycle": "10s",
+                     # A machine that is very busy may take long to bring a worker back.
+                     "distributed.comm.timeouts.connect": "120s"})
+    cluster = LocalCluster(n_workers=count, threads_per_worker=1, dashboard_address="127.0.0.1:0",
+                           silence_logs="CRITICAL")
+    own = Client(cluster)
+    try:
+        yield own, cluster
+        # One that is just coming back would complain of a scheduler that is gone.
+        with contextlib.suppress(TimeoutError):
+            own.wait_for_workers(count, timeout=20)
+    finally:
+        own.close()
+        cluster.close(timeout=5)
