@@ -139,6 +139,7 @@ class Maker {
   template <class OnRows>
   void MakeLevel(int level, std::int32_t first, std::int32_t end, flow::Rows& rows, files::Progress& progress,
                  OnRows&& onRows) {
+    LevelRead = level;
     TileRows& into = *Levels[std::size_t(level)];
     const std::size_t rowBytes = rows.RowBytes();
     progress.Begin("making tiles", end - first);
@@ -175,9 +176,9 @@ class Maker {
     TileRows& rows = *Levels[std::size_t(level)];
     rows.Add(count);
     while (!rows.Done()) {
-      // The band behind the next is still being cut into tiles. Only where the picture itself comes may other
-      // jobs be taken meanwhile: those of smaller levels stand behind jobs that have been taken.
-      while (level == 0 && rows.Room() == 0 &&
+      // The band behind the next is still being cut into tiles. Only where rows are read may other jobs be
+      // taken meanwhile: those of the levels below stand behind jobs that have been taken.
+      while (level == LevelRead && rows.Room() == 0 &&
              (rows.Waits() || Jobs.Size() > JobsAhead * std::size_t(Threads)))
         Finish();
       const auto complete = rows.Take();
@@ -249,6 +250,7 @@ class Maker {
   std::vector<files::Extent> Smaller;
   std::vector<std::size_t> Samples;
   const int Threads;
+  int LevelRead = -1;
   files::Conveyor<Job> Jobs;
 };
 
@@ -264,6 +266,7 @@ std::string TaskOf(const path& source, const flow::Shape& shape, const TilesOpti
        {std::int64_t(changed), std::int64_t(shape.Width), std::int64_t(shape.Height), std::int64_t(shape.Of),
         std::int64_t(options.How), std::int64_t(options.Tile), std::int64_t(options.Overlap),
         std::int64_t(options.Writing.Quality), std::int64_t(options.SkipBlank), std::int64_t(options.Parts),
+        std::int64_t(options.UseLevels),
         std::int64_t(options.Background.Red << 16 | options.Background.Green << 8 | options.Background.Blue)})
     task += std::to_string(number) + " ";
   task += options.Type + " " + options.Kernel + " " + whole.string();
@@ -278,15 +281,32 @@ std::unique_ptr<flow::Rows> WholeRows(flow::OpenFile file, const TilesOptions& o
   return flow::Through(std::move(file), {}, options.Running, progress);
 }
 
+/// Whether the file is read once more for each level.
+bool ReadsAgain(const TilesOptions& options) { return options.UseLevels || options.Kernel != "box"; }
+
 void MakeLevels(Maker& maker, const Grid& grid, flow::OpenFile file, const path& source,
                 const TilesOptions& options, files::Progress& progress) {
   const auto again = file.Again;
   const std::unique_ptr<flow::Rows> rows = WholeRows(std::move(file), options, progress);
-  if (options.Kernel == "box") return maker.MakeAll(*rows, progress, nullptr);
-  if (!again) throw Failure(source, "only the kernel box makes all levels of what can't be read again");
+  if (!ReadsAgain(options)) return maker.MakeAll(*rows, progress, nullptr);
+  if (!again)
+    throw Failure(source, "all levels are made at once of what can't be read again, by the kernel box");
   maker.MakeOne(0, *rows, progress);
   for (int level = 1; level < grid.LevelCount(); ++level) {
     const files::Extent size = grid.Level(level);
+    const auto open = [&] {
+      auto reader = again();
+      const bool upright = reader->Info().Orientation <= 4;
+      if (options.UseLevels)
+        reader->Reduce(upright ? size.Width : size.Height, upright ? size.Height : size.Width);
+      return reader;
+    };
+    flow::OpenFile from{open(), open};
+    const flow::Shape copy = flow::ShapeOf(from);
+    if (copy.Width == size.Width && copy.Height == size.Height) {
+      maker.MakeOne(level, *WholeRows(std::move(from), options, progress), progress);
+      continue;
+    }
     flow::Chain chain;
     chain.push_back(
         steps::MakeOperation(*steps::FindStep("scale"),
@@ -294,7 +314,7 @@ void MakeLevels(Maker& maker, const Grid& grid, flow::OpenFile file, const path&
                                                                 {"height", std::to_string(size.Height)},
                                                                 {"kernel", options.Kernel}},
                              {.Stores = options.Running.Stores, .Note = {}}));
-    maker.MakeOne(level, *flow::Through({again(), again}, chain, options.Running, progress), progress);
+    maker.MakeOne(level, *flow::Through(std::move(from), chain, options.Running, progress), progress);
   }
 }
 
@@ -302,7 +322,8 @@ void RequireDivisible(const Grid& grid, const path& source, int orientation, boo
                       const TilesOptions& options) {
   if (zip) throw files::UsageFailure("--part: only a folder can be made by parts");
   if (options.Resume) throw files::UsageFailure("--resume: parts go on by themselves");
-  if (options.Kernel != "box") throw files::UsageFailure("--part: only the kernel box makes parts");
+  if (ReadsAgain(options))
+    throw files::UsageFailure("--part: parts are made of the picture itself, by the kernel box");
   if (orientation > 2) throw Failure(source, "it isn't stored upright, so it can't be made by parts");
   if (options.Parts > grid.Down(0))
     throw files::UsageFailure("--part: there are only " + std::to_string(grid.Down(0)) +
@@ -345,7 +366,8 @@ void MakeTiles(flow::OpenFile file, const path& source, const path& named, const
   Maker maker(shape, grid, share, name, type, *into, options);
   if (options.Part > 0) {
     SumsWriter sums(shared->PartName(options.Part), task);
-    maker.MakeAll(*flow::RowsOf(std::move(file)).From(share.First), progress, &sums);
+    const flow::RowSource rows = flow::RowsOf(std::move(file));
+    maker.MakeAll(*rows.From(share.First), progress, &sums);
     // The tiles are there before the file that says so.
     return sums.Commit();
   }

@@ -21,6 +21,9 @@ struct TilesOptions {
   files::WriteOptions Writing;
   /// The kernel that makes the smaller levels, by its name.
   std::string Kernel = "box";
+  /// Makes each smaller level of the smallest copy of the picture in the file that is at least as large,
+  /// where there is one.
+  bool UseLevels = false;
   /// What shows through where the tiles' type has no alpha, and beside the picture in whole squares.
   Color Background{255, 255, 255};
   /// Tiles that show nothing but the background, or nothing at all, aren't written.
@@ -41,7 +44,7 @@ struct TilesOptions {
 /// Makes an image pyramid called `target`: a folder, or one ZIP where the name ends in .zip or .szi. `source`
 /// names the file in what is told of it. The levels are those of Grid, each the `Scale` of the whole picture.
 /// With the kernel box the file is read once, and memory is taken for some rows of tiles of each level; with
-/// others it is read once for each level, and there are no parts. Throws files::Failure.
+/// others, or with UseLevels, it is read once for each level, and there are no parts. Throws files::Failure.
 void MakeTiles(flow::OpenFile file, const std::filesystem::path& source, const std::filesystem::path& target,
                const TilesOptions& options, files::Progress& progress);
 

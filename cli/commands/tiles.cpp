@@ -55,7 +55,7 @@ int Tiles(Session& session, Options options) {
 void AddTiles(CLI::App& app, Session& session) {
   CLI::App* command = app.add_subcommand("tiles", "Make an image pyramid for viewers on the web");
   command->footer(
-      "Levels are made by halves from the picture itself, each as `scale` makes it. The pyramid stands "
+      "Levels are halves, each as `scale` makes it of the picture itself. The pyramid stands "
       "under\n"
       "its name when it is complete; until then NAME.unfinished does, which --resume goes on with.\n\n"
       "Examples:\n"
@@ -99,6 +99,8 @@ void AddTiles(CLI::App& app, Session& session) {
                    "image once, others once for each level")
       ->type_name("NAME")
       ->check(CLI::IsMember({"triangle", "box", "lanczos3", "lanczos8", "mitchell", "poly3", "cubic"}));
+  command->add_flag("--use-levels", options->Making.UseLevels,
+                    "Take the smaller copies in the image for smaller levels, as those of a pyramidal TIFF");
   command
       ->add_option(
           "--background", options->Background,

@@ -99,6 +99,23 @@ TEST_F(Tiles, PutTogetherAreTheScaledPicture) {
   }
 }
 
+// Catches copies that are taken for others, or not taken: theirs are of another picture.
+TEST_F(Tiles, CopiesInTheFileServeWhereTheyAreAskedFor) {
+  WritePNG(At("a.png"), Noise(400, 321, 3));
+  Do({"convert", "a.png", "--pyramid", "--tile", "64", "-o", "a.tif"});
+  Do({"tiles", "a.tif", "--format", "png", "--use-levels", "-o", "p"});
+  const Grid grid({400, 321}, Layout::DeepZoom, 256, 0);
+  EXPECT_EQ(Together(grid, "p", 0, 3), ReadPNG(At("a.png")));
+  // Copies have half as many columns and rows, rounded down, so level 1, of 200 x 161, is made of the
+  // picture.
+  EXPECT_EQ(Together(grid, "p", 1, 3), Scaled("a.png", {200, 161}, "box"));
+  Do({"crop", "a.png", "--rect", "0,0,400,320", "-o", "copy.png"});
+  for (const auto& [level, copy] : {std::pair{2, files::Extent{200, 160}}, {3, {100, 80}}}) {
+    WritePNG(At("copy.png"), Scaled("copy.png", copy, "box"));
+    EXPECT_EQ(Together(grid, "p", level, 3), Scaled("copy.png", grid.Level(level), "box")) << level;
+  }
+}
+
 TEST_F(Tiles, StandUpright) {
   WriteJPEG(At("a.jpg"), Waves(90, 40, 3), {.Orientation = 6});
   Do({"convert", "a.jpg", "-o", "upright.png"});
@@ -258,6 +275,7 @@ TEST_F(Tiles, RefuseWhatCantBe) {
                                  {"--part", "1/1x"},
                                  {"--part", "1/1", "--join", "1"},
                                  {"--part", "1/1", "--resume"},
+                                 {"--part", "1/1", "--use-levels"},
                                  {"--part", "1/1", "--kernel", "cubic"}}) {
     Arguments command{"tiles", "a.png", "-o", "p"};
     command.insert(command.end(), wrong.begin(), wrong.end());
