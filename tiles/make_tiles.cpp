@@ -318,6 +318,18 @@ void MakeLevels(Maker& maker, const Grid& grid, flow::OpenFile file, const path&
   }
 }
 
+/// What a SZI says of its picture; see version 1.0 of that format.
+std::string SlideProperties(const flow::Shape& shape) {
+  const auto property = [](const char* name, std::int32_t value) {
+    return std::string("    <property>\n      <name>") + name + "</name>\n      <value type=\"gint\">" +
+           std::to_string(value) + "</value>\n    </property>\n";
+  };
+  return "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n"
+         "<image xmlns=\"http://www.pathozoom.com/szi\" version=\"1.0\">\n  <properties>\n" +
+         property("ImageWidth", shape.Width) + property("ImageHeight", shape.Height) +
+         "  </properties>\n</image>\n";
+}
+
 void RequireDivisible(const Grid& grid, const path& source, int orientation, bool zip,
                       const TilesOptions& options) {
   if (zip) throw files::UsageFailure("--part: only a folder can be made by parts");
@@ -337,7 +349,7 @@ void MakeTiles(flow::OpenFile file, const path& source, const path& named, const
   const files::FileType& type = TileType(options.Type);
   const flow::Shape shape = flow::ShapeOf(file);
   const path target = named.has_filename() ? named : named.parent_path();
-  const bool zip = EndsWith(target, ".zip") || EndsWith(target, ".szi");
+  const bool slide = EndsWith(target, ".szi"), zip = slide || EndsWith(target, ".zip");
   const bool described = options.How == Layout::DeepZoom && EndsWith(target, ".dzi");
   const std::string name = (zip || described ? target.stem() : target.filename()).string();
   if (name.empty() || name == "." || name == "..") throw files::UsageFailure(target, "a name is missing");
@@ -351,7 +363,7 @@ void MakeTiles(flow::OpenFile file, const path& source, const path& named, const
   std::unique_ptr<TileTarget> into;
   const SharedFolderTarget* shared = nullptr;
   if (zip) {
-    into = std::make_unique<ZipTarget>(target);
+    into = std::make_unique<ZipTarget>(target, slide ? name : std::string());
   } else if (divided) {
     auto folder = std::make_unique<SharedFolderTarget>(target.parent_path(), name, task, options.Part > 0);
     shared = folder.get();
@@ -378,6 +390,7 @@ void MakeTiles(flow::OpenFile file, const path& source, const path& named, const
   const std::string id =
       (options.Address.empty() ? std::string("http://localhost") : options.Address) + "/" + name;
   WriteText(*into, grid.DescriptionName(name), grid.Description(maker.TileEnding(), id));
+  if (slide) WriteText(*into, "scan-properties.xml", SlideProperties(shape));
   if (options.Page) WritePage(*into, grid, name, maker.TileEnding(), shape.Density);
   into->Commit();
 }

@@ -76,7 +76,8 @@ class SharedFolderTarget final : public UnfinishedFolder {
 /// One uncompressed ZIP, with 64 bits where it needs them. It stands under its name when it is complete.
 class ZipTarget final : public TileTarget {
  public:
-  explicit ZipTarget(const std::filesystem::path& file);
+  /// With `folder` all files stand in a folder of that name in it.
+  explicit ZipTarget(const std::filesystem::path& file, const std::string& folder = {});
   ~ZipTarget() override;
   std::unique_ptr<files::Output> Begin(const std::string& name) const override;
   void Add(files::Output& file) override;
@@ -86,6 +87,7 @@ class ZipTarget final : public TileTarget {
   void Check(int result) const;
 
   std::unique_ptr<files::Output> File;
+  const std::filesystem::path Folder;
   struct Archive;
   std::unique_ptr<Archive> Of;
 };

@@ -22,8 +22,8 @@ struct ZipTarget::Archive {
   ~Archive() { archive_write_free(Of); }
 };
 
-ZipTarget::ZipTarget(const std::filesystem::path& file)
-    : File(std::make_unique<files::OutputFile>(file)), Of(std::make_unique<Archive>()) {
+ZipTarget::ZipTarget(const std::filesystem::path& file, const std::string& folder)
+    : File(std::make_unique<files::OutputFile>(file)), Folder(folder), Of(std::make_unique<Archive>()) {
   Check(archive_write_set_format_zip(Of->Of));
   Check(archive_write_zip_set_compression_store(Of->Of));
   Check(archive_write_open_fd(Of->Of, File->Descriptor()));
@@ -35,7 +35,7 @@ void ZipTarget::Check(int result) const {
 }
 
 std::unique_ptr<files::Output> ZipTarget::Begin(const std::string& name) const {
-  return std::make_unique<files::OutputBytes>(name);
+  return std::make_unique<files::OutputBytes>(Folder / name);
 }
 
 void ZipTarget::Add(files::Output& file) {

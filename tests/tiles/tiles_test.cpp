@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <csignal>
+#include <cstring>
 
 #include "cli/command_test_support.h"
 #include "grid.h"
@@ -177,19 +178,29 @@ TEST_F(Tiles, BlankOnesCanBeLeftOutAndAlphaIsBlended) {
 TEST_F(Tiles, OneZipHoldsTheSameFiles) {
   WritePNG(At("a.png"), Noise(100, 90, 3));
   Do({"tiles", "a.png", "--tile", "64", "-o", "p"});
-  Do({"tiles", "a.png", "--tile", "64", "-o", "p.szi"});
-  archive* zip = archive_read_new();
-  archive_read_support_format_zip(zip);
-  ASSERT_EQ(archive_read_open_filename(zip, At("p.szi").c_str(), 1 << 16), ARCHIVE_OK);
-  std::size_t files = 0;
-  for (archive_entry* entry; archive_read_next_header(zip, &entry) == ARCHIVE_OK; ++files) {
-    Bytes bytes(std::size_t(archive_entry_size(entry)));
-    EXPECT_EQ(archive_read_data(zip, bytes.data(), bytes.size()), la_ssize_t(bytes.size()));
-    EXPECT_EQ(bytes, ReadBytes(At(archive_entry_pathname(entry)))) << archive_entry_pathname(entry);
+  // In a SZI all stands in a folder, and one file more.
+  for (const auto& [name, folder, more] : {std::tuple{"p.zip", "", 0U}, {"p.szi", "p/", 1U}}) {
+    Do({"tiles", "a.png", "--tile", "64", "-o", name});
+    archive* zip = archive_read_new();
+    archive_read_support_format_zip(zip);
+    ASSERT_EQ(archive_read_open_filename(zip, At(name).c_str(), 1 << 16), ARCHIVE_OK);
+    std::size_t files = 0;
+    for (archive_entry* entry; archive_read_next_header(zip, &entry) == ARCHIVE_OK; ++files) {
+      Bytes bytes(std::size_t(archive_entry_size(entry)));
+      EXPECT_EQ(archive_read_data(zip, bytes.data(), bytes.size()), la_ssize_t(bytes.size()));
+      std::string path = archive_entry_pathname(entry);
+      ASSERT_TRUE(path.starts_with(folder)) << path;
+      path.erase(0, std::strlen(folder));
+      if (path == "scan-properties.xml")
+        EXPECT_THAT(std::string(bytes.begin(), bytes.end()),
+                    testing::ContainsRegex("ImageWidth</name>[^0-9]*100<.*ImageHeight</name>[^0-9]*90<"));
+      else
+        EXPECT_EQ(bytes, ReadBytes(At(path))) << path;
+    }
+    EXPECT_STREQ(archive_format_name(zip), "ZIP 1.0 (uncompressed)");
+    archive_read_free(zip);
+    EXPECT_EQ(files, FilesBelow("p_files").size() + 1 + more);
   }
-  EXPECT_STREQ(archive_format_name(zip), "ZIP 1.0 (uncompressed)");
-  archive_read_free(zip);
-  EXPECT_EQ(files, FilesBelow("p_files").size() + 1);
 }
 
 TEST_F(Tiles, AreThereWhenTheyAreCompleteAndCanBeGoneOnWith) {
