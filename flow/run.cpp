@@ -78,7 +78,7 @@ class Stream {
     const int turned = streams && IsLarge() ? work.Turns().value_or(1) : 1;
     if (kind == Kind::Whole && turned > 2) {
       FlushBands();
-      Turn(turned);
+      if (BytesOf(result) > Options.Stores.MemoryLimit || !AppliedToStanding(work)) Turn(turned);
     } else if (kind != Kind::Bands || !JoinsBands(work)) {
       FlushBands();
       // To one processor rows that arrive while it works only save memory.
@@ -128,6 +128,16 @@ class Stream {
   bool IsTooLarge(const Shape& result) const {
     const std::int64_t row = (BytesOf({Of.Width, 1, Of.Of, {}}) + 63) / 64 * 64;
     return row * Of.Height > MostArriving || BytesOf(result) > Options.Stores.MemoryLimit;
+  }
+
+  /// Where the source stands in memory it is worked on as it is.
+  bool AppliedToStanding(const Operation& work) {
+    if (!Standing) return false;
+    Report.Begin("working");
+    Whole = work.Apply(std::move(Standing), {.Stores = Options.Stores, .Threads = ThreadsOf(Options)});
+    Standing = Picture();
+    Coming.reset();
+    return true;
   }
 
   /// All rows are read, and come as those of the upright picture.
@@ -188,12 +198,7 @@ class Stream {
 
   /// The work goes on while the rows arrive. This thread reports.
   void ApplyInOrder(const Operation& work) {
-    if (Standing) {
-      Report.Begin("working");
-      Whole = work.Apply(std::move(Standing), {.Stores = Options.Stores, .Threads = ThreadsOf(Options)});
-      Coming.reset();
-      return;
-    }
+    if (AppliedToStanding(work)) return;
     const int threads = Coming->Anywhere ? ThreadsOf(Options) : 1;
     ArrivingPicture source(*Coming, threads);
     std::exception_ptr failed;
