@@ -7,6 +7,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <utility>
 
 #include "failure.h"
 #include "input.h"
@@ -46,6 +47,7 @@ void OutputBytes::Commit() {
   const Input written = Input::Descriptor(File, Name);
   Result.resize(std::size_t(written.Size()));
   written.ReadAt(0, Result);
+  close(std::exchange(File, -1));
 }
 
 }

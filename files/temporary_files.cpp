@@ -58,22 +58,6 @@ void DieOfFullDisk(int) {
 }
 
 constexpr char OpenFiles[] = "/proc/self/fd/";
-
-/// No signal comes between making a file and naming it.
-class SignalsHeldBack {
- public:
-  SignalsHeldBack() {
-    sigset_t all;
-    sigfillset(&all);
-    pthread_sigmask(SIG_BLOCK, &all, &Before);
-  }
-  SignalsHeldBack(const SignalsHeldBack&) = delete;
-  ~SignalsHeldBack() { pthread_sigmask(SIG_SETMASK, &Before, nullptr); }
-
- private:
-  sigset_t Before;
-};
-
 }
 
 void CatchSignals(int exitCode) {
@@ -131,20 +115,18 @@ OutputFile::OutputFile(const std::filesystem::path& target) : Output(target), Re
   if (there && S_ISDIR(about.st_mode)) throw Failure(target, "a directory");
   if (there && !S_ISREG(about.st_mode)) throw Failure(target, "not a regular file");
   if (there && access(Real.c_str(), W_OK) != 0) throw Failure(target, std::strerror(errno));
-  const mode_t mask = umask(0);
-  umask(mask);
   const std::filesystem::path directory = Real.has_parent_path() ? Real.parent_path() : ".";
   // Not every file system has files without a name, and there is one way only to name them later.
-  if (access(OpenFiles, X_OK) == 0) File = open(directory.c_str(), O_TMPFILE | O_RDWR | O_CLOEXEC, 0600);
+  if (access(OpenFiles, X_OK) == 0) File = open(directory.c_str(), O_TMPFILE | O_RDWR | O_CLOEXEC, 0666);
   if (File < 0) {
     const SignalsHeldBack held;
-    std::string name = TemporaryName();
-    File = mkostemp(name.data(), O_CLOEXEC);
+    const std::string name = FreeName();
+    File = open(name.c_str(), O_CREAT | O_EXCL | O_RDWR | O_CLOEXEC, 0666);
     if (File < 0) throw Failure(target, std::strerror(errno));
     Temporary = name;
     RemoveOnDeath(Temporary);
   }
-  if (fchmod(File, there ? about.st_mode & 07777 : 0666 & ~mask) != 0) {
+  if (there && fchmod(File, about.st_mode & 07777) != 0) {
     // A file system without permissions has none to set.
   }
 }
@@ -155,20 +137,21 @@ OutputFile::~OutputFile() {
   KeepOnDeath(Temporary);
 }
 
-std::string OutputFile::TemporaryName() const {
-  // Short, since a name may be as long as the system allows already.
-  return (Real.parent_path() / ".picturezor-XXXXXX").string();
-}
-
-void OutputFile::GetName() {
-  std::string name = TemporaryName();
-  const std::string file = OpenFiles + std::to_string(File);
-  const SignalsHeldBack held;
-  // The name of a file that is made and goes away again is free.
+std::string OutputFile::FreeName() const {
+  // Short, since a name may be as long as the system allows already. That of a file that is made and goes
+  // away again is free.
+  std::string name = (Real.parent_path() / ".picturezor-XXXXXX").string();
   const int place = mkostemp(name.data(), O_CLOEXEC);
   if (place < 0) throw Failure(Name, std::strerror(errno));
   close(place);
   unlink(name.c_str());
+  return name;
+}
+
+void OutputFile::GetName() {
+  const std::string file = OpenFiles + std::to_string(File);
+  const SignalsHeldBack held;
+  const std::string name = FreeName();
   if (linkat(AT_FDCWD, file.c_str(), AT_FDCWD, name.c_str(), AT_SYMLINK_FOLLOW) != 0)
     throw Failure(Name, std::strerror(errno));
   Temporary = name;

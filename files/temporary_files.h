@@ -1,4 +1,5 @@
 #pragma once
+#include <csignal>
 #include <cstdint>
 #include <filesystem>
 #include <span>
@@ -14,6 +15,21 @@ void CatchSignals(int exitCode);
 void RemoveOnDeath(const std::filesystem::path& file, bool directory = false);
 void KeepOnDeath(const std::filesystem::path& file);
 
+/// No signal ends the program while there is one.
+class SignalsHeldBack {
+ public:
+  SignalsHeldBack() {
+    sigset_t all;
+    sigfillset(&all);
+    pthread_sigmask(SIG_BLOCK, &all, &Before);
+  }
+  SignalsHeldBack(const SignalsHeldBack&) = delete;
+  ~SignalsHeldBack() { pthread_sigmask(SIG_SETMASK, &Before, nullptr); }
+
+ private:
+  sigset_t Before;
+};
+
 /// $TMPDIR, or /var/tmp, which lies on a disk where /tmp may lie in memory.
 std::filesystem::path DefaultTempDirectory();
 
@@ -28,7 +44,7 @@ class OutputFile final : public Output {
   void Commit() override;
 
  private:
-  std::string TemporaryName() const;
+  std::string FreeName() const;
   void GetName();
 
   std::filesystem::path Real, Temporary;

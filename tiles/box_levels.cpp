@@ -231,6 +231,7 @@ void BoxLevels::Add(const Part& part,
     const std::size_t samples = std::size_t(level.Width) * std::size_t(Channels);
     for (std::size_t i = 0; i < of.Head.size(); ++i) level.Open[i] += of.Head[i];
     if (of.HeadEnds) {
+      if (level.NextRow >= level.Height) throw files::Failure("there are too many sums of rows");
       Bytes planes(samples), row(samples);
       Divide(level.Open.data(), std::ptrdiff_t(samples), level.Rows[std::size_t(level.NextRow)].Count,
              planes.data());

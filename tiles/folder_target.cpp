@@ -1,6 +1,9 @@
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
 #include <cstring>
 #include <fstream>
@@ -45,10 +48,7 @@ void Rename(const path& from, const path& to) {
 }
 
 UnfinishedFolder::UnfinishedFolder(const path& parent, const std::string& name)
-    : Parent(parent),
-      Unfinished(parent / (name + ".unfinished")),
-      JournalName(Unfinished / "journal"),
-      Name(name) {
+    : Parent(parent), Unfinished(parent / (name + ".unfinished")), Name(name) {
   for (const char* ending : {"", "_files", ".dzi", ".html"}) RequireFree(Parent / (Name + ending));
 }
 
@@ -60,17 +60,23 @@ void UnfinishedFolder::RequireFree(const path& file) const {
 
 void UnfinishedFolder::Commit() {
   // What says that there is a pyramid comes last.
-  for (const char* ending : {"", "_files", ".html", ".dzi"}) {
-    const path file = Unfinished / (Name + ending);
-    if (!std::filesystem::exists(file)) continue;
-    RequireFree(Parent / (Name + ending));
-    Rename(file, Parent / (Name + ending));
-  }
-  std::filesystem::remove_all(Unfinished);
+  constexpr std::array endings{"", "_files", ".html", ".dzi"};
+  for (const char* ending : endings) RequireFree(Parent / (Name + ending));
+  const files::SignalsHeldBack held;
+  // What is half moved isn't gone on with: its tiles would be missing.
+  for (const auto& entry : std::filesystem::directory_iterator(Unfinished))
+    if (std::ranges::none_of(endings,
+                             [&](const char* ending) { return entry.path().filename() == Name + ending; }))
+      std::filesystem::remove(entry.path());
+  for (const char* ending : endings)
+    if (const path file = Unfinished / (Name + ending); std::filesystem::exists(file))
+      Rename(file, Parent / (Name + ending));
+  std::error_code failed;
+  std::filesystem::remove_all(Unfinished, failed);
 }
 
 FolderTarget::FolderTarget(const path& parent, const std::string& name, const std::string& task, bool resume)
-    : UnfinishedFolder(parent, name) {
+    : UnfinishedFolder(parent, name), JournalName(Unfinished / "journal") {
   bool goesOn = false;
   if (std::ifstream journal(JournalName); resume && journal) {
     std::string before;
@@ -98,8 +104,6 @@ std::unique_ptr<files::Output> FolderTarget::Begin(const std::string& name) cons
   return std::make_unique<PlainFile>(Unfinished / name, O_WRONLY | O_TRUNC);
 }
 
-void FolderTarget::Add(files::Output& file) { file.Commit(); }
-
 void FolderTarget::AddRow(int level, std::int32_t row) {
   const std::string line = std::to_string(level) + " " + std::to_string(row) + "\n";
   files::WriteAll(Journal->Descriptor(), {reinterpret_cast<const std::uint8_t*>(line.data()), line.size()},
@@ -114,35 +118,38 @@ void FolderTarget::Commit() {
 SharedFolderTarget::SharedFolderTarget(const path& parent, const std::string& name, const std::string& task,
                                        bool begins)
     : UnfinishedFolder(parent, name) {
-  if (!begins && !std::filesystem::exists(JournalName)) throw Failure(Unfinished, "no part is made yet");
+  // Not the name that a single run's journal has, which a run without parts would begin anew.
+  const path taskName = Unfinished / "task";
+  if (!begins && !std::filesystem::exists(taskName)) throw Failure(Unfinished, "no part is made yet");
   std::error_code failed;
   std::filesystem::create_directories(Unfinished, failed);
   if (failed) throw Failure(Unfinished, failed.message());
-  if (!std::filesystem::exists(JournalName)) {
-    // Another run may be just here, and write the same.
+  if (!std::filesystem::exists(taskName)) {
     for (const auto& entry : std::filesystem::directory_iterator(Unfinished))
-      if (!entry.path().filename().string().starts_with(".picturezor-") && entry.path() != JournalName)
+      // Another run may be just here, and write the same.
+      if (!entry.path().filename().string().starts_with(".picturezor-") && !std::filesystem::exists(taskName))
         throw Failure(Unfinished, "something else is there");
-    files::OutputFile journal(JournalName);
+    files::OutputFile file(taskName);
     const std::string line = task + "\n";
-    files::WriteAll(journal.Descriptor(), {reinterpret_cast<const std::uint8_t*>(line.data()), line.size()},
-                    JournalName);
-    journal.Commit();
+    files::WriteAll(file.Descriptor(), {reinterpret_cast<const std::uint8_t*>(line.data()), line.size()},
+                    taskName);
+    file.Commit();
   }
-  std::ifstream journal(JournalName);
+  std::ifstream file(taskName);
   std::string before;
-  if (!std::getline(journal, before) || before != task)
+  if (!std::getline(file, before) || before != task)
     throw Failure(Unfinished,
                   "the unfinished pyramid of another image, or with other options; remove it first");
 }
 
 std::unique_ptr<files::Output> SharedFolderTarget::Begin(const std::string& name) const {
-  const path file = Unfinished / name;
-  std::error_code failed;
-  if (!std::filesystem::exists(Unfinished)) throw Failure(Unfinished, "it is gone");
-  std::filesystem::create_directories(file.parent_path(), failed);
-  if (failed) throw Failure(file.parent_path(), failed.message());
-  return std::make_unique<files::OutputFile>(file);
+  // Not the folder itself, which is gone once somebody has completed the pyramid.
+  path folder = Unfinished;
+  for (const path& part : path(name).parent_path()) {
+    folder /= part;
+    if (mkdir(folder.c_str(), 0777) != 0 && errno != EEXIST) throw Failure(folder, std::strerror(errno));
+  }
+  return std::make_unique<files::OutputFile>(Unfinished / name);
 }
 
 }

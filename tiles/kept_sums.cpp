@@ -9,7 +9,8 @@ namespace {
 using files::Failure;
 
 /// Rows of a level that a part holds, at most; to know a damaged file before memory is taken for it.
-constexpr std::size_t MostRows = 1 << 16;
+constexpr std::size_t MostRows = 64;
+constexpr const char* Damaged = "the file is damaged; remove it, and make that part again";
 
 void Append(Bytes& bytes, std::uint32_t number) {
   for (int shift = 0; shift < 32; shift += 8) bytes.push_back(std::uint8_t(number >> shift));
@@ -53,7 +54,7 @@ SumsReader::SumsReader(const std::filesystem::path& file, const std::string& tas
 void SumsReader::Read(Bytes& bytes, std::size_t count) {
   bytes.resize(count);
   if (!Stream.read(reinterpret_cast<char*>(bytes.data()), std::streamsize(count)))
-    throw Failure(Name, "the file is damaged");
+    throw Failure(Name, Damaged);
 }
 
 std::size_t SumsReader::Number() {
@@ -64,7 +65,7 @@ std::size_t SumsReader::Number() {
 
 std::vector<std::uint32_t> SumsReader::Sums(std::size_t samples) {
   const std::size_t count = Number();
-  if (count != 0 && count != samples) throw Failure(Name, "the file is damaged");
+  if (count != 0 && count != samples) throw Failure(Name, Damaged);
   Bytes bytes;
   Read(bytes, count * sizeof(std::uint32_t));
   std::vector<std::uint32_t> sums(count);
@@ -79,7 +80,7 @@ std::optional<BoxLevels::Part> SumsReader::Next(int first, std::span<const std::
     BoxLevels::LevelPart& level = part[k];
     level.HeadEnds = Number() != 0;
     const std::size_t bytes = Number();
-    if (bytes % samples[k] != 0 || bytes / samples[k] > MostRows) throw Failure(Name, "the file is damaged");
+    if (bytes % samples[k] != 0 || bytes / samples[k] > MostRows) throw Failure(Name, Damaged);
     Read(level.Whole, bytes);
     level.Head = Sums(samples[k]);
     level.Tail = Sums(samples[k]);

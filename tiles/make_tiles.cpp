@@ -60,8 +60,6 @@ class Maker {
         Threads(options.Running.Threads > 0 ? options.Running.Threads : flow::Processors()),
         Jobs(Threads, [](Job& job, int thread) { job.Work(thread); }) {
     Writing.Threads = 1;
-    files::RequireStorableSize(name + Ending, type, options.Tile + 2 * options.Overlap,
-                               options.Tile + 2 * options.Overlap);
     for (int level = 0; level < Grids.LevelCount(); ++level) {
       const auto& [first, end] = Own.Levels[std::size_t(level)];
       Levels.push_back(std::make_unique<TileRows>(Grids, level, files::ChannelsOf(shape.Of), first, end));
@@ -79,6 +77,7 @@ class Maker {
   void MakeAll(flow::Rows& rows, files::Progress& progress, SumsWriter* keeper) {
     BoxLevels boxes(Grids.Level(0), files::ChannelsOf(LevelFormat), Smaller);
     boxes.BeginAt(Own.First);
+    const WaitForJobs waiting{Jobs};
     std::vector<decltype(boxes.MakeScratch())> scratch;
     for (int i = 0; i < Threads; ++i) scratch.push_back(boxes.MakeScratch());
     const auto finish = [this, &boxes, keeper](BoxLevels::Part& part, bool own) {
@@ -114,6 +113,11 @@ class Maker {
   /// The levels that all parts have left.
   void Join(const SharedFolderTarget& from, const std::string& task, files::Progress& progress) {
     BoxLevels boxes(Grids.Level(0), files::ChannelsOf(LevelFormat), Smaller);
+    boxes.BeginAt(0);
+    const WaitForJobs waiting{Jobs};
+    for (std::int32_t number = 1; number <= Options.Parts; ++number)
+      if (!HasSums(from.PartName(number), task))
+        throw Failure(from.PartName(number), "this part isn't made yet");
     progress.Begin("joining parts", Options.Parts);
     for (std::int32_t number = 1; number <= Options.Parts; ++number, progress.Step()) {
       SumsReader sums(from.PartName(number), task);
@@ -123,9 +127,17 @@ class Maker {
       }
     }
     while (Jobs.Size() > 0) Finish();
+    if (!std::ranges::all_of(Levels, [](const auto& level) { return level->Done(); }))
+      throw Failure(from.PartName(Options.Parts), "parts are damaged; remove them, and make them again");
   }
 
  private:
+  /// Jobs know of what stands beside this, and are dropped before it goes away.
+  struct WaitForJobs {
+    files::Conveyor<Job>& Of;
+    ~WaitForJobs() { Of.Clear(); }
+  };
+
   void AddTo(BoxLevels& boxes, const BoxLevels::Part& part) {
     boxes.Add(part, [this](int level, std::int32_t y, const std::uint8_t* row) {
       TileRows& into = *Levels[std::size_t(level) + 1];
@@ -155,7 +167,10 @@ class Maker {
       flow::ReadRows(rows, band->Row(y), std::ptrdiff_t(rowBytes), count);
       // No longer held here, since who is done with a band gives it back by that.
       onRows(std::move(band), y, count);
-      if (forTiles) Gathered(level, count);
+      if (forTiles)
+        Gathered(level, count);
+      else
+        while (Jobs.Size() > JobsAhead * std::size_t(Threads)) Finish();
       progress.Step(count);
     }
     while (Jobs.Size() > 0) Finish();
@@ -233,6 +248,8 @@ class Maker {
       }
     }
     writer->Finish();
+    // Here, since an open file is one of few.
+    file->Commit();
     return file;
   }
 
@@ -259,8 +276,12 @@ bool EndsWith(const path& target, const char* ending) { return target.extension(
 /// What the journal of an unfinished folder is compared with.
 std::string TaskOf(const path& source, const flow::Shape& shape, const TilesOptions& options) {
   std::error_code failed;
-  const path whole = std::filesystem::absolute(source, failed);
-  const auto changed = std::filesystem::last_write_time(source, failed).time_since_epoch().count();
+  // Without the number of a page.
+  path file = source;
+  if (const std::string name = source.string(); !std::filesystem::exists(file, failed) && name.ends_with(']'))
+    file = name.substr(0, name.rfind('['));
+  const path whole = std::filesystem::weakly_canonical(file, failed);
+  const auto changed = std::filesystem::last_write_time(file, failed).time_since_epoch().count();
   std::string task;
   for (const std::int64_t number :
        {std::int64_t(changed), std::int64_t(shape.Width), std::int64_t(shape.Height), std::int64_t(shape.Of),
@@ -269,7 +290,8 @@ std::string TaskOf(const path& source, const flow::Shape& shape, const TilesOpti
         std::int64_t(options.UseLevels),
         std::int64_t(options.Background.Red << 16 | options.Background.Green << 8 | options.Background.Blue)})
     task += std::to_string(number) + " ";
-  task += options.Type + " " + options.Kernel + " " + whole.string();
+  task += std::string(files::TypeByName(options.Type).Name) + " " + options.Kernel + " " + whole.string() +
+          source.string().substr(file.string().size());
   std::ranges::replace(task, '\n', ' ');
   return task;
 }
@@ -284,20 +306,18 @@ std::unique_ptr<flow::Rows> WholeRows(flow::OpenFile file, const TilesOptions& o
 /// Whether the file is read once more for each level.
 bool ReadsAgain(const TilesOptions& options) { return options.UseLevels || options.Kernel != "box"; }
 
-void MakeLevels(Maker& maker, const Grid& grid, flow::OpenFile file, const path& source,
-                const TilesOptions& options, files::Progress& progress) {
+void MakeLevels(Maker& maker, const Grid& grid, flow::OpenFile file, const TilesOptions& options,
+                files::Progress& progress) {
   const auto again = file.Again;
   const std::unique_ptr<flow::Rows> rows = WholeRows(std::move(file), options, progress);
   if (!ReadsAgain(options)) return maker.MakeAll(*rows, progress, nullptr);
-  if (!again)
-    throw Failure(source, "all levels are made at once of what can't be read again, by the kernel box");
   maker.MakeOne(0, *rows, progress);
   for (int level = 1; level < grid.LevelCount(); ++level) {
     const files::Extent size = grid.Level(level);
     const auto open = [&] {
       auto reader = again();
       const bool upright = reader->Info().Orientation <= 4;
-      if (options.UseLevels)
+      if (options.UseLevels && !reader->Info().Levels.empty())
         reader->Reduce(upright ? size.Width : size.Height, upright ? size.Height : size.Width);
       return reader;
     };
@@ -332,13 +352,14 @@ std::string SlideProperties(const flow::Shape& shape) {
 
 void RequireDivisible(const Grid& grid, const path& source, int orientation, bool zip,
                       const TilesOptions& options) {
-  if (zip) throw files::UsageFailure("--part: only a folder can be made by parts");
+  const std::string option = options.Part > 0 ? "--part: " : "--join: ";
+  if (zip) throw files::UsageFailure(option + "only a folder can be made by parts");
   if (options.Resume) throw files::UsageFailure("--resume: parts go on by themselves");
   if (ReadsAgain(options))
-    throw files::UsageFailure("--part: parts are made of the picture itself, by the kernel box");
+    throw files::UsageFailure(option + "parts are made of the picture itself, by the kernel box");
   if (orientation > 2) throw Failure(source, "it isn't stored upright, so it can't be made by parts");
   if (options.Parts > grid.Down(0))
-    throw files::UsageFailure("--part: there are only " + std::to_string(grid.Down(0)) +
+    throw files::UsageFailure(option + "there are only " + std::to_string(grid.Down(0)) +
                               " rows of tiles to divide");
 }
 
@@ -356,6 +377,18 @@ void MakeTiles(flow::OpenFile file, const path& source, const path& named, const
   if (options.How != Layout::DeepZoom && options.Overlap > 0)
     throw files::UsageFailure("--overlap: only the layout deepzoom has that");
   if (zip && options.Resume) throw files::UsageFailure("--resume: only a folder can be gone on with");
+  if (slide && options.How != Layout::DeepZoom)
+    throw files::UsageFailure(target, "a SZI holds the layout deepzoom");
+  if (!file.Again && (ReadsAgain(options) || options.Resume || options.Parts > 0))
+    throw files::UsageFailure(
+        source,
+        "standard input comes once: with --part, --join, --resume, --use-levels and other "
+        "kernels than box the image is read again");
+  if (options.Page) OpenSeadragonFolder();
+  const std::string tile = name + std::string(type.Extensions.front());
+  files::StorableFormat(tile, type, shape.Of);
+  files::RequireStorableSize(tile, type, options.Tile + 2 * options.Overlap,
+                             options.Tile + 2 * options.Overlap);
   const Grid grid({shape.Width, shape.Height}, options.How, options.Tile, options.Overlap);
   const bool divided = options.Parts > 0;
   if (divided) RequireDivisible(grid, source, file.Reader->Info().Orientation, zip, options);
@@ -386,7 +419,7 @@ void MakeTiles(flow::OpenFile file, const path& source, const path& named, const
   if (joins)
     maker.Join(*shared, task, progress);
   else
-    MakeLevels(maker, grid, std::move(file), source, options, progress);
+    MakeLevels(maker, grid, std::move(file), options, progress);
   const std::string id =
       (options.Address.empty() ? std::string("http://localhost") : options.Address) + "/" + name;
   WriteText(*into, grid.DescriptionName(name), grid.Description(maker.TileEnding(), id));

@@ -56,6 +56,19 @@ void CopyFile(TileTarget& target, const path& from, const std::string& to) {
 
 }
 
+std::string PyramidForPage(const Grid& grid, const std::string& base, const std::string& ending,
+                           const std::optional<files::Resolution>& density) {
+  constexpr const char* names[] = {"deepzoom", "iiif", "xyz"};
+  char perMetre[32];
+  std::snprintf(perMetre, sizeof perMetre, "%.9g", density ? density->X * InchesOfMetre : 0);
+  return std::string("{\"layout\": \"") + names[int(grid.Of())] +
+         "\", \"width\": " + std::to_string(grid.Level(0).Width) +
+         ", \"height\": " + std::to_string(grid.Level(0).Height) +
+         ", \"tile\": " + std::to_string(grid.Tile()) + ", \"overlap\": " + std::to_string(grid.Overlap()) +
+         ", \"levels\": " + std::to_string(grid.LevelCount()) + ", \"format\": \"" + ending.substr(1) +
+         "\", \"base\": \"" + QuotedForJSON(base) + "\", \"perMetre\": " + perMetre + "}";
+}
+
 path OpenSeadragonFolder() {
   std::error_code failed;
   std::vector<path> places;
@@ -71,23 +84,11 @@ path OpenSeadragonFolder() {
       "PICTUREZOR_OPENSEADRAGON names its folder");
 }
 
-std::string PyramidForPage(const Grid& grid, const std::string& base, const std::string& ending,
-                           const std::optional<files::Resolution>& density) {
-  constexpr const char* names[] = {"deepzoom", "iiif", "xyz"};
-  char perMetre[32];
-  std::snprintf(perMetre, sizeof perMetre, "%.9g", density ? density->X * InchesOfMetre : 0);
-  return std::string("{\"layout\": \"") + names[int(grid.Of())] +
-         "\", \"width\": " + std::to_string(grid.Level(0).Width) +
-         ", \"height\": " + std::to_string(grid.Level(0).Height) +
-         ", \"tile\": " + std::to_string(grid.Tile()) + ", \"overlap\": " + std::to_string(grid.Overlap()) +
-         ", \"levels\": " + std::to_string(grid.LevelCount()) + ", \"format\": \"" + ending.substr(1) +
-         "\", \"base\": \"" + QuotedForJSON(base) + "\", \"perMetre\": " + perMetre + "}";
-}
-
 void WriteText(TileTarget& target, const std::string& name, std::string_view text) {
   const auto file = target.Begin(name);
   files::WriteAll(file->Descriptor(), {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()},
                   file->Target());
+  file->Commit();
   target.Add(*file);
 }
 

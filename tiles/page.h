@@ -23,6 +23,8 @@ void WritePage(TileTarget& target, const Grid& grid, const std::string& name, co
                const std::optional<files::Resolution>& density);
 
 /// Writes a file of a pyramid.
+/// Where OpenSeadragon is. Throws files::Failure where it isn't.
+std::filesystem::path OpenSeadragonFolder();
 void WriteText(TileTarget& target, const std::string& name, std::string_view text);
 
 }

@@ -16,8 +16,8 @@ class TileTarget {
   /// A file to write, by its name below the place where the pyramid is to stand. Several threads may begin
   /// files at once.
   virtual std::unique_ptr<files::Output> Begin(const std::string& name) const = 0;
-  /// The file is written. Called from one thread.
-  virtual void Add(files::Output& file) = 0;
+  /// The file is written and committed. Called from one thread.
+  virtual void Add(files::Output& /*file*/) {}
   /// All files of a row of a level's tiles have been added; and whether they had been, in an earlier run.
   virtual void AddRow(int /*level*/, std::int32_t /*row*/) {}
   virtual bool HasRow(int /*level*/, std::int32_t /*row*/) const { return false; }
@@ -36,7 +36,7 @@ class UnfinishedFolder : public TileTarget {
   UnfinishedFolder(const std::filesystem::path& parent, const std::string& name);
   void RequireFree(const std::filesystem::path& file) const;
 
-  const std::filesystem::path Parent, Unfinished, JournalName;
+  const std::filesystem::path Parent, Unfinished;
   const std::string Name;
 };
 
@@ -48,12 +48,12 @@ class FolderTarget final : public UnfinishedFolder {
   FolderTarget(const std::filesystem::path& parent, const std::string& name, const std::string& task,
                bool resume);
   std::unique_ptr<files::Output> Begin(const std::string& name) const override;
-  void Add(files::Output& file) override;
   void AddRow(int level, std::int32_t row) override;
   bool HasRow(int level, std::int32_t row) const override { return Rows.contains({level, row}); }
   void Commit() override;
 
  private:
+  const std::filesystem::path JournalName;
   std::unique_ptr<files::Output> Journal;
   std::set<std::pair<int, std::int32_t>> Rows;
 };
@@ -66,7 +66,6 @@ class SharedFolderTarget final : public UnfinishedFolder {
   SharedFolderTarget(const std::filesystem::path& parent, const std::string& name, const std::string& task,
                      bool begins);
   std::unique_ptr<files::Output> Begin(const std::string& name) const override;
-  void Add(files::Output& file) override { file.Commit(); }
   /// What a part, counted from 1, keeps for who joins them.
   std::filesystem::path PartName(std::int32_t part) const {
     return Unfinished / ("part-" + std::to_string(part));

@@ -39,7 +39,6 @@ std::unique_ptr<files::Output> ZipTarget::Begin(const std::string& name) const {
 }
 
 void ZipTarget::Add(files::Output& file) {
-  file.Commit();
   const Bytes& bytes = static_cast<files::OutputBytes&>(file).Result;
   const std::unique_ptr<archive_entry, FreeEntry> entry(archive_entry_new());
   archive_entry_set_pathname(entry.get(), file.Target().c_str());

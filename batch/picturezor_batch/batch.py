@@ -132,6 +132,8 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
         count = book.count("to do")
 
         def answered(row, result, message, seconds, pixels, machine):
+            if result == "aside":
+                message += ", so it is set aside"
             book.write(row, recipe.hash, result, message, seconds, pixels, machine)
             if result == "done":
                 outcome.done += 1
@@ -151,7 +153,7 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
                 job = {"steps": recipe.text, "writing": recipe.writing, "directory": os.getcwd(),
                        "temp_dir": temp_dir, "memory_limit": memory_limit,
                        "command": "picturezor" if client and not command else where,
-                       "threads": None if client else max(1, len(os.sched_getaffinity(0)) // workers)}
+                       "threads": None if client else min(32, max(1, len(os.sched_getaffinity(0)) // workers))}
                 groups = _Groups(book.to_do(), book.weight() + count * _EVERY_PICTURE, task_seconds)
                 with workers_of(client, min(workers, count)) as (engine, own):
                     Work(engine, groups, worker.make_group, job, lambda row: row[:2], answered, stop, own).do()

@@ -69,6 +69,10 @@ def _add_engine(parser):
                         "same files under the same names")
     parser.add_argument("--workers", metavar="N", type=_positive(int),
                         help="processes on this machine, by default one a processor")
+    parser.add_argument("--memory-limit", metavar="SIZE", type=_size,
+                        help="memory of a worker, divided among its pictures at work, as 256M or 2G; by default what "
+                        "the worker was started with")
+    parser.add_argument("--temp-dir", metavar="DIR", help="directory of temporary files on each machine")
     parser.add_argument("--command", metavar="NAME", help="the command picturezor on all machines")
     parser.add_argument("-q", "--quiet", action="store_true", help="no progress bar and no summary")
 
@@ -108,10 +112,6 @@ def _parser():
     parser.add_argument("--redo", action="store_true", help="make results of another recipe again")
     parser.add_argument("--fail-fast", action="store_true", help="stop at the first input that fails")
     parser.add_argument("--report", metavar="FILE", help="write a page with small pictures and the failures")
-    parser.add_argument("--memory-limit", metavar="SIZE", type=_size,
-                        help="memory of a worker, divided among its pictures at work, as 256M or 2G; by default what "
-                        "the worker was started with")
-    parser.add_argument("--temp-dir", metavar="DIR", help="directory of temporary files on each machine")
     parser.add_argument("--task-seconds", metavar="S", type=_positive(float), default=2.0,
                         help="how long a worker takes for a group of pictures, about; 2 by default")
     writing = parser.add_argument_group("how images are written, as in picturezor run")
@@ -190,7 +190,8 @@ def _tiles_summary(report):
 
 def _make_tiles(options, client, progress, stop):
     return tiles(options.source, options.output, client, tile=options.tile, parts=options.parts,
-                 options=_words(options, *_TILES_VALUES, *_TILES_FLAGS), command=options.command,
+                 options=_words(options, *_TILES_VALUES, *_TILES_FLAGS), memory_limit=options.memory_limit,
+                 temp_dir=options.temp_dir, command=options.command,
                  workers=options.workers, progress=progress, stop=stop)
 
 

@@ -9,9 +9,12 @@ import time
 
 from . import worker
 from .batch import Report
-from .failures import BatchFailure
+from .failures import BatchFailure, UsageFailure
 from .names import absolute
 from .work import Stopped, Work, workers_of
+
+# Behind what the command says of its options.
+_USAGE = " (see picturezor tiles --help)"
 
 
 class _OneByOne:
@@ -28,10 +31,15 @@ class _OneByOne:
 
 
 def _size_of(source, command):
-    done = subprocess.run([command, "info", source], stdin=subprocess.DEVNULL, capture_output=True)
-    size = re.search(rb"^size: +(\d+) x (\d+)", done.stdout, re.MULTILINE)
+    try:
+        done = subprocess.run([command, "info", source], stdin=subprocess.DEVNULL, capture_output=True)
+    except OSError as error:
+        raise BatchFailure(f"{command}: {error.strerror}") from None
+    # The name comes first, and may have lines of its own.
+    told = done.stdout.split(b"\n", source.count(b"\n") + 1)[-1]
+    size = re.search(rb"^size: +(\d+) x (\d+)", told, re.MULTILINE)
     if not size:
-        raise BatchFailure(os.fsdecode(done.stderr).strip().removeprefix("picturezor: "))
+        raise BatchFailure(worker.last_words(done.stderr, done.returncode))
     return int(size[1]), int(size[2])
 
 
@@ -43,8 +51,8 @@ def usual_parts(rows):
     return -(-rows // 2 ** halved)
 
 
-def tiles(source, output, client=None, *, options=(), tile=256, parts=None, command=None, workers=None, progress=None,
-          stop=None):
+def tiles(source, output, client=None, *, options=(), tile=256, parts=None, memory_limit=None, temp_dir=None,
+          command=None, workers=None, progress=None, stop=None):
     """Makes an image pyramid by parts, with the bytes that `picturezor tiles` makes alone. Gives a Report, whose `done`
     counts parts.
 
@@ -54,9 +62,10 @@ def tiles(source, output, client=None, *, options=(), tile=256, parts=None, comm
       this machine work, by default one a processor.
     options: of `picturezor tiles`, like ["--layout", "iiif", "--page"]; `tile` is the edge of a tile.
     parts: how many, 1 to the number of rows of tiles; by default so many that the work is even.
-    command, progress, stop: as for run.
+    memory_limit, temp_dir, command, progress, stop: as for run.
 
-    A run that was stopped is gone on with by the same call. Throws BatchFailure where a part can't be made.
+    A run that was stopped is gone on with by the same call. Throws UsageFailure for options that make no sense, and
+    BatchFailure where a part can't be made.
     """
     start = time.monotonic()
     where = shutil.which(command or "picturezor")
@@ -64,16 +73,24 @@ def tiles(source, output, client=None, *, options=(), tile=256, parts=None, comm
         raise BatchFailure(f"{command or 'picturezor'}: there is no such command")
     source, target = absolute(os.fsencode(source)), absolute(os.fsencode(output).rstrip(b"/"))
     width, height = _size_of(source, where)
+    try:
+        os.makedirs(os.path.dirname(target), exist_ok=True)
+    except OSError as error:
+        raise BatchFailure(f"{os.fsdecode(os.path.dirname(target))}: {error.strerror}") from None
     parts = parts or usual_parts(-(-height // tile))
     workers = min(workers or len(os.sched_getaffinity(0)), parts)
     job = {"source": source, "target": target, "directory": os.getcwd(), "parts": parts,
-           "options": ["--tile", str(tile), *options], "command": "picturezor" if client and not command else where,
-           "threads": None if client else max(1, len(os.sched_getaffinity(0)) // workers)}
+           "options": ["--tile", str(tile), *(one for one in options if one != "--page"),
+                       *(["--temp-dir", temp_dir] if temp_dir else [])],
+           "at the end": [one for one in options if one == "--page"], "memory_limit": memory_limit, "command": "picturezor" if client and not command else where,
+           "threads": None if client else min(32, max(1, len(os.sched_getaffinity(0)) // workers))}
     report = Report()
 
     def answered(number, _result, message, _seconds, _pixels, _machine):
+        if message.endswith(_USAGE):
+            raise UsageFailure(message.removesuffix(_USAGE))
         if message:
-            raise BatchFailure(message if number == 0 else f"part {number} of {parts}: {message}")
+            raise BatchFailure(f"part {number} of {parts}: {message}" if number else message)
         report.done += number > 0
         if progress:
             progress(number > 0, parts)
@@ -85,6 +102,7 @@ def tiles(source, output, client=None, *, options=(), tile=256, parts=None, comm
         report.pixels = width * height
     except Stopped as stopped:
         report.stopped = str(stopped)
-    report.unfinished = parts - report.done
+        # What joins them is left, if nothing else.
+        report.unfinished = max(1, parts - report.done)
     report.seconds = time.monotonic() - start
     return report

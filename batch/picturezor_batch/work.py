@@ -34,6 +34,7 @@ class Work:
         self._run = uuid.uuid4().hex[:8]
         self._numbers = itertools.count()
         self._in_work = {}  # Future: its rows
+        self._bound = {}  # Future: the addresses of workers to which it is bound, if it is
         self._again = collections.deque()  # Groups that a machine couldn't do
         self._suspects = collections.deque()  # Pictures whose group's workers died
         self._unfit = {}  # Address of a worker: what keeps it from working
@@ -56,7 +57,9 @@ class Work:
                     raise Stopped("interrupted")
                 ready = self._results.next_batch(block=False)
                 for future, result in ready:
-                    self._take(future, result)
+                    self._bound.pop(future, None)
+                    if future in self._in_work:
+                        self._take(future, result)
                 if not ready:
                     time.sleep(0.02)
         finally:
@@ -83,6 +86,7 @@ class Work:
         fit = {address: about for address, about in workers.items() if address not in self._unfit}
         if workers and not fit:
             raise Stopped("no machine is left to work on: " + next(iter(self._unfit.values())))
+        self._take_back(workers)
         hands = sum(about["nthreads"] for about in fit.values()) or 1
         # A suspect that is one indeed takes its worker along, and nothing else should be there then.
         most = max(1, len(fit) // 2) if self._alone else _AHEAD * hands
@@ -98,7 +102,18 @@ class Work:
                 self._task, self._job, [self._told(row) for row in group],
                 key=f"pictures-{self._run}-{next(self._numbers)}", pure=False, **where)
             self._in_work[future] = group
+            if where:
+                self._bound[future] = set(fit)
             self._results.add(future)
+
+    def _take_back(self, workers):
+        """Groups whose workers have all gone. Those that came back have other addresses, so the engine would wait."""
+        for future in [one for one, bound in self._bound.items() if not bound & workers.keys()]:
+            del self._bound[future]
+            group = self._in_work.pop(future, None)
+            if group:
+                (self._suspects.extend if self._alone else self._again.append)(group)
+                future.cancel()
 
     def _take(self, future, result):
         group = self._in_work.pop(future)
@@ -109,7 +124,7 @@ class Work:
             if type(error).__name__ != "KilledWorker":
                 raise BatchFailure(f"a worker can't do its work: {error!r}")
             if self._alone:
-                self._answered(group[0], "aside", "its workers died, so it is set aside", 0.0, 0, "")
+                self._answered(group[0], "aside", "its workers died", 0.0, 0, "")
             self._suspects.extend([] if self._alone else group)
         else:
             self._in_work[future] = group
@@ -157,4 +172,5 @@ def workers_of(client, count):
             own.wait_for_workers(count, timeout=20)
     finally:
         own.close()
-        cluster.close(timeout=5)
+        with contextlib.suppress(TimeoutError):
+            cluster.close(timeout=5)

@@ -10,7 +10,15 @@ import subprocess
 import time
 
 # The machine's fault and not the picture's: another machine may do it.
-MACHINE_FAULTS = ("No space left on device", "Disk quota exceeded", "Read-only file system", "no space left for")
+MACHINE_FAULTS = ("No space left on device", "Disk quota exceeded", "Read-only file system", "no space left for",
+                  "setpriv: failed to execute")
+# A source that the batch has seen itself isn't there, or can't be read.
+SOURCE_FAULTS = ("No such file or directory", "Stale file handle", "Input/output error")
+
+
+def _threads(hands):
+    """For each of so many commands at a time; no command takes more than 32."""
+    return min(32, max(1, len(os.sched_getaffinity(0)) // hands))
 
 
 def _guarded(command):
@@ -18,7 +26,7 @@ def _guarded(command):
     return (["setpriv", "--pdeathsig", "TERM"] if shutil.which("setpriv") else []) + command
 
 
-def _last_words(said, code):
+def last_words(said, code):
     """Why a command ended, out of what it wrote on standard error and its exit code."""
     lines = said.decode(errors="replace").strip().splitlines()
     if lines:
@@ -81,7 +89,7 @@ class _Command:
 
     def _last_words(self):
         code = self._process.wait()
-        return _last_words(os.pread(self._errors, 1 << 12, 0), code)
+        return last_words(os.pread(self._errors, 1 << 12, 0), code)
 
     def close(self):
         try:
@@ -122,7 +130,7 @@ def make_group(job, pairs):
     worker = get_worker()
     hands = worker.state.nthreads
     limit = job["memory_limit"] or worker.memory_manager.memory_limit
-    threads = job["threads"] or max(1, len(os.sched_getaffinity(0)) // hands)
+    threads = job["threads"] or _threads(hands)
     answers, fault, command, sent = [], "", None, 0
     try:
         for number, (source, target) in enumerate(pairs):
@@ -170,24 +178,35 @@ def make_parts(job, numbers):
     from distributed import get_worker
 
     worker = get_worker()
-    processors = len(os.sched_getaffinity(0))
+    hands = worker.state.nthreads
+    memory = job["memory_limit"] or worker.memory_manager.memory_limit
+    memory = ["--memory-limit", str(memory // hands)] if memory else []
     answers, fault = [], ""
     for number in numbers:
         start = time.perf_counter()
-        share = ["--part", f"{number}/{job['parts']}"] if number else ["--join", str(job["parts"])]
+        if number:
+            share = ["--part", f"{number}/{job['parts']}"]
+        else:
+            share = ["--join", str(job["parts"]), *job["at the end"]]
         # Nobody else is at work when all is put together.
-        threads = (job["threads"] or max(1, processors // worker.state.nthreads)) if number else processors
+        threads = (job["threads"] or _threads(hands)) if number else _threads(1)
         try:
             done = subprocess.run(
                 _guarded([job["command"], "tiles", job["source"], "-o", job["target"], "--quiet", "--threads",
-                          str(threads), *share, *job["options"]]),
+                          str(threads), *share, *memory, *job["options"]]),
                 stdin=subprocess.DEVNULL, stdout=subprocess.DEVNULL, stderr=subprocess.PIPE, cwd=job["directory"],
                 start_new_session=True, env={**os.environ, "LC_ALL": "C"})
         except OSError as error:
             fault = str(error)
             break
-        message = _last_words(done.stderr, done.returncode) if done.returncode else ""
-        fault = message and _machine_fault(message, job["source"], job["target"])
+        message = last_words(done.stderr, done.returncode) if done.returncode else ""
+        if number == 0 and "it is there already" in message and not os.path.exists(job["target"] + b".unfinished"):
+            # The worker that had completed it died before it could say so.
+            message = ""
+        if any(fault in message for fault in SOURCE_FAULTS):
+            fault = message
+        else:
+            fault = message and _machine_fault(message, job["source"], job["target"])
         if fault:
             break
         answers.append((message, time.perf_counter() - start, 0))

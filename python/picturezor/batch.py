@@ -1,5 +1,6 @@
-"""The same steps for many images, on this machine's processors or on a cluster: see run."""
+"""The same steps for many images (run), and one image pyramid by parts (tiles), on this machine's processors or on a
+cluster."""
 
-from picturezor_batch import BatchFailure, Failed, Report, UsageFailure, run
+from picturezor_batch import BatchFailure, Failed, Report, UsageFailure, run, tiles
 
-__all__ = ["run", "Report", "Failed", "BatchFailure", "UsageFailure"]
+__all__ = ["run", "tiles", "Report", "Failed", "BatchFailure", "UsageFailure"]

@@ -48,26 +48,30 @@ def test_interrupted_it_goes_on(batch, scan, by, code):
     process.send_signal(by)
     process.communicate(timeout=60)
     assert process.returncode == code and not (batch.directory / "made/p.dzi").exists()
-    times = {part: part.stat().st_mtime_ns for part in unfinished.glob("part-*")}
-    assert times
+    # The second part's tiles aren't made again.
+    second = unfinished / "p_files/11/0_2.jpg"
+    made = second.stat().st_mtime_ns if (unfinished / "part-2").exists() else None
+    assert made
     # One part's file says that its tiles are there; without it they are made again.
     (unfinished / "part-1").unlink()
-    tile = next(unfinished.rglob("0_0.jpg"))
-    os.truncate(tile, 0)
+    os.truncate(unfinished / "p_files/11/0_0.jpg", 0)
     batch.run(*words)
+    assert (batch.directory / "made/p_files/11/0_2.jpg").stat().st_mtime_ns == made
     assert tree(batch.directory / "made") == tree(scan / "alone")
 
 
 # Catches work that begins before everything is known to fit.
 @pytest.mark.parametrize("arguments, code, told", [
     (["nothing.tif", "-o", "p"], 2, "nothing.tif: No such file"),
-    (["in/0.png", "-o", "p", "--format", "tif"], 2, "no browser shows tiles of the type tif"),
-    (["in/0.png", "-o", "p", "--parts", "1000"], 2, "there are only 1 rows of tiles to divide"),
+    (["in/0.png", "-o", "p", "--format", "tif"], 3, "no browser shows tiles of the type tif"),
+    (["in/0.png", "-o", "p/p", "--parts", "1000"], 3, "there are only 1 rows of tiles to divide"),
+    (["in/0.png", "-o", "p", "--quality", "101"], 3, "101"),
+    (["in/0.png", "-o", "in/0.png/p"], 2, "in/0.png: "),
     (["in/0.png", "-o", "p", "--parts", "0"], 3, "--parts: invalid number value: '0'"),
-    (["in/0.png", "-o", "p.zip"], 2, "only a folder can be made by parts"),
+    (["in/0.png", "-o", "p.zip"], 3, "only a folder can be made by parts"),
     (["in/0.png"], 3, "-o/--output"),
 ])
 def test_refused(batch, arguments, code, told):
     error = batch.run("tiles", *arguments, "--command", COMMAND, "--workers", "1", code=code)[1]
     assert told in error and len(error.splitlines()) == 1
-    assert not list(batch.directory.glob("p*"))
+    assert not list(batch.directory.glob("p/*")) and not list(batch.directory.glob("p.*"))
