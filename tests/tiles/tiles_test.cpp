@@ -272,6 +272,29 @@ TEST_F(Tiles, MadeByPartsAreTheSame) {
   }
 }
 
+// Catches parts that step on each other, and permissions that are lost where many threads make files.
+TEST_F(Tiles, PartsAreMadeAtTheSameTime) {
+  WriteTIFF(At("a.tif"), Noise(400, 600, 3));
+  const auto command = [](const std::string& name, const Arguments& more) {
+    Arguments all{"tiles", "a.tif", "--tile", "32", "--overlap", "31", "--threads", "4", "-o", name};
+    all.insert(all.end(), more.begin(), more.end());
+    return all;
+  };
+  Do(command("whole/p", {}));
+  std::vector<pid_t> processes;
+  for (const char* part : {"1/3", "2/3", "3/3", "2/3"})
+    processes.push_back(Start(command("made/p", {"--part", part}), 1, 2));
+  for (const pid_t process : processes) EXPECT_EQ(WaitFor(process), 0);
+  Do(command("made/p", {"--join", "3"}));
+  EXPECT_EQ(FilesBelow("made"), FilesBelow("whole"));
+  const auto rights = [&](const path& file) { return std::filesystem::status(file).permissions(); };
+  for (const std::string& name : FilesBelow("whole")) {
+    EXPECT_EQ(ReadBytes(At("made/" + name)), ReadBytes(At("whole/" + name))) << name;
+    EXPECT_EQ(rights(At("made/" + name)), rights(At("whole/" + name))) << name;
+  }
+  EXPECT_EQ(rights(At("made/p_files/10")), rights(At("whole/p_files/10")));
+}
+
 TEST_F(Tiles, RefuseWhatCantBe) {
   WritePNG(At("a.png"), Noise(20, 10, 3));
   WriteBytes(At("p_files"), {1});
@@ -296,7 +319,11 @@ TEST_F(Tiles, RefuseWhatCantBe) {
   WriteBytes(At("cut.png"), Bytes(ReadBytes(At("a.png"))));
   std::filesystem::resize_file(At("cut.png"), 300);
   EXPECT_EQ(Run({"tiles", "cut.png", "-o", "p.zip"}).Code, 2);
-  EXPECT_EQ(Files(), (std::vector<std::string>{"a.png", "cut.png"}));
+  // Jobs are under way on other threads when its end is missed.
+  WriteTIFF(At("cut.tif"), Noise(2000, 2000, 3));
+  std::filesystem::resize_file(At("cut.tif"), 9'000'000);
+  EXPECT_EQ(Run({"tiles", "cut.tif", "--threads", "4", "-o", "p.zip"}).Code, 2);
+  EXPECT_EQ(Files(), (std::vector<std::string>{"a.png", "cut.png", "cut.tif"}));
 }
 
 }
