@@ -23,7 +23,7 @@ set(CPACK_PACKAGE_VENDOR PictureZOR)
 set(CPACK_PACKAGE_CONTACT "PictureZOR's developers <maintainers@example.org>")
 set(CPACK_STRIP_FILES ON)
 set(CPACK_DEB_COMPONENT_INSTALL ON)
-set(CPACK_COMPONENTS_ALL runtime development)
+set(CPACK_COMPONENTS_ALL runtime development batch)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
 # The libraries of one package are looked for while the other is made.
@@ -48,6 +48,15 @@ foreach(pair libwebp:libwebp-dev libjxl:libjxl-dev libheif:libheif-dev libopenjp
 endforeach()
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION "Headers and libraries for programs that use PictureZOR
  C++ headers, static libraries, and files for CMake and pkg-config.")
+# Python alone, for any interpreter.
+set(CPACK_DEBIAN_BATCH_PACKAGE_NAME picturezor-batch)
+set(CPACK_DEBIAN_BATCH_PACKAGE_SECTION graphics)
+set(CPACK_DEBIAN_BATCH_PACKAGE_ARCHITECTURE all)
+set(CPACK_DEBIAN_BATCH_PACKAGE_SHLIBDEPS OFF)
+set(CPACK_DEBIAN_BATCH_PACKAGE_DEPENDS
+  "picturezor (= ${PROJECT_VERSION}), python3 (>= 3.9~), python3-distributed, python3-tqdm")
+set(CPACK_COMPONENT_BATCH_DESCRIPTION "The same steps for many images, on one machine or many
+ Hands out images, or parts of one image pyramid, to the workers of Dask's scheduler.")
 if(PICTUREZOR_PYTHON)
   list(APPEND CPACK_COMPONENTS_ALL python)
   set(CPACK_DEBIAN_PYTHON_PACKAGE_NAME python3-picturezor)
@@ -55,6 +64,7 @@ if(PICTUREZOR_PYTHON)
   # The module is built for one version of the interpreter.
   set(CPACK_DEBIAN_PYTHON_PACKAGE_DEPENDS
     "python3 (>= ${PICTUREZOR_PYTHON_VERSION}~), python3 (<< ${PICTUREZOR_PYTHON_NEXT_VERSION}~), python3-numpy")
+  set(CPACK_DEBIAN_PYTHON_PACKAGE_SUGGESTS picturezor-batch)
   set(CPACK_COMPONENT_PYTHON_DESCRIPTION "Images larger than memory, the same bytes on every machine, in Python
  Pictures on numpy arrays, with all that PictureZOR does to them.")
 endif()

@@ -45,3 +45,5 @@ import picturezor as pz
 pz.open('lake.jpg').scale(percent=50, kernel='box').save('half.png')"
   usr/bin/picturezor compare expected.png half.png
 fi
+PATH=$PWD/usr/bin:$PATH picturezor-batch 'scale --percent 50 --kernel box' lake.jpg -o 'out/{stem}.png' --workers 1 --quiet
+usr/bin/picturezor compare expected.png out/lake.png
