@@ -84,8 +84,8 @@ class ExifBlock {
   /// The bytes of an entry's values; more than four of them stand elsewhere.
   std::uint64_t SizeOf(std::size_t entry) const {
     constexpr std::array sizes = {0, 1, 1, 2, 4, 8, 1, 1, 2, 4, 8, 4, 8, 4};
-    const std::uint32_t type = Number(entry + 2, 2);
-    return type < std::size(sizes) ? std::uint64_t{Number(entry + 4, 4)} * sizes[type] : 0;
+    const std::size_t type = Number(entry + 2, 2), known = sizes.size();
+    return type < known ? std::uint64_t{Number(entry + 4, 4)} * std::uint64_t(sizes[type]) : 0;
   }
   void PutEntry(std::size_t entry, std::uint32_t tag, std::uint32_t type, std::uint32_t value) {
     Put(entry, 2, tag);
