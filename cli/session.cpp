@@ -1,7 +1,12 @@
 #include "session.h"
 
+#ifdef __GLIBC__
+#include <malloc.h>
+#endif
+
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <climits>
 #include <cstdio>
 #include <map>
 
@@ -119,6 +124,14 @@ void AddWriteOptions(CLI::App& command, Session& session) {
   command.add_flag("--bigtiff", writing.Big, "TIFF with offsets of 64 bits, however small it is");
   command.add_flag("--pyramid", writing.Pyramid,
                    "TIFF with smaller copies of the picture, each half as large as the one before");
+}
+
+void KeepMemory() {
+#ifdef __GLIBC__
+  // The most that it takes; larger pieces are the system's all the same.
+  mallopt(M_MMAP_THRESHOLD, 4 * 1024 * 1024 * int(sizeof(long)));
+  mallopt(M_TRIM_THRESHOLD, INT_MAX);
+#endif
 }
 
 std::unique_ptr<ImageReader> OpenFor(const Session& session, const std::filesystem::path& file) {

@@ -59,6 +59,9 @@ void AddStoreOptions(CLI::App& command, Session& session);
 /// How images are written: --type, --quality, --compression and those of TIFF.
 void AddWriteOptions(CLI::App& command, Session& session);
 
+/// For who does one image after another: memory that is given back stays with the process, since the system
+/// would have to clear it for the next image.
+void KeepMemory();
 std::unique_ptr<ImageReader> OpenFor(const Session& session, const std::filesystem::path& file);
 
 /// An image file that is open, its notes told.

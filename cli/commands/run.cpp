@@ -68,6 +68,7 @@ int RunPairs(Session& session, std::istream& names, const std::vector<steps::Wri
 }
 
 int RunPairs(Session& session, const RunOptions& options) {
+  KeepMemory();
   const auto written = StepsOf(options.File);
   if (options.Pairs == "-") return RunPairs(session, std::cin, written);
   std::ifstream names(options.Pairs, std::ios::binary);

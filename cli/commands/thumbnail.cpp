@@ -133,6 +133,7 @@ void Make(Session& session, const Thumbnail& one, int threads) {
 
 /// Makes all of them, some at a time. What keeps one from being made is kept with it.
 void MakeAll(Session& session, std::vector<Thumbnail>& thumbnails, int asked) {
+  KeepMemory();
   const int processors = flow::Processors();
   const int jobs = int(std::min<std::size_t>(std::size_t(asked > 0 ? asked : processors), thumbnails.size()));
   // The jobs share the memory and the processors.
