@@ -93,7 +93,8 @@ FolderTarget::FolderTarget(const path& parent, const std::string& name, const st
   // Only what has a journal is ours to remove.
   if (!goesOn && std::filesystem::exists(JournalName)) std::filesystem::remove_all(Unfinished, failed);
   if (failed) throw Failure(Unfinished, failed.message());
-  if (!goesOn && std::filesystem::exists(Unfinished)) throw Failure(Unfinished, "something else is there");
+  if (!goesOn && std::filesystem::exists(Unfinished))
+    throw Failure(Unfinished, "parts of a pyramid, or something else, are there; remove it first");
   Journal = std::make_unique<PlainFile>(JournalName, O_WRONLY | O_APPEND);
   const std::string start = goesOn ? "\n" : task + "\n";
   files::WriteAll(Journal->Descriptor(), {reinterpret_cast<const std::uint8_t*>(start.data()), start.size()},

@@ -34,8 +34,8 @@ struct TilesOptions {
   bool Page = false;
   /// Goes on with a folder that was interrupted.
   bool Resume = false;
-  /// With Parts the work is divided among so many runs, which share a folder and may work at once: each makes
-  /// Part, 1 to Parts, and at the end one with Part 0 makes the smaller levels and completes the pyramid. It
+  /// Divides the work among so many runs, which share a folder and may be at work at once. Each makes one
+  /// Part, counted from 1; a last run, without a Part, makes the smaller levels and completes the pyramid. It
   /// has the same bytes as one that a single run makes. A part that is made already isn't made again.
   std::int32_t Parts = 0, Part = 0;
   flow::RunOptions Running;

@@ -82,7 +82,8 @@ def tiles(source, output, client=None, *, options=(), tile=256, parts=None, memo
     job = {"source": source, "target": target, "directory": os.getcwd(), "parts": parts,
            "options": ["--tile", str(tile), *(one for one in options if one != "--page"),
                        *(["--temp-dir", temp_dir] if temp_dir else [])],
-           "at the end": [one for one in options if one == "--page"], "memory_limit": memory_limit, "command": "picturezor" if client and not command else where,
+           "at the end": [one for one in options if one == "--page"], "memory_limit": memory_limit,
+           "command": "picturezor" if client and not command else where,
            "threads": None if client else min(32, max(1, len(os.sched_getaffinity(0)) // workers))}
     report = Report()
 
