@@ -162,8 +162,9 @@ std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector
   std::iota(order.begin(), order.end(), 0);
   std::ranges::stable_sort(order, {}, [&](std::size_t i) { return MemoryOf(sizes[i]); });
   std::vector<Picture> pictures(sizes.size());
+  // Of fewer bytes nobody has to ask.
+  constexpr std::int64_t few = 16 << 20;
   std::int64_t used = 0;
-  const std::int64_t free = FreeMemory();
   for (const std::size_t i : order) {
     const PictureSize& size = sizes[i];
     const std::int64_t bytes = MemoryOf(size);
@@ -171,7 +172,7 @@ std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector
                       (options.Kind == Store::Memory || used + bytes <= options.MemoryLimit);
     if (fits || size.Height < fewestMapped) {
       used += bytes;
-      if (used > free)
+      if (used > few && used > FreeMemory())
         throw Failure(SizeText(size) + " need " + Megabytes(bytes) + " of memory, more than is free");
       pictures[i] = MakeInMemory(size);
     } else if (options.Kind == Store::Memory) {
@@ -235,33 +236,34 @@ bool Convertible(Format from, Format to) {
   return a == b || a == Format::G || b == Format::G;
 }
 
-Bytes RowInFileFormat(const Picture& picture, std::int32_t y, Format format) {
-  const Format from = picture.ImageFormat();
-  const int channels = ChannelsOf(format);
-  const bool opaque = HasAlpha(format) && !HasAlpha(from);
-  const bool toInk = WithoutAlpha(format) == Format::CMYK && WithoutAlpha(from) == Format::G;
-  const bool ofInk = WithoutAlpha(format) == Format::G && WithoutAlpha(from) == Format::CMYK;
-  Bytes row = picture.RowInFormat(y, format);
-  if (row.empty()) throw Failure("a row of a picture can't be converted");
-  if (!opaque && !ofInk && !toInk) return row;
-  for (std::size_t at = 0; at < row.size(); at += std::size_t(channels)) {
-    if (opaque) row[at + std::size_t(channels) - 1] = 255;
-    if (ofInk) row[at] = std::uint8_t(255 - row[at]);
-    if (toInk) {
-      row[at + 3] = std::uint8_t(255 - row[at + 3]);
-      row[at] = row[at + 1] = row[at + 2] = 0;
-    }
-  }
-  return row;
+void CopyInFileFormat(const Picture& from, std::int32_t first, const Picture& into) {
+  if (!into.CopyPixels(from, {0, 0, into.Width(), into.Height()}, 0, first))
+    throw Failure("a row of a picture can't be converted");
+  if (into.HasAlpha() && !from.HasAlpha()) into.AlphaChannel().FillRect(255);
+  // Black is no ink.
+  if (into.IsCMYK() && from.IsGray()) into.BlackChannel().Invert();
+  if (into.IsGray() && from.IsCMYK()) into.GrayChannel().Invert();
 }
 
 void WriteFrom(const Picture& picture, ImageWriter& writer, Format format, Progress& progress) {
-  const std::int32_t height = picture.Height();
-  // The rows of a view are its parent's.
-  const bool asStored = format == picture.ImageFormat() && !picture.Parent();
+  constexpr std::int32_t bandBytes = 1 << 18;
+  const std::int32_t width = picture.Width(), height = picture.Height();
   progress.Begin("writing", height);
-  for (std::int32_t y = 0; y < height; ++y, progress.Step())
-    writer.WriteRow(asStored ? RowOf(picture, y) : RowInFileFormat(picture, y, format).data());
+  const std::int32_t most = std::int32_t(
+      std::clamp<std::int64_t>(bandBytes / (std::int64_t{width} * BytesPerPixel(format)), 1, height));
+  Picture band;
+  for (std::int32_t y = 0, count = 0; y < height; y += count, progress.Step(count)) {
+    // The rows of a view are its parent's.
+    if (format == picture.ImageFormat() && !picture.Parent()) {
+      count = 1;
+      writer.WriteRow(RowOf(picture, y));
+      continue;
+    }
+    count = std::min(most, height - y);
+    if (!band || band.Height() != count) band = MakeInMemory({width, count, format});
+    CopyInFileFormat(picture, y, band);
+    writer.WriteRows(RowOf(band, 0), band.RowSize(), count);
+  }
 }
 
 }

@@ -60,11 +60,11 @@ Rect Stored(const Rect& upright, const ImageInfo& info);
 void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress);
 /// The format of files that has a picture's colours and alpha. Throws Failure for one without colours.
 Format FileFormatOf(const Picture& picture);
-/// Whether `WriteFrom` has a way from a picture's format to a file's.
+/// Whether there is a way from a picture's format to a file's.
 bool Convertible(Format from, Format to);
-/// A row in a format of files. A missing alpha becomes opaque. Gray becomes black ink alone, and gray comes
-/// of black ink alone.
-Bytes RowInFileFormat(const Picture& picture, std::int32_t y, Format format);
+/// Fills a picture of a format of files with the rows of another one from `first` on. A missing alpha becomes
+/// opaque. Gray becomes black ink alone, and gray comes of black ink alone.
+void CopyInFileFormat(const Picture& from, std::int32_t first, const Picture& into);
 /// Writes all rows in a format of files.
 void WriteFrom(const Picture& picture, ImageWriter& writer, Format format, Progress& progress);
 

@@ -20,6 +20,10 @@ std::int64_t BandChain::Margin() const {
   return rows;
 }
 
+bool BandChain::KeepsSource() const {
+  return std::ranges::all_of(Needs, [](const Dependence& needs) { return needs.KeepsSource; });
+}
+
 std::int64_t BandChain::BytesOfRow() const {
   const auto bytes = [](const Shape& shape) { return std::int64_t{shape.Width} * BytesPerPixel(shape.Of); };
   std::int64_t most = bytes(Source());

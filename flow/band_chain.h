@@ -22,13 +22,16 @@ class BandChain {
   const Shape& Source() const { return Shapes.front(); }
   const Shape& Result() const { return Shapes.back(); }
   bool Empty() const { return Chain.empty(); }
+  /// Whether `Apply` leaves its source as it is.
+  bool KeepsSource() const;
   /// The rows around those of a band that are read for it, at most.
   std::int64_t Margin() const;
   /// Bytes of all that is in memory for a row of a band.
   std::int64_t BytesOfRow() const;
   /// The rows of the source that some rows of the result are made of.
   RowRange SourceOf(RowRange result) const { return Ranges(result).front(); }
-  /// Rows of the result, out of the rows SourceOf(result) of the source, whose samples are lost.
+  /// Rows of the result, out of the rows SourceOf(result) of the source, whose samples are lost
+  /// unless the chain keeps it.
   Picture Apply(Picture source, RowRange result, Workplace at) const;
 
  private:

@@ -1,9 +1,6 @@
 #include "in_format.h"
 
-#include <cstring>
-
 #include "failure.h"
-#include "rows.h"
 
 namespace picturezor::flow {
 
@@ -17,12 +14,8 @@ Shape InFormat::Result(const Shape& source) const {
 
 Picture InFormat::Apply(Picture source, const Workplace& at) const {
   if (source.ImageFormat() == To) return source;
-  const std::int32_t width = source.Width(), height = source.Height();
-  Picture result = files::MakePictures(at.Stores, {{width, height, To}})[0];
-  for (std::int32_t y = 0; y < height; ++y) {
-    const Bytes row = files::RowInFileFormat(source, y, To);
-    std::memcpy(RowOf(result, y), row.data(), row.size());
-  }
+  Picture result = files::MakePictures(at.Stores, {{source.Width(), source.Height(), To}})[0];
+  files::CopyInFileFormat(source, 0, result);
   return result;
 }
 

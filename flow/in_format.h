@@ -8,7 +8,9 @@ class InFormat final : public Operation {
  public:
   explicit InFormat(Format format) : To(format) {}
   Shape Result(const Shape& source) const override;
-  Dependence DependsOn(const Shape&) const override { return {.Of = Dependence::Kind::Bands}; }
+  Dependence DependsOn(const Shape&) const override {
+    return {.Of = Dependence::Kind::Bands, .KeepsSource = true};
+  }
   Picture Apply(Picture source, const Workplace& at) const override;
 
  private:

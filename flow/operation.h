@@ -36,6 +36,8 @@ struct Dependence {
   /// The first row that `Apply` gives of a band is a multiple of this in the whole result, where the work
   /// repeats itself from row to row.
   std::int32_t Period = 1;
+  /// Whether bands of the source come back as they were. The result may show them.
+  bool KeepsSource = false;
 };
 
 /// Where and how an operation works.

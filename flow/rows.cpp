@@ -139,6 +139,13 @@ RowSource RowsOf(const Picture& picture, const Shape& shape) {
           .From = [=](std::int64_t first) { return std::make_unique<RowsOfPicture>(picture, shape, first); }};
 }
 
+Picture OverRows(const RowBlock& rows, const Shape& shape) {
+  auto* first = const_cast<std::uint8_t*>(rows.First);
+  const std::size_t bytes = std::size_t(rows.Stride) * std::size_t(rows.Count);
+  return Picture(MemoryBlock::Over({first, bytes}), shape.Width, rows.Count, shape.Of,
+                 std::int32_t(rows.Stride));
+}
+
 std::uint8_t* RowOf(const Picture& picture, std::int32_t y) {
   const MemoryBlock row = picture.RawRow(y);
   if (!row) throw files::Failure("a row of a picture can't be reached");

@@ -61,6 +61,8 @@ RowSource RowsOf(OpenFile file);
 /// The rows of a picture in one of the formats of files. One thread at a time reads them.
 RowSource RowsOf(const Picture& picture, const Shape& shape);
 
+/// A picture of rows that stand in memory for longer than it.
+Picture OverRows(const RowBlock& rows, const Shape& shape);
 /// The samples of a row of a picture that isn't a view.
 std::uint8_t* RowOf(const Picture& picture, std::int32_t y);
 

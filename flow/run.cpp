@@ -50,17 +50,22 @@ class Stream {
     }
   }
 
-  /// A picture that isn't changed.
-  Stream(const Picture& picture, const Shape& shape, const RunOptions& options, files::Progress& progress)
+  /// A part of a picture that isn't changed, or all of it.
+  Stream(const Picture& picture, const std::optional<Rect>& part, const Shape& shape,
+         const RunOptions& options, files::Progress& progress)
       : Of(shape), Options(options), Report(progress) {
+    const Picture shown = part ? picture.ClipImage(*part) : picture;
     if (picture.ImageFormat() != shape.Of) {
-      Whole = Gather(*RowsOf(picture, shape).From(0), options.Stores, progress);
+      Whole = Gather(*RowsOf(shown, shape).From(0), options.Stores, progress);
       return;
     }
-    Coming = RowsOf(picture, shape);
+    Coming = RowsOf(shown, shape);
     BandsFrom = shape;
     // Of a mapped one the rows come one by one, so that the work can be stopped.
-    if (!picture.IsMapping()) Standing = picture;
+    if (picture.IsMapping()) return;
+    Standing = shown;
+    StandsIn = picture;
+    StandsAt = part.value_or(Rect{0, 0, shape.Width, shape.Height});
   }
 
   const Shape& About() const { return Of; }
@@ -102,16 +107,16 @@ class Stream {
   Picture TakePicture() {
     if (Standing) {
       const Picture made = files::MakePictures(Options.Stores, {{Of.Width, Of.Height, Of.Of}})[0];
-      const bool view = bool(Standing.Parent());
-      if (view && Bands.empty()) {
-        if (!made.CopyPixels(Standing)) throw files::Failure("a row of a picture can't be reached");
-        return made;
-      }
-      if (!view && !made.IsMapping()) {
+      // A view may count its rows another way.
+      if (!StandsIn.Parent() && !made.IsMapping()) {
         const BandChain chain(std::exchange(Bands, {}), BandsFrom);
         const int threads = ThreadsOf(Options);
-        ApplyBands(Standing, chain, ChooseBands(chain, threads, MemoryFor(chain)).Rows, threads, made,
-                   Report);
+        ApplyBands(StandsIn, StandsAt, chain, ChooseBands(chain, threads, MemoryFor(chain)).Rows, threads,
+                   made, Report);
+        return made;
+      }
+      if (Bands.empty()) {
+        if (!made.CopyPixels(Standing)) throw files::Failure("a row of a picture can't be reached");
         return made;
       }
     }
@@ -272,6 +277,9 @@ class Stream {
   bool ReadAhead = false;
   /// The source itself, where that is a picture in memory and nothing was done to it yet.
   Picture Standing;
+  /// The picture that it is a part of, or itself.
+  Picture StandsIn;
+  Rect StandsAt;
   Picture Whole;
   Shape Of;
   /// Operations that were made on the way, for as long as rows come.
@@ -300,17 +308,17 @@ std::unique_ptr<Rows> Through(OpenFile file, const Chain& chain, const RunOption
 
 Picture ResultOf(const Picture& source, const Shape& shape, const Chain& chain, const RunOptions& options,
                  files::Progress& progress) {
-  Picture part = source;
+  std::optional<Rect> part;
   Shape of = shape;
   std::size_t first = 0;
-  // What is cut out first is a view. A view that is there already may count its rows another way.
+  // What is cut out first is seen as a part.
   for (; first < chain.size() && !source.Parent() && !source.IsMapping(); ++first) {
     const std::optional<Rect> cut = chain[first]->Cuts();
     if (!cut) break;
     of = chain[first]->Result(of);
-    part = part.ClipImage(*cut);
+    part = {(part ? part->X : 0) + cut->X, (part ? part->Y : 0) + cut->Y, cut->Width, cut->Height};
   }
-  Stream stream(part, of, options, progress);
+  Stream stream(source, part, of, options, progress);
   for (; first < chain.size(); ++first) stream.Add(*chain[first]);
   return stream.TakePicture();
 }
@@ -355,7 +363,7 @@ void Run(OpenFile file, const Chain& chain, Format format, files::ImageWriter& w
 
 void Run(const Picture& source, const Shape& shape, Format format, files::ImageWriter& writer,
          const RunOptions& options, files::Progress& progress) {
-  Stream stream(source, shape, options, progress);
+  Stream stream(source, {}, shape, options, progress);
   Write(stream, format, writer, progress);
 }
 

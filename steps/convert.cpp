@@ -27,7 +27,7 @@ class Converting final : public flow::Operation {
     return result;
   }
   flow::Dependence DependsOn(const flow::Shape&) const override {
-    return {.Of = flow::Dependence::Kind::Bands};
+    return {.Of = flow::Dependence::Kind::Bands, .KeepsSource = true};
   }
   Picture Apply(Picture source, const flow::Workplace& at) const override {
     return To ? flow::InFormat(*To).Apply(std::move(source), at) : source;

@@ -21,7 +21,7 @@ class Cropping final : public flow::Operation {
     return result;
   }
   flow::Dependence DependsOn(const flow::Shape&) const override {
-    return {.Of = flow::Dependence::Kind::Bands, .First = Part.Y};
+    return {.Of = flow::Dependence::Kind::Bands, .First = Part.Y, .KeepsSource = true};
   }
   int Pictures() const override { return 1; }
   std::optional<Rect> Cuts() const override { return Part; }

@@ -243,16 +243,22 @@ std::int32_t RoundedRowSize(const PictureData& data, std::int32_t unit) {
 
 bool UseOwnMemory(PictureData& data) {
   if (data.TotalSize > Int32Max) return false;
-  auto* memory = static_cast<Sample*>(std::calloc(1, std::size_t(data.TotalSize)));
+  // Of so much the system hands out fresh pages, the large ones at multiples of their size: what stands before
+  // the first of them and behind the last comes in small ones.
+  constexpr std::size_t large = 2 << 20, fresh = 32 << 20;
+  const auto bytes = std::size_t(data.TotalSize), spare = bytes < fresh ? 0 : large - 1;
+  auto* memory = static_cast<Sample*>(std::calloc(1, bytes + spare));
   if (!memory) return false;
-  WantLargePages(memory, std::size_t(data.TotalSize));
+  Sample* first = spare == 0 ? memory : memory + std::size_t(-reinterpret_cast<Word>(memory)) % large;
+  WantLargePages(first, bytes);
   Store* store = NewStore();
   if (!store) {
     std::free(memory);
     return false;
   }
   data.Samples = store;
-  store->Memory = data.PixelBase = memory;
+  store->Memory = memory;
+  data.PixelBase = first;
   data.RowsPerBlock = data.Height;
   data.RowGetter = PlainRow;
   return true;

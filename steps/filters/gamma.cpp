@@ -1,6 +1,23 @@
+#include <numeric>
+
 #include "filter_operation.h"
 
 namespace picturezor::steps {
+
+namespace {
+
+/// What becomes of all samples: to find it out costs as much as to filter a picture of some size.
+std::vector<std::int32_t> TableOf(double gamma) {
+  const Picture ramp(256, 1, Format::G);
+  Bytes samples(256);
+  std::iota(samples.begin(), samples.end(), std::uint8_t{0});
+  ramp.SetRowInFormat(0, Format::G, samples);
+  if (!ramp.GammaFilter(ramp, gamma)) throw files::Failure("there is no such gamma");
+  samples = ramp.RowInFormat(0, Format::G);
+  return {samples.begin(), samples.end()};
+}
+
+}
 
 const Step Gamma{.Name = "filter gamma",
                  .Help = "Brighten with more than 1, darken with less",
@@ -20,9 +37,12 @@ const Step Gamma{.Name = "filter gamma",
                    return MakeFilter({.Name = "gamma",
                                       .Groups = Serves::GrayAndRGB,
                                       .NotForGray = g.size() > 1 ? "--gamma: a gray image has one" : nullptr},
-                                     [g](const Picture& colours) {
-                                       return g.size() == 1 ? colours.GammaFilter(colours, g[0])
-                                                            : colours.GammaFilter(colours, g[0], g[1], g[2]);
+                                     [red = TableOf(g[0]), green = TableOf(g[g.size() / 2]),
+                                      blue = TableOf(g.back())](const Picture& colours) {
+                                       if (colours.IsGray())
+                                         return colours.TransferFilter(colours, IntegerArray(red));
+                                       return colours.TransferFilter(colours, IntegerArray(red),
+                                                                     IntegerArray(green), IntegerArray(blue));
                                      });
                  }};
 
