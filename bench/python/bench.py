@@ -1,9 +1,14 @@
-"""The same work by several libraries of Python's, as a table: the best of some runs each, in milliseconds."""
+"""The same work by several libraries of Python's, as a table: the best of some runs each, in milliseconds.
+
+The argument is the program of calls.cpp, for the cost of short calls beside that from C++ on.
+"""
 
 import io
 import os
 import pathlib
 import platform
+import subprocess
+import sys
 import time
 
 import numpy as np
@@ -143,9 +148,13 @@ def main():
         print("|", " | ".join([name, *cells]), "|", flush=True)
         behind += [name] if times["picturezor"] > min(times.values()) else []
     print(f"\nAhead in each row but: {'; '.join(behind)}." if behind else "\nAhead in each row.")
-    print("\nShort calls from Python on, microseconds:\n\n| | |\n|---|---:|")
+    module = pathlib.Path(pz.__file__).with_name("PictureZOR.so")
+    said = subprocess.run([sys.argv[1], module], check=True, capture_output=True, text=True).stdout
+    direct = dict(line.split("\t") for line in said.splitlines())
+    print("\nShort calls, microseconds:\n\n| | from Python on | from C++ on |\n|---|---:|---:|")
     for name, cost in calls():
-        print(f"| `{name}` | {cost:.2f} |", flush=True)
+        print(f"| `{name}` | {cost:.2f} | {direct.pop(name, '')} |", flush=True)
+    assert not direct, direct
 
 
 main()

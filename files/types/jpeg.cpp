@@ -1,19 +1,12 @@
-// jpeglib.h needs FILE.
-#include <cstdio>
-// clang-format off
-#include <jpeglib.h>
-#include <jerror.h>
-// clang-format on
-
 #include <algorithm>
 #include <cerrno>
 #include <cmath>
-#include <csetjmp>
 #include <cstring>
 
 #include "exif.h"
-#include "failure.h"
 #include "file_types.h"
+#include "jpeg_bands.h"
+#include "jpeg_errors.h"
 #include "stream.h"
 
 namespace picturezor::files {
@@ -26,49 +19,6 @@ constexpr std::size_t MostMarkerBytes = 65533;
 constexpr double CentimetresOfInch = 2.54;
 /// A block of 64 samples takes at least a bit.
 constexpr double MostPixelsPerByte = 512;
-
-/// libjpeg reports by a call that mustn't return: a jump, which becomes a Failure here.
-struct JPEGErrors {
-  jpeg_error_mgr Manager;
-  std::jmp_buf Back;
-  char Reason[JMSG_LENGTH_MAX + 32] = {};
-
-  JPEGErrors() {
-    jpeg_std_error(&Manager);
-    Manager.error_exit = OnError;
-    Manager.emit_message = OnMessage;
-  }
-
-  static void OnError(j_common_ptr file) {
-    auto& self = *reinterpret_cast<JPEGErrors*>(file->err);
-    char message[JMSG_LENGTH_MAX];
-    file->err->format_message(file, message);
-    switch (file->err->msg_code) {
-      case JERR_FILE_WRITE:
-      case JERR_FILE_READ: std::snprintf(self.Reason, sizeof self.Reason, "%s", std::strerror(errno)); break;
-      case JERR_NO_BACKING_STORE:
-      case JERR_OUT_OF_MEMORY:
-        std::snprintf(self.Reason, sizeof self.Reason,
-                      "a progressive JPEG of this size needs more memory than --memory-limit allows");
-        break;
-      case JWRN_JPEG_EOF:
-      case JERR_INPUT_EOF: std::snprintf(self.Reason, sizeof self.Reason, "the JPEG file is cut off"); break;
-      default: std::snprintf(self.Reason, sizeof self.Reason, "corrupt JPEG: %s", message);
-    }
-    std::longjmp(self.Back, 1);
-  }
-
-  /// What libjpeg would make up for by gray or noise is an error.
-  static void OnMessage(j_common_ptr file, int level) {
-    if (level >= 0) return;
-    switch (file->err->msg_code) {
-      case JWRN_EXTRANEOUS_DATA:
-      case JWRN_ADOBE_XFORM:
-      case JWRN_JFIF_MAJOR: return;
-      default: OnError(file);
-    }
-  }
-};
 
 class JPEGReader : public ImageReader {
  public:
@@ -115,13 +65,9 @@ class JPEGReader : public ImageReader {
   }
 
  private:
-  /// `call` may hold nothing that needs a destructor, since libjpeg jumps out of it.
   template <class Call>
   void Try(Call call) {
-    if (setjmp(Errors.Back) == 0)
-      call();
-    else
-      throw Failure(Path, Errors.Reason);
+    Errors.Try(Path, call);
   }
 
   void Start(std::int64_t memoryLimit) {
@@ -193,85 +139,39 @@ class JPEGWriter : public ImageWriter {
  public:
   JPEGWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info,
              const WriteOptions& options)
-      : Path(target), File(StreamOn(descriptor, target)) {
-    if (info.Pixels == Format::CMYK) Ink.resize(std::size_t(info.Width) * 4);
-    Jpeg.err = &Errors.Manager;
-    try {
-      Start(info, options);
-    } catch (...) {
-      jpeg_destroy_compress(&Jpeg);
-      throw;
-    }
-  }
-  ~JPEGWriter() override { jpeg_destroy_compress(&Jpeg); }
+      : Path(target),
+        File(StreamOn(descriptor, target)),
+        Bands(target, info, HeadOf(target, info, options), options.Quality, options.Threads,
+              [this](std::span<const std::uint8_t> piece) { Write(piece); }) {}
 
-  void WriteRow(const std::uint8_t* row) override {
-    for (std::size_t i = 0; i < Ink.size(); ++i) Ink[i] = std::uint8_t(255 - row[i]);
-    auto samples = const_cast<JSAMPROW>(Ink.empty() ? row : Ink.data());
-    Try([&] { jpeg_write_scanlines(&Jpeg, &samples, 1); });
-  }
-
-  void Finish() override {
-    Try([&] { jpeg_finish_compress(&Jpeg); });
-    Flush(File, Path);
-  }
+  void WriteRow(const std::uint8_t* row) override { Bands.Add(row); }
+  void Finish() override { Flush(File, Path); }
 
  private:
-  template <class Call>
-  void Try(Call call) {
-    if (setjmp(Errors.Back) == 0)
-      call();
-    else
-      throw Failure(Path, Errors.Reason);
-  }
-
-  void Start(const ImageInfo& info, const WriteOptions& options) {
-    if (options.Lossless) throw UsageFailure(Path, "JPEG has no --lossless; JPEG XL, WebP and PNG have");
+  static JPEGHead HeadOf(const std::filesystem::path& target, const ImageInfo& info,
+                         const WriteOptions& options) {
+    if (options.Lossless) throw UsageFailure(target, "JPEG has no --lossless; JPEG XL, WebP and PNG have");
+    JPEGHead head;
+    const auto add = [&](int marker, std::string_view start, const Bytes& data) {
+      // One that would be too long is left out.
+      if (data.empty() || start.size() + data.size() > MostMarkerBytes) return;
+      head.Markers.push_back({marker, Bytes(start.begin(), start.end())});
+      head.Markers.back().Data.insert(head.Markers.back().Data.end(), data.begin(), data.end());
+    };
     // CMYK has no JFIF header, so its density needs a block of EXIF.
-    const bool needsExif = !info.Exif.empty() || info.Pixels == Format::CMYK;
-    const Bytes exif = needsExif ? ExifToWrite(info) : Bytes(), xmp = XmpToWrite(info);
-    const Bytes iptc = ResourcesWithIptc(info.Iptc);
-    Try([&] {
-      jpeg_create_compress(&Jpeg);
-      jpeg_stdio_dest(&Jpeg, File.get());
-      Jpeg.image_width = JDIMENSION(info.Width);
-      Jpeg.image_height = JDIMENSION(info.Height);
-      Jpeg.input_components = ChannelsOf(info.Pixels);
-      Jpeg.in_color_space = info.Pixels == Format::G     ? JCS_GRAYSCALE
-                            : info.Pixels == Format::RGB ? JCS_RGB
-                                                         : JCS_CMYK;
-      jpeg_set_defaults(&Jpeg);
-      jpeg_set_quality(&Jpeg, options.Quality, TRUE);
-      if (options.Quality >= 90) Jpeg.comp_info[0].h_samp_factor = Jpeg.comp_info[0].v_samp_factor = 1;
-      if (info.Density) {
-        Jpeg.density_unit = 1;
-        Jpeg.X_density = Density(info.Density->X);
-        Jpeg.Y_density = Density(info.Density->Y);
-      }
-      jpeg_start_compress(&Jpeg, TRUE);
-      WriteMarker(NotesMarker, ExifStart, exif);
-      WriteMarker(NotesMarker, XmpStart, xmp);
-      WriteMarker(RecordsMarker, {}, iptc);
-      if (!info.Profile.empty())
-        jpeg_write_icc_profile(&Jpeg, info.Profile.data(), unsigned(info.Profile.size()));
-    });
+    if (!info.Exif.empty() || info.Pixels == Format::CMYK) add(NotesMarker, ExifStart, ExifToWrite(info));
+    add(NotesMarker, XmpStart, XmpToWrite(info));
+    add(RecordsMarker, {}, ResourcesWithIptc(info.Iptc));
+    return head;
   }
-
-  static UINT16 Density(double perInch) { return UINT16(std::clamp(std::lround(perInch), 1L, 65535L)); }
-
-  /// A marker that would be too long is left out.
-  void WriteMarker(int marker, std::string_view start, const Bytes& data) {
-    if (data.empty() || start.size() + data.size() > MostMarkerBytes) return;
-    jpeg_write_m_header(&Jpeg, marker, unsigned(start.size() + data.size()));
-    for (const char c : start) jpeg_write_m_byte(&Jpeg, std::uint8_t(c));
-    for (const std::uint8_t c : data) jpeg_write_m_byte(&Jpeg, c);
+  void Write(std::span<const std::uint8_t> piece) {
+    if (std::fwrite(piece.data(), 1, piece.size(), File.get()) != piece.size())
+      throw Failure(Path, std::strerror(errno));
   }
 
   std::filesystem::path Path;
   Stream File;
-  JPEGErrors Errors;
-  jpeg_compress_struct Jpeg{};
-  Bytes Ink;
+  JPEGBands Bands;
 };
 
 }

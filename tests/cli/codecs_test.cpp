@@ -61,6 +61,7 @@ TEST_F(Codecs, TheBytesDontDependOnTheThreads) {
       {"stored.png", {.Level = 0}},
       {"runs.png", {.Level = 1}},
       {"patient.png", {.Level = 9}},
+      {"a.jpg", {}, false},
       {"a.tif", {}},
       {"plain.tif", {.Packing = Compression::None, .Tile = 32}},
       {"deflate.tif", {.Packing = Compression::Deflate, .Tile = 64, .Big = true}},

@@ -45,6 +45,23 @@ def test_saving(tmp_path):
     assert np.array_equal(pz.open(view.encode("tif")), np.asarray(view))
 
 
+@pytest.mark.parametrize("quality, subsampling", [(75, 2), (95, 0)])
+def test_a_jpeg_made_in_bands_is_that_of_one_go(lake, quality, subsampling):
+    image = pytest.importorskip("PIL.Image")
+    picture = pz.open(lake).crop((0, 0, 1501, 1101))
+    rgb = np.asarray(picture)
+    for format, mode, samples in (("RGB", "RGB", rgb), ("G", "L", rgb[:, :, 0]),
+                                  ("CMYK", "CMYK", np.dstack([rgb, rgb[:, :, 1]]))):
+        samples = np.ascontiguousarray(samples)
+        whole = io.BytesIO()
+        # Only colours have a resolution of their own.
+        image.fromarray(samples, mode).save(whole, "JPEG", quality=quality,
+                                            subsampling=subsampling if mode == "RGB" else 0)
+        made = pz.from_array(samples, format=format).encode("jpg", quality=quality)
+        assert b"\xff\xdd\0\4" in made, "no restart interval"
+        assert np.array_equal(image.open(io.BytesIO(made)), image.open(whole)), mode
+
+
 def test_what_goes_with_the_pixels(lake, tmp_path):
     image = pytest.importorskip("PIL.Image")
     image.new("RGB", (60, 30)).save(tmp_path / "a.png", dpi=(300, 150))
