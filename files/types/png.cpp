@@ -8,6 +8,7 @@
 #include "failure.h"
 #include "file_types.h"
 #include "png_blocks.h"
+#include "png_source.h"
 #include "stream.h"
 
 namespace picturezor::files {
@@ -18,6 +19,8 @@ constexpr double MetresOfInch = 0.0254;
 constexpr const char* XmpKey = "XML:com.adobe.xmp";
 /// What deflate gives at most for a byte.
 constexpr double MostInflation = 1032;
+/// For less no thread is begun.
+constexpr std::int64_t FewBytes = 256 << 10;
 
 /// What reading and writing share: libpng reports by a jump, which becomes a Failure here.
 class PNGFile {
@@ -54,8 +57,10 @@ class PNGFile {
 
 class PNGReader : public ImageReader, PNGFile {
  public:
-  PNGReader(const Input& input, std::int64_t memoryLimit)
-      : PNGFile(input.Name()), FileSize(input.Size()), File(input.Open()) {
+  PNGReader(const Input& input, const ReadOptions& options)
+      : PNGFile(input.Name()),
+        FileSize(input.Size()),
+        Source(input.Open(), FileSize > FewBytes && ThreadsFor(options.Threads) > 1) {
     Png = png_create_read_struct(PNG_LIBPNG_VER_STRING, static_cast<PNGFile*>(this), OnError, OnWarning);
     Header = Png ? png_create_info_struct(Png) : nullptr;
     if (!Header) {
@@ -63,7 +68,7 @@ class PNGReader : public ImageReader, PNGFile {
       throw Failure(Path, "not enough memory");
     }
     try {
-      Start(memoryLimit);
+      Start(options.MemoryLimit);
     } catch (...) {
       png_destroy_read_struct(&Png, &Header, nullptr);
       throw;
@@ -88,15 +93,19 @@ class PNGReader : public ImageReader, PNGFile {
  private:
   static void OnRead(png_structp png, png_bytep data, std::size_t size) {
     auto& self = *static_cast<PNGReader*>(png_get_io_ptr(png));
-    if (std::fread(data, 1, size, self.File.get()) == size) return;
-    self.SystemError(std::ferror(self.File.get()) ? std::strerror(errno) : "the PNG file is cut off");
+    if (self.Source.Read(data, size)) return;
+    self.System = !self.Source.Found().Damaged;
+    png_error(png, self.Source.Found().Text.c_str());
   }
 
   void Start(std::int64_t memoryLimit) {
     Try([&] {
       png_set_read_fn(Png, this, OnRead);
       png_set_user_limits(Png, PNG_UINT_31_MAX, PNG_UINT_31_MAX);
-      png_set_crc_action(Png, PNG_CRC_ERROR_QUIT, PNG_CRC_ERROR_QUIT);
+      // The source has looked at the sums.
+      png_set_crc_action(Png, PNG_CRC_QUIET_USE, PNG_CRC_QUIET_USE);
+      png_set_option(Png, PNG_IGNORE_ADLER32, PNG_OPTION_ON);
+      png_set_compression_buffer_size(Png, 64 << 10);
       png_read_info(Png, Header);
     });
     const std::int64_t width = png_get_image_width(Png, Header), height = png_get_image_height(Png, Header);
@@ -154,7 +163,7 @@ class PNGReader : public ImageReader, PNGFile {
   }
 
   std::int64_t FileSize;
-  Stream File;
+  PNGSource Source;
   Bytes Whole;
   std::size_t NextRow = 0;
 };
@@ -251,7 +260,7 @@ const FileType PNGType{
     .Begins = [](std::span<const std::uint8_t> start) { return StartsWith(start, "\x89PNG"); },
     .InOrder = true,
     .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<PNGReader>(input, options.MemoryLimit);
+      return std::make_unique<PNGReader>(input, options);
     },
     .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
                  const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
