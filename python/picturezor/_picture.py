@@ -45,7 +45,8 @@ def open(source: str | os.PathLike[str] | Buffer | BinaryIO, *, memory_limit: in
     memory_limit (bytes, or a text like "256M"; half of the free memory without it) lives in a nameless file in
     temp_dir, and so do those that are made from it. page is the picture of a file with several, from 0 on. progress
     is called now and then with what is being done, how much of it is done, and how much there is, 0 where nobody can
-    tell; what it raises ends the work.
+    tell; what it raises ends the work. ValueError for a wrong limit or page; Error for a file that can't be read,
+    or of which only the first picture can.
 
     >>> import picturezor as pz
     >>> pz.open(pz.Picture(4, 3, "GA").encode("png"))
@@ -101,7 +102,8 @@ def save(self, target: str | os.PathLike[str] | BinaryIO, *, type: str | None = 
     quality is 1 to 100, for types that lose some of it; lossless loses nothing where a type can. level is the effort of
     packing, 0 to 9. TIFF can be packed with compression "none", "lzw", "deflate", "zstd", "jpeg" or "webp"; stand in
     tiles with edges of a multiple of 16; have 64-bit offsets (big), and smaller copies of itself (pyramid). The file
-    stands under its name when it is complete, and not before.
+    stands under its name when it is complete, and not before. ValueError for an unknown type and a wrong option; Error
+    where the file can't be written or pixels have no colours. Alpha that a type lacks is left out, with a warning.
 
     >>> import io, picturezor as pz
     >>> file = io.BytesIO()
@@ -133,7 +135,8 @@ def encode(self, type: str, **options: Any) -> bytes:
 
 @_adds
 def run(self, steps: str, *, progress: Progress | None = None) -> Picture:
-    """Do steps as they are written for the command, with a colon between two or a line for each.
+    """Do steps as they are written for the command, with a colon between two or a line for each. ValueError for
+    what is written wrong, Error for what this picture doesn't allow.
 
     >>> import picturezor as pz
     >>> pz.Picture(40, 30).run("scale --fit 10x10 : rotate --angle 90")
@@ -220,7 +223,7 @@ def _view(picture, where):
 @_adds
 def __getitem__(self, where: Index) -> Any:
     """picture[rows, columns]: a view of a rectangle, from the last row up where rows has the step -1. Of two numbers
-    the pixel's samples.
+    the pixel's samples. IndexError outside of the picture; ValueError for another step, and where nothing is left.
 
     >>> import picturezor as pz
     >>> picture = pz.Picture(8, 6)
@@ -241,7 +244,8 @@ def __getitem__(self, where: Index) -> Any:
 
 @_adds
 def __setitem__(self, where: Index, value: Any) -> None:
-    """Store a sample, the samples of a pixel, an array, or a picture of any format, in a view as above."""
+    """Store a sample, the samples of a pixel, an array, or a picture of any format, in a view as above. ValueError for
+    an array or a picture of another size, Error for a picture whose format has no way to this one."""
     view = _view(self, where)
     if view is None:
         return
@@ -280,7 +284,7 @@ for _name in ("red", "green", "blue", "gray", "alpha", "cyan", "magenta", "yello
 
 @_adds
 def to_pil(self) -> Any:
-    """A copy as a picture of Pillow's: L, LA, RGB, RGBA or CMYK.
+    """A copy as a picture of Pillow's: L, LA, RGB, RGBA or CMYK. Error for inks with alpha, and pixels without colours.
 
     >>> import picturezor as pz
     >>> pz.Picture(4, 3, "BGR").to_pil().mode

@@ -23,7 +23,8 @@ void AddHostPicture(py::module_& module) {
                  RequireSize(width, height);
                  return HostHandle(form ? HostPicture(width, height, *form) : HostPicture(width, height));
                }),
-               arg("width"), arg("height"), arg("form") = py::none(), "A white picture.");
+               arg("width"), arg("height"), arg("form") = py::none(),
+               "A white picture. ValueError for a side that isn't 1 to 32767, and an unknown form.");
   pictures.def_property_readonly(
       "width", [](const HostHandle& self) { return self.Of.Width(); }, "Columns.");
   pictures.def_property_readonly(
@@ -36,14 +37,14 @@ void AddHostPicture(py::module_& module) {
         const AtWork working({&self.At});
         return self.Of.Pixel(x, y);
       },
-      arg("x"), arg("y"), "Red, green and blue. IndexError outside of the picture.");
+      arg("x"), arg("y"), "Red, green and blue, 0 to 255. IndexError outside of the picture.");
   pictures.def(
       "set_pixel",
       [](const HostHandle& self, std::int32_t x, std::int32_t y, Color colour) {
         const AtWork working({&self.At});
         self.Of.SetPixel(x, y, colour);
       },
-      arg("x"), arg("y"), arg("colour"), "IndexError outside of the picture.");
+      arg("x"), arg("y"), arg("colour"), "Store a colour. IndexError outside of the picture.");
   pictures.def(
       "rgb",
       [](const HostHandle& self) {
@@ -54,7 +55,7 @@ void AddHostPicture(py::module_& module) {
         }
         return py::bytes(reinterpret_cast<const char*>(all.data()), all.size());
       },
-      "All pixels, row by row, as red, green and blue.");
+      "All pixels, row by row, as red, green and blue: 3 x width x height bytes.");
   pictures.def(
       "set_rgb",
       [](const HostHandle& self, const py::bytes& data) {
@@ -62,7 +63,7 @@ void AddHostPicture(py::module_& module) {
         const AtWork working({&self.At});
         self.Of.SetRGB({reinterpret_cast<const std::uint8_t*>(all.data()), all.size()});
       },
-      arg("data"), "ValueError for another number of bytes.");
+      arg("data"), "Store all pixels, as rgb() gives them. ValueError for another number of bytes.");
   pictures.def_property_readonly(
       "mask",
       [](const HostHandle& self) -> std::optional<HostHandle> {
@@ -88,7 +89,7 @@ void AddHostPicture(py::module_& module) {
       },
       arg("source"), arg("dest"), arg("part"),
       "Draw a block of a picture into a rectangle of this one, by the nearest pixel. What lies outside is "
-      "left out.");
+      "left out; a size below 1 draws nothing.");
 }
 
 void AddGWorld(py::module_& module) {
@@ -103,7 +104,8 @@ void AddGWorld(py::module_& module) {
             const Bytes row = self.Row(y);
             return py::bytes(reinterpret_cast<const char*>(row.data()), row.size());
           },
-          arg("index"), "The bytes of a row's pixels. IndexError outside of it.");
+          arg("index"),
+          "The bytes of a row's pixels, width x pixel_bytes. IndexError outside of the GWorld.");
 }
 
 void AddCopies(PictureClass& pictures) {
@@ -112,12 +114,16 @@ void AddCopies(PictureClass& pictures) {
     pictures.def(name, Method(name, whole), help);
     pictures.def(name, Method(name, part), arg("rect"), "Of a rectangle (x, y, width, height).");
   };
-  copy("copy_picture", &Picture::CopyPicture, &Picture::CopyPicture, "A new picture of the host.");
+  copy("copy_picture", &Picture::CopyPicture, &Picture::CopyPicture,
+       "A new picture of the host, inks mixed to light. Error for pixels without colours, where nothing of "
+       "the rectangle is left, and beyond 32767 pixels on a side.");
   copy("copy_mask", &Picture::CopyMask, &Picture::CopyMask,
-       "Alpha as a gray picture of the host, white where it is 255.");
+       "Alpha as a gray picture of the host, white where it is 255. Error without alpha, and as "
+       "copy_picture.");
   copy("copy_picture_with_mask", &Picture::CopyPictureWithMask, &Picture::CopyPictureWithMask,
-       "A new picture of the host, its mask made of alpha.");
-  pictures.def("copy_gworld", Method("copy_gworld", &Picture::CopyGWorld), "A new GWorld.");
+       "A new picture of the host, its mask made of alpha; none without alpha. Error as copy_picture.");
+  pictures.def("copy_gworld", Method("copy_gworld", &Picture::CopyGWorld),
+               "A new GWorld of gray, RGB, or RGB with alpha. Error for other colours.");
 }
 
 using Source = const HostPicture&;
@@ -127,7 +133,8 @@ void AddGrayDraws(PictureClass& pictures) {
                         void (Picture::*part)(Source, const Rect&, std::int32_t, std::int32_t) const) {
     pictures.def(
         name, Method(name, whole), arg("picture"), arg("dest"),
-        "One colour of a picture of the host into the gray samples of a rectangle (x, y, width, height).");
+        "One colour of a picture of the host into the gray samples of a rectangle (x, y, width, height). "
+        "Pictures without gray stay as they are.");
     pictures.def(name, Method(name, part), arg("picture"), arg("dest"), arg("source_x"), arg("source_y"),
                  "From a place in the source.");
   };
@@ -166,10 +173,14 @@ void AddHostPictures(py::module_& module, PictureClass& pictures) {
       "The form of the host's pictures that are made from now on.");
   AddCopies(pictures);
   AddGrayDraws(pictures);
-  AddDraws<>(pictures, "draw_picture_rgb", "Draw a picture of the host, without its mask.",
+  AddDraws<>(pictures, "draw_picture_rgb",
+             "Draw a picture of the host, without its mask, unscaled; alpha stays. Gray and inks stay as "
+             "they are.",
              &Picture::DrawPictureRGB, &Picture::DrawPictureRGB, &Picture::DrawPictureRGB,
              &Picture::DrawPictureRGB);
-  AddDraws<bool>(pictures, "draw_masked_picture_rgb", "Draw a picture of the host; its mask becomes alpha.",
+  AddDraws<bool>(pictures, "draw_masked_picture_rgb",
+                 "Draw a picture of the host, unscaled; red of its mask becomes alpha, or 255 less it with "
+                 "invert_mask. No mask counts as white.",
                  &Picture::DrawMaskedPictureRGB, &Picture::DrawMaskedPictureRGB,
                  &Picture::DrawMaskedPictureRGB, &Picture::DrawMaskedPictureRGB, arg("invert_mask") = false);
   AddDraws<bool>(pictures, "draw_masked_picture_apply_mask_rgb",

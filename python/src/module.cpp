@@ -51,7 +51,13 @@ PYBIND11_MODULE(_core, module) {
   Host::Load();
   AddNames(module);
   PictureClass pictures(module, "Picture", py::custom_type_setup(SetBuffer),
-                        "An image of 8-bit samples, in memory or in a mapped file, or a view of one.");
+                        "An image of 8-bit samples, in memory or in a mapped file, or a view of one. A "
+                        "rectangle is (x, y, width, height) in pixels, cut off at the edges; a negative "
+                        "width or height goes to the left or up. A `dest` is as large as the result at "
+                        "least, and has its channels; it is what comes back. Error is raised for what can't "
+                        "be done with these pictures or this memory, IndexError for a row or place outside, "
+                        "ValueError for a closed picture and a wrong value or name, TypeError for another "
+                        "type.");
   AddHostPictures(module, pictures);
   AddPictures(module, pictures);
   AddSamples(pictures);

@@ -21,7 +21,9 @@ void AddConstructors(PictureClass& pictures) {
                  RequireSize(width, height);
                  return Handle(Picture(width, height, format));
                }),
-               arg("width"), arg("height"), arg("format") = rgb, "A picture in memory, all samples 0.");
+               arg("width"), arg("height"), arg("format") = rgb,
+               "A picture in memory, all samples 0. ValueError for a size below 1 or an unknown format, "
+               "Error from 2 GiB on or without memory.");
   pictures.def_static(
       "mapped",
       [](const std::filesystem::path& file, std::int32_t width, std::int32_t height, NamedFormat format,
@@ -32,7 +34,8 @@ void AddConstructors(PictureClass& pictures) {
       },
       arg("file"), arg("width"), arg("height"), arg("format") = rgb, arg("block_size") = 0,
       "A picture in a temporary file, which is created or overwritten and goes away with the picture. About "
-      "block_size bytes of it, at least 16 MiB, are in the address space at a time.");
+      "block_size bytes of it, at least 16 MiB, are in the address space at a time. ValueError for less than "
+      "5 rows; Error for a file that can't be written, or that another picture is on, and without room.");
   pictures.def_static(
       "from_host",
       [](const HostHandle& picture, bool useAlpha) {
@@ -40,7 +43,8 @@ void AddConstructors(PictureClass& pictures) {
         return Handle(Picture(picture.Of, useAlpha));
       },
       arg("picture"), arg("use_alpha") = false,
-      "A picture on the pixels of one of the host, its alpha on the mask's.");
+      "A picture on the pixels of one of the host: what is written to one shows in the other. With use_alpha "
+      "the byte before the colours of 32 bits is alpha. Error but for GWorlds of 24 or 32 bits.");
   pictures.def_static(
       "create",
       [](std::int32_t width, std::int32_t height, NamedFormat format) {
@@ -48,16 +52,22 @@ void AddConstructors(PictureClass& pictures) {
         const AtWork working({});
         return Handle(Picture::Create(width, height, format));
       },
-      arg("width"), arg("height"), arg("format") = rgb, "A picture from the global factory, or in memory.");
+      arg("width"), arg("height"), arg("format") = rgb,
+      "A picture from the global factory, or in memory. ValueError for a size below 1, Error without "
+      "memory.");
   const auto byFormat = [](auto function) {
     return [function](std::int32_t width, std::int32_t height, NamedFormat format) {
       return function(width, height, format);
     };
   };
   pictures.def_static("calculate_memory", byFormat(&Picture::CalculateMemory), arg("width"), arg("height"),
-                      arg("format"), "Bytes that a picture in memory takes; 0 where it can't be.");
+                      arg("format"),
+                      "Bytes that a picture in memory takes; 0 for a size below 1. From 2 GiB on there is "
+                      "none.");
   pictures.def_static("can_allocate", byFormat(&Picture::CanAllocate), arg("width"), arg("height"),
-                      arg("format"), "Whether there is memory for such a picture now.");
+                      arg("format"),
+                      "Whether there is memory for such a picture now. False for a size below 1, and from 4 "
+                      "GiB on.");
   pictures.def(
       "create_picture",
       [](const Handle& self, std::int32_t width, std::int32_t height, NamedFormat format) {
@@ -65,9 +75,12 @@ void AddConstructors(PictureClass& pictures) {
         const AtWork working({&self.At});
         return Handle(Opened(self).CreatePicture(width, height, format), self.From);
       },
-      arg("width"), arg("height"), arg("format"), "A picture from this picture's factory, or in memory.");
+      arg("width"), arg("height"), arg("format"),
+      "A picture from this picture's factory, the global one, or in memory. ValueError for a size below 1, "
+      "Error without memory.");
   pictures.def("clone", Method("clone", &Picture::Clone),
-               "A copy in memory of a picture that is there too; copy() does with every picture.");
+               "A copy in memory of a picture that is there too, else Error; copy() does with every "
+               "picture.");
   pictures.def(
       "close",
       [](const Handle& self) {
@@ -92,12 +105,13 @@ void AddProperties(PictureClass& pictures) {
   Property(pictures, "height", &Picture::Height, "Rows.");
   Property(pictures, "image_format", &Picture::ImageFormat, "The pixel format.");
   Property(pictures, "image_format_string", &Picture::ImageFormatString,
-           "Its name; empty where it has none.");
+           "Its name, empty where it has none; RGBA is called RBBA here.");
   Property(pictures, "pixel_size", &Picture::PixelSize, "Bytes from pixel to pixel.");
   Property(pictures, "row_size", &Picture::RowSize, "Bytes from row to row.");
   Property(pictures, "row_offset", &Picture::RowOffset, "Rows of the store above those of a view.");
   Property(pictures, "total_size", &Picture::TotalSize, "Bytes of all rows.");
-  Property(pictures, "channel_count", &Picture::ChannelCount, "Channels, alpha included.");
+  Property(pictures, "channel_count", &Picture::ChannelCount,
+           "Channels, alpha included; 0 on a picture of the host.");
   Property(pictures, "is_gray", &Picture::IsGray, "Whether its colours are gray.");
   Property(pictures, "is_rgb", &Picture::IsRGB, "Whether its colours are red, green and blue.");
   Property(pictures, "is_cmyk", &Picture::IsCMYK, "Whether its colours are cyan, magenta, yellow and black.");
@@ -121,14 +135,15 @@ void AddProperties(PictureClass& pictures) {
   pictures.def_property(
       "yield_ticks", [](const Handle& self) { return Opened(self).YieldTicks(); },
       [](const Handle& self, std::int32_t ticks) { Opened(self).SetYieldTicks(ticks); },
-      "Least sixtieths of a second between two yields to the host; 0 is never.");
+      "Least sixtieths of a second between two yields to the host; 0 or less is never.");
   pictures.def_property(
       "mapping_block_size", [](const Handle& self) { return Opened(self).MappingBlockSize(); },
       [](const Handle& self, std::int32_t bytes) {
         const AtWork working({&self.At});
         Opened(self).SetMappingBlockSize(bytes);
       },
-      "Bytes of the file that are in the address space at a time.");
+      "Bytes of the file that are in the address space at a time; what is set becomes 16 MiB at least, or "
+      "all of a smaller file, and whole pages. Means nothing for a picture in memory.");
   pictures.def_property_readonly(
       "parent",
       [](const Handle& self) -> std::optional<Handle> {
@@ -184,11 +199,12 @@ void AddViews(PictureClass& pictures) {
   view("magenta_channel", &Picture::MagentaChannel, "A view of the magenta samples, as gray.");
   view("yellow_channel", &Picture::YellowChannel, "A view of the yellow samples, as gray.");
   view("black_channel", &Picture::BlackChannel, "A view of the black samples, as gray.");
-  view("rgb_channels", &Picture::RGBChannels, "A view without alpha.");
-  view("cmyk_channels", &Picture::CMYKChannels, "A view without alpha.");
+  view("rgb_channels", &Picture::RGBChannels, "A view of red, green and blue. Error for other colours.");
+  view("cmyk_channels", &Picture::CMYKChannels, "A view of the four inks. Error for other colours.");
   view("mirrored_view", &Picture::MirroredView, "A view with top and bottom swapped.");
   pictures.def("channel", Method("channel", &Picture::Channel), arg("index"),
-               "A view of the samples at a place in the pixel. IndexError outside of it.");
+               "A view of the samples at a place in the pixel, from 0 on, fillers not counted, as gray. "
+               "IndexError outside of it.");
   pictures.def(
       "_view",
       [](const Handle& self, const Rect& rect, bool upwards) {
@@ -212,7 +228,9 @@ void AddViews(PictureClass& pictures) {
                "A view of the whole.");
   pictures.def(
       "clip_image", Method("clip_image", py::overload_cast<const Rect&>(&Picture::ClipImage, py::const_)),
-      arg("rect"), "A view of a rectangle (x, y, width, height), whose rows are counted as they are stored.");
+      arg("rect"),
+      "A view of a rectangle (x, y, width, height), whose rows are counted as they are stored. Outside of "
+      "the picture it has no rows or columns, and nothing can be done with it.");
 }
 
 PictureFactory FactoryOf(const py::object& function) {
@@ -228,7 +246,9 @@ PictureFactory FactoryOf(const py::object& function) {
 void AddFactories(py::module_& module, PictureClass& pictures) {
   py::class_<PictureFactory>(module, "Factory",
                              "Makes the pictures that operations need: called with width, height and format, "
-                             "it gives a Picture, or None to let the next way be tried.")
+                             "it gives a Picture of at least that size, or None to let the next way be "
+                             "tried. What it raises comes out of the call that asked; TypeError for anything "
+                             "else.")
       .def(py::init(&FactoryOf), arg("function"))
       .def("__eq__", [](const PictureFactory& self, const PictureFactory& other) { return self == other; });
   module.def(
@@ -239,7 +259,8 @@ void AddFactories(py::module_& module, PictureClass& pictures) {
         PictureFactory::SetFactory(factory.value_or(PictureFactory()));
       },
       arg("factory"),
-      "The factory that all pictures are asked from which have none of their own; None for none.");
+      "The factory that all pictures are asked from which have none of their own; None for none. Error while "
+      "other threads work on pictures.");
   pictures.def_property(
       "factory",
       [](const Handle& self) -> std::optional<PictureFactory> {

@@ -295,14 +295,17 @@ void AddRows(PictureClass& pictures) {
       [](const Handle& self, std::int32_t index) {
         return Taken(self, "row", [=](const Picture& picture) { return picture.Row(index); });
       },
-      arg("index"), "The bytes of a stored row, a copy. IndexError outside of the picture.");
+      arg("index"),
+      "The row_size bytes of a stored row, a copy, filler and padding included. IndexError outside of the "
+      "picture.");
   pictures.def(
       "set_row",
       [](const Handle& self, std::int32_t index, const py::buffer& row) {
         Stored(self, row, [=](const Picture& picture, Samples samples) { picture.SetRow(index, samples); });
       },
       arg("index"), arg("row"),
-      "Store a row. IndexError outside of the picture, ValueError for too few bytes.");
+      "Store the first row_size bytes as a row. IndexError outside of the picture, ValueError for too few "
+      "bytes.");
   pictures.def(
       "row_in_format",
       [](const Handle& self, std::int32_t index, NamedFormat format, std::optional<bool> invertAlpha) {
@@ -312,7 +315,9 @@ void AddRows(PictureClass& pictures) {
         });
       },
       arg("index"), arg("format"), arg("invert_alpha") = py::none(),
-      "A row as packed pixels of a format, a copy.");
+      "A row as packed pixels of a format, a copy. Gray becomes all four inks; alpha that the picture lacks "
+      "is 0; with invert_alpha it is 255 less alpha. IndexError outside of the picture, Error where there is "
+      "no way to the format, as between RGB and CMYK.");
   pictures.def(
       "set_row_in_format",
       [](const Handle& self, std::int32_t index, NamedFormat format, const py::buffer& row,
@@ -325,7 +330,8 @@ void AddRows(PictureClass& pictures) {
         });
       },
       arg("index"), arg("format"), arg("row"), arg("invert_alpha") = py::none(),
-      "Store a row of packed pixels of a format. ValueError for too few bytes.");
+      "Store a row of packed pixels of a format. IndexError outside of the picture, ValueError for too few "
+      "bytes, Error between RGB and CMYK. A format without colours stores nothing.");
   pictures.def(
       "row_string_in_format",
       [](const Handle& self, std::int32_t index, NamedFormat format) {
@@ -347,7 +353,9 @@ void AddRows(PictureClass& pictures) {
         return Taken(self, "data_string_in_format",
                      [=](const Picture& picture) { return picture.DataStringInFormat(format); });
       },
-      arg("format"), "All rows as packed pixels of a format, a copy below 2 GiB.");
+      arg("format"),
+      "All rows as packed pixels of a format, a copy below 2 GiB. Error for more, and where there is no way "
+      "to the format.");
   pictures.def(
       "set_data_string_in_format",
       [](const Handle& self, NamedFormat format, const py::buffer& data) {
@@ -356,7 +364,8 @@ void AddRows(PictureClass& pictures) {
         });
       },
       arg("format"), arg("data"),
-      "Store all rows from packed pixels of a format. ValueError for too few bytes.");
+      "Store all rows from packed pixels of a format, below 2 GiB. ValueError for too few bytes, Error "
+      "between RGB and CMYK. A format without colours stores nothing.");
 }
 
 }
@@ -375,7 +384,8 @@ void AddSamples(PictureClass& pictures) {
       "from_array", FromArray, arg("array"), arg("format") = py::none(),
       "A picture on the memory of an array of uint8, rows x columns (x channels): what is written to one "
       "shows in the other. The pixels of a row must lie side by side; rows may be apart, and upwards. "
-      "Without a format 1 to 5 channels are G, GA, RGB, RGBA and CMYKA.");
+      "Without a format 1 to 5 channels are G, GA, RGB, RGBA and CMYKA. ValueError for other arrays, and for "
+      "read-only ones.");
   pictures.def(
       "to_array", [](const Handle& self) { return ReadRows(self, 0, Opened(self).Height()); },
       "A copy of the samples: rows x columns, and x channels where there is more than one, in the order of "
@@ -384,8 +394,8 @@ void AddSamples(PictureClass& pictures) {
   pictures.def("_read_rows", ReadRows, arg("first"), arg("count"));
   pictures.def("_write_rows", WriteRows, arg("first"), arg("rows"));
   pictures.def("raw_row", RawRow, arg("index"),
-               "The stored row itself, filler and padding included, as an array on it. ValueError for a "
-               "mapped picture.");
+               "The stored row itself, filler and padding included, as an array on it. IndexError outside of "
+               "the picture, ValueError for a mapped one.");
   pictures.def_property_readonly(
       "memory", Memory, "The store as an array on its bytes, or None. ValueError for a mapped picture.");
   pictures.def_property_readonly("memory_target", MemoryTarget,

@@ -51,17 +51,18 @@ class Host {
     std::vector<std::string> Hidden{};
     /// How its pictures hold their pixels. The module takes the first one that it meets for all.
     PictureForm Pictures = PictureForm::GWorld32;
-    /// Bytes of a pixel in a new GWorld of 24 bits, 3 or 4.
+    /// Bytes of a pixel in a new GWorld of 24 bits, 3 or 4; not checked.
     int BytesOfDepth24 = 3;
   };
 
   ///@{
-  /// Loads the module; once more with the same path does nothing. Throws ModuleError.
+  /// Loads the module; once more with the same path does nothing, whatever the options. Throws ModuleError
+  /// for a file that isn't a module, and where another one is loaded already.
   static void Load(const std::filesystem::path& module, const Options& options);
   static void Load(const std::filesystem::path& module) { Load(module, Options()); }
   ///@}
   /// Loads the module named by the environment variable PICTUREZOR_MODULE, or else the one beside this
-  /// library or program, or where an installation puts it.
+  /// library or program, or where an installation puts it. Throws ModuleError where there is none.
   static void Load();
   /// Whether a module has been loaded; it stays so.
   static bool IsLoaded();
@@ -90,12 +91,12 @@ class Host {
     /// Descriptions of pictures that are open, GWorlds, and times that pixels were locked and not unlocked.
     int OpenDescriptions = 0, GWorlds = 0, PixelLocks = 0;
     ///@}
-    /// All of them.
+    /// Whether all of them are equal.
     bool operator==(const Alive&) const = default;
   };
   /// What is alive now, counted over all threads.
   static Alive Count();
-  /// Objects of one class that are alive.
+  /// Objects of one class that are alive; 0 for an unknown class.
   static int CountOf(std::string_view className);
 
   /// A row as the module declares it.
@@ -124,9 +125,10 @@ class Host {
   static std::vector<MethodInfo> SharedMethods(std::string_view className);
   static std::vector<PropertyInfo> Properties(std::string_view className);
   ///@}
-  /// The value of a constant, as its declaration says. Throws ModuleError for an unknown one.
+  /// The value of a constant, as its declaration says. Throws ModuleError for an unknown class or constant.
   static std::int64_t Constant(std::string_view className, std::string_view name);
-  /// The names of a class's constants with their values, as the module declares them.
+  /// The names of a class's constants with their values, as the module declares them. Throws ModuleError for
+  /// an unknown class.
   static std::vector<std::string> ConstantDeclarations(std::string_view className);
 };
 

@@ -12,7 +12,7 @@ struct Color {
   ///@}
   /// 0xRRGGBB.
   std::int32_t Packed() const { return Red << 16 | Green << 8 | Blue; }
-  /// All three.
+  /// Whether all three are equal.
   bool operator==(const Color&) const = default;
 };
 
@@ -27,7 +27,7 @@ class HostPicture : public Object {
   explicit HostPicture(Object object) : Object(std::move(object)) {}
   ///@{
   /// A white picture in the form of this host's pictures, or in one of its own. Throws std::invalid_argument
-  /// for a size that can't be.
+  /// for a side that isn't 1 to 32767.
   HostPicture(std::int32_t width, std::int32_t height);
   HostPicture(std::int32_t width, std::int32_t height, PictureForm form);
   ///@}
@@ -45,8 +45,8 @@ class HostPicture : public Object {
   void SetPixel(std::int32_t x, std::int32_t y, Color color) const;
   ///@}
   ///@{
-  /// All pixels, row by row, as red, green and blue. Throws std::invalid_argument for another number of
-  /// bytes.
+  /// All pixels, row by row, as red, green and blue: 3 x `Width` x `Height` bytes. Throws
+  /// std::invalid_argument for another number of them.
   Bytes RGB() const;
   void SetRGB(std::span<const std::uint8_t> bytes) const;
   ///@}
@@ -56,13 +56,14 @@ class HostPicture : public Object {
   /// The mask, made white where there was none. Throws std::bad_alloc.
   HostPicture MakeMask() const;
   /// Draws a block of a picture, `sourceWidth` x `sourceHeight` at `sourceX`, `sourceY`, into `width` x
-  /// `height` at x, y, by the nearest pixel. Masks play no part; what lies outside of either is left out.
+  /// `height` at x, y, by the nearest pixel. Masks play no part; what lies outside of either is left out, and
+  /// a size below 1 draws nothing.
   void Draw(const HostPicture& source, std::int32_t x, std::int32_t y, std::int32_t width,
             std::int32_t height, std::int32_t sourceX, std::int32_t sourceY, std::int32_t sourceWidth,
             std::int32_t sourceHeight) const;
 };
 
-/// Pixels in QuickDraw's way, as `CopyGWorld` makes them.
+/// Pixels in QuickDraw's way, as `CopyGWorld` makes them. Calling a member on nil throws ModuleError.
 class GWorld : public Object {
  public:
   /// Nil.
@@ -79,7 +80,7 @@ class GWorld : public Object {
   std::int32_t Depth() const;
   /// Bytes of a pixel, 1 to 4.
   std::int32_t PixelBytes() const;
-  /// A row's pixels. Throws std::out_of_range.
+  /// A row's pixels, `Width` x `PixelBytes` bytes. Throws std::out_of_range outside the GWorld.
   Bytes Row(std::int32_t y) const;
 };
 

@@ -54,7 +54,7 @@ class MemoryBlock : public Object {
   MemoryBlock() = default;
   /// The block that an object of the host is.
   explicit MemoryBlock(Object object) : Object(std::move(object)) {}
-  /// A zeroed block.
+  /// A zeroed block of so many bytes. Throws std::bad_alloc.
   explicit MemoryBlock(std::size_t size);
   /// A copy of these bytes.
   explicit MemoryBlock(std::span<const std::uint8_t> bytes);
@@ -68,9 +68,9 @@ class MemoryBlock : public Object {
   /// The bytes of the block. One over memory of the module knows no size of its own: 0 unless `Limit` has
   /// told it.
   std::span<std::uint8_t> Data() const;
-  /// The first byte.
+  /// The first byte; null for nil.
   std::uint8_t* Start() const;
-  /// Tells how many bytes from the start may be used.
+  /// Tells how many bytes from the start may be used; not checked.
   void Limit(std::size_t size);
 };
 
@@ -79,7 +79,7 @@ class FolderItem : public Object {
  public:
   /// Nil.
   FolderItem() = default;
-  /// The file of this path.
+  /// The file of this path; a relative one counts from the working directory of now.
   explicit FolderItem(const std::filesystem::path& path);
 };
 

@@ -123,10 +123,11 @@ class Picture : public Object {
   Picture() = default;
   /// The picture that an object of the class is; nothing is checked.
   explicit Picture(Object object) : Object(std::move(object)) {}
-  /// Zeroed samples in memory, below 2 GiB.
+  /// Zeroed samples in memory, at least 1 x 1 and below 2 GiB. Rows start 64 bytes apart, or a multiple of
+  /// it.
   Picture(std::int32_t width, std::int32_t height, Format format);
-  /// Over somebody's memory, `rowSize` bytes from row to row. Throws std::invalid_argument where the block is
-  /// too small for it.
+  /// Over somebody's memory, `rowSize` bytes from row to row, below 4 GiB together. Throws
+  /// std::invalid_argument where the block is too small for it. Not `Valid` for nil or a negative `rowSize`.
   Picture(const MemoryBlock& block, std::int32_t width, std::int32_t height, Format format,
           std::int32_t rowSize);
   /// Zeroed samples in a block of the host's: in memory too, but below 4 GiB where addresses have 64 bits.
@@ -138,8 +139,9 @@ class Picture : public Object {
   /// colours is alpha.
   explicit Picture(const HostPicture& picture, bool useAlpha = false);
   /// In a temporary file, which is created or overwritten and goes away with the last picture using it. About
-  /// `blockSize` bytes of it, at least 16 MiB and five rows, are in the address space at a time. Needs 5
-  /// rows.
+  /// `blockSize` bytes of it, at least 16 MiB and five rows, are in the address space at a time. Not `Valid`
+  /// with less than 5 rows, without room on the disk, and for a file that can't be written or that another
+  /// picture is on.
   static Picture Mapped(const std::filesystem::path& file, std::int32_t width, std::int32_t height,
                         Format format, std::int32_t blockSize = 0);
 
@@ -148,14 +150,17 @@ class Picture : public Object {
   /// A new picture through this picture's factory, the global one, or in memory; nil for a size or format
   /// that can't be had.
   Picture CreatePicture(std::int32_t width, std::int32_t height, Format format) const;
-  /// Bytes that a picture in memory takes; 0 for a size or format that is refused.
+  /// Bytes that a picture in memory takes, also where they are more than one may have; 0 for a size below 1,
+  /// a row from 2 GiB on, and a code that isn't a format.
   static std::int64_t CalculateMemory(std::int32_t width, std::int32_t height, Format format);
-  /// Whether these bytes and a MiB more can be had now; false from 4 GiB on.
+  /// Whether these bytes and a MiB more can be had now; false for a size or format that is refused, and from
+  /// 4 GiB on.
   static bool CanAllocate(std::int32_t width, std::int32_t height, Format format);
 
   /// Ends the picture now. Views on it go on working.
   void Close() const;
-  /// A copy in memory; nil for a mapped picture, one that isn't `Valid`, or without memory.
+  /// A copy in memory, without this picture's factory and settings; nil for a mapped picture, one that isn't
+  /// `Valid`, or without memory.
   Picture Clone() const;
 
   // Properties.
@@ -168,7 +173,8 @@ class Picture : public Object {
   std::int32_t Height() const;
   /// The pixel format.
   Format ImageFormat() const;
-  /// The format's name, such as "RGBA"; empty for one without a name.
+  /// The format's name, such as "ARGB"; "RBBA" for RGBA, "Scaling" for all eight of those, "Unknown" for 0,
+  /// empty for one without a name.
   std::string ImageFormatString() const;
   /// Bytes of a pixel, 1 to 8.
   std::int32_t PixelSize() const;
@@ -178,7 +184,7 @@ class Picture : public Object {
   std::int32_t RowOffset() const;
   /// `RowSize` times the rows of the store, which a view has from its parent.
   std::int64_t TotalSize() const;
-  /// Channels of a pixel, fillers not counted.
+  /// Channels of a pixel, 0 to 5, fillers not counted. Over a host picture 0.
   std::int32_t ChannelCount() const;
   ///@{
   /// Which colours the pixels have: gray, red, green and blue, or inks. At most one of them is true.
@@ -218,12 +224,13 @@ class Picture : public Object {
   bool BooleanProperty(std::string_view name) const;
   ///@}
   ///@{
-  /// The bytes of a window of a mapped picture, as rounded by the module.
+  /// The bytes of a window of a mapped picture: what is set becomes at least 16 MiB and five rows, at most
+  /// the picture, and whole pages. Means nothing to others.
   std::int32_t MappingBlockSize() const;
   void SetMappingBlockSize(std::int32_t bytes) const;
   ///@}
   ///@{
-  /// Least sixtieths of a second between two yields to the host; 0 is never.
+  /// Least sixtieths of a second between two yields to the host; 0 or less, as at first, is never.
   std::int32_t YieldTicks() const;
   void SetYieldTicks(std::int32_t ticks) const;
   ///@}
@@ -260,9 +267,10 @@ class Picture : public Object {
   ///@}
   ///@{
   /// A row as packed pixels of a format, `Width` times its `BytesPerPixel` bytes. Red, green and blue become
-  /// gray by (77 r + 151 g + 28 b) / 256, gray becomes all three or all four inks, black becomes gray. Empty,
-  /// or nothing set, where there is no way to that format; between RGB and CMYK HostException. With
-  /// `invertAlpha` alpha becomes 255 less alpha.
+  /// gray by (77 r + 151 g + 28 b) / 256, gray becomes all three or all four inks, black becomes gray. Alpha
+  /// goes along where both have it, with `invertAlpha` as 255 less it; otherwise it is 0 in a row that is
+  /// made, and stays in one that is set, like fillers. Empty, or nothing set, where there is no way to that
+  /// format; between RGB and CMYK HostException.
   Bytes RowInFormat(std::int32_t index, Format format) const;
   Bytes RowInFormat(std::int32_t index, Format format, bool invertAlpha) const;
   void SetRowInFormat(std::int32_t index, Format format, std::span<const std::uint8_t> bytes) const;
@@ -310,7 +318,8 @@ class Picture : public Object {
   /// The picture with its rows in reverse order.
   Picture MirroredView() const;
 
-  // Into new host pictures, of the whole picture or a part of it; nil where it fails.
+  // Into new host pictures, of the whole picture or a part of it; inks are mixed to light. Nil for pixels
+  // without colours, where nothing of the part is left, beyond 32767 pixels on a side, or without memory.
 
   ///@{
   /// The colours.
@@ -327,11 +336,13 @@ class Picture : public Object {
   HostPicture CopyPictureWithMask() const;
   HostPicture CopyPictureWithMask(const Rect& rect) const;
   ///@}
-  /// Gray, RGB, or RGB with alpha in a GWorld of its own; nil for other colours.
+  /// Gray, RGB, or RGB with alpha in a GWorld of its own; nil for other colours, beyond 65535 pixels on a
+  /// side, or without memory.
   GWorld CopyGWorld() const;
 
   // From host pictures, without scaling: all of one, or a block of it from `sourceX`, `sourceY` on, to the
-  // place and with the size of `dest`, cut off at both pictures' edges. Nothing changes where it fails.
+  // place and with the size of `dest`, cut off at both pictures' edges. Nothing changes where it fails, on a
+  // picture of other colours, and for nil.
 
   ///@{
   /// One colour of `picture` into the gray channel.
@@ -380,21 +391,25 @@ class Picture : public Object {
   ///@{
   /// Resamples `source` into the top left `width` x `height` pixels of this picture, along the rows and then
   /// along the columns. Colours are converted as by `RowInFormat`; alpha takes part where both pictures have
-  /// it. `temp` is nil, or a picture that keeps what stands between the passes: of the pixel size that the
-  /// pair asks for, at least `width` wide and as high as `source`. False where the formats have no way to
-  /// each other, the size is below 1 or passes this picture, or memory fails. `ScaleMT` works on a number of
-  /// threads: 0 for one a processor, 32 at most, with the same result.
+  /// it. `temp` is nil, or a picture that keeps what stands between the passes: no view, at least `width`
+  /// wide and as high as `source`, with pixels of 4 bytes where this picture is RGB, and otherwise of a byte
+  /// for each colour of this picture and for alpha where it takes part. False where the formats have no way
+  /// to each other, the size is below 1 or passes this picture, `temp` doesn't fit, or memory fails.
+  /// `ScaleMT` works on a number of threads, with the same result: 0 is one a processor, 32 the most, and
+  /// below 0 or with a mapped picture the caller does it alone.
   bool Scale(const Picture& source, const Picture& temp, Kernel kernel, std::int32_t width,
              std::int32_t height) const;
   bool ScaleMT(std::int32_t threads, const Picture& source, const Picture& temp, Kernel kernel,
                std::int32_t width, std::int32_t height) const;
   ///@}
-  /// The nearest pixel of `source` for each, at the truncated place. The size is cut to this picture's. False
-  /// when nothing is left of it, and where the formats have no way to each other.
+  /// The nearest pixel of `source` for each, at the truncated place. The size is cut to this picture's.
+  /// Colours are converted as by `CopyPixels`. False when nothing is left of the size, where the formats have
+  /// no way to each other, for inks without alpha, and for gray without alpha to inks with it.
   bool ScaleFast(const Picture& source, std::int32_t width, std::int32_t height) const;
 
-  // Geometry. A nil `dest` makes a new picture; a given one is large enough for the result and has this
-  // picture's channels. The result is the destination, or nil where it fails.
+  // Geometry. A nil `dest` makes a new picture; a given one is another picture, large enough for the result,
+  // with this picture's channels. The result is the destination; nil for another `dest`, a picture that isn't
+  // `Valid`, or without memory. Pixels without colours aren't moved.
 
   /// Swaps left and right, in place.
   void HMirror() const;
@@ -425,15 +440,19 @@ class Picture : public Object {
     ///@}
   };
   ///@{
-  /// By degrees counter-clockwise, into a new picture that holds all of it. Right angles are exact, and 0
-  /// gives the picture itself; others are three shears. Nil for an angle that isn't finite.
+  /// By degrees counter-clockwise, any number of them, into a new picture that holds all of it. Right angles
+  /// are exact, and whole turns give the picture itself; others are three shears, alpha like a colour, and
+  /// without `background` the corners are 0. Nil for an angle that isn't finite, for pixels without colours
+  /// but by right angles, or without memory.
   Picture Rotate(double angle) const;
   Picture Rotate(double angle, const Background& background) const;
   ///@}
 
-  // Filters. A nil `dest` makes a new picture, and the picture itself may be the `dest` but where it is said;
-  // the result is the destination, or nil where it fails. Colours that a filter doesn't serve are left as
-  // they are.
+  // Filters. A nil `dest` makes a new picture of this size and format. A given one is at least as large and
+  // has the channels that are written, in any order; it may be the picture itself but where it is said. The
+  // result is the destination; nil for another `dest`, a picture that isn't `Valid`, or without memory for a
+  // new one. Colours that a filter doesn't serve, and alpha where it is left out, stay as they are in `dest`;
+  // in a new picture they are 0.
 
   ///@{
   /// 255 less each sample, alpha included, in place.
@@ -442,27 +461,32 @@ class Picture : public Object {
   ///@}
   ///@{
   /// Stretches the levels of red, green and blue alike, in place, so that about half a percent of the pixels
-  /// becomes black and as many white. False for other colours, and for an empty rectangle.
+  /// becomes black and as many white. Alpha stays. False for other colours, and where nothing of the
+  /// rectangle is left.
   bool AutoLevel() const;
   bool AutoLevel(const Rect& rect) const;
   ///@}
-  /// Darkest in the middle and bright at both ends, all channels alike, alpha included.
+  /// Darkest in the middle and bright at both ends: 0 and 255 become 255, 127 and 128 become 0. All channels
+  /// alike, alpha included.
   Picture SolarizeFilter(const Picture& dest = {}) const;
   ///@{
-  /// 255 (v / 255)^(1 / gamma), for gray and RGB; above 1 lightens. Alpha is left out but where it has a
-  /// gamma of its own. Of three gammas gray takes a weighted mean of their whole parts.
+  /// 255 (v / 255)^(1 / gamma), for gray and RGB; above 1 lightens. A gamma is above 0: with 0 all but 255
+  /// becomes 0, and below 0 everything 255. Alpha is left out but where it has a gamma of its own. Of three
+  /// gammas gray takes a weighted mean of their whole parts, so 0 where all are below 1.
   Picture GammaFilter(const Picture& dest, double gamma) const;
   Picture GammaFilter(const Picture& dest, double gamma, double alphaGamma) const;
   Picture GammaFilter(const Picture& dest, double redGamma, double greenGamma, double blueGamma) const;
   Picture GammaFilter(const Picture& dest, double redGamma, double greenGamma, double blueGamma,
                       double alphaGamma) const;
   ///@}
-  /// An S-shaped curve, steeper with more `gain`, and one that lightens with more `bias`; 0.5 and 0.5 change
-  /// nothing but for rounding. For gray and RGB, alpha included.
+  /// An S-shaped curve, steeper with more `gain`, and one that lightens with more `bias`, both between 0 and
+  /// 1 without the ends; 0.5 and 0.5 change nothing but for rounding. Other numbers aren't refused, but give
+  /// no such curve. For gray and RGB, alpha included.
   Picture GainFilter(const Picture& dest, double gain, double bias) const;
   ///@{
   /// Each sample v becomes the low 8 bits of element v of the channel's array; what an array doesn't have is
-  /// 0. For gray and RGB; gray takes the `green` of three. Alpha is left out but where it has an array.
+  /// 0, nil has nothing, and elements behind the 256th don't count. For gray and RGB; gray takes the `green`
+  /// of three. Alpha is left out but where it has an array.
   Picture TransferFilter(const Picture& dest, const IntegerArray& gray) const;
   Picture TransferFilter(const Picture& dest, const IntegerArray& gray, const IntegerArray& alpha) const;
   Picture TransferFilter(const Picture& dest, const IntegerArray& red, const IntegerArray& green,
@@ -471,10 +495,12 @@ class Picture : public Object {
                          const IntegerArray& blue, const IntegerArray& alpha) const;
   ///@}
   ///@{
-  /// Convolution with a square of weights, `dimension` on a side (50 at most), row by row, the middle being
-  /// the sample itself; beyond the edges the nearest sample counts. The result is (sum + delta) scaleFactor;
-  /// without them delta is 0 and the factor 1. A weight of 255 or more leaves its place out. Alpha is treated
-  /// like a colour.
+  /// Convolution with a square of weights, 1 to 50 on a side, row by row, the middle being the sample itself;
+  /// an even square has one more row and column before it. Beyond the edges the nearest sample counts. The
+  /// result is (sum + delta) scaleFactor, truncated, and 0 to 255 at most; without them delta is 0 and the
+  /// factor 1. A weight of 255 or more leaves its place out, and those that `matrix` doesn't have are 0.
+  /// Alpha is treated like a colour. Nil above 50; below 1 the sum is 0. With the picture itself for `dest`
+  /// pixels are read as those before them have left them.
   Picture ApplyMatrix(const Picture& dest, std::int32_t dimension, const IntegerArray& matrix) const;
   Picture ApplyMatrix(const Picture& dest, std::int32_t dimension, const IntegerArray& matrix,
                       std::int32_t delta) const;
@@ -482,42 +508,56 @@ class Picture : public Object {
                       std::int32_t delta, double scaleFactor) const;
   ///@}
   ///@{
-  /// The mean of the 2 r + 1 rows and then columns around each sample, r being the radius without its
-  /// fraction, once or `iterations` times; either direction may be left out. `dest` may not be the picture
-  /// itself. With several iterations the result is a new picture, with none the picture itself.
+  /// The mean of the 2 r + 1 rows and then columns around each sample, truncated, r being the radius in
+  /// pixels without its fraction, once or `iterations` times; beyond the edges the nearest sample counts. A
+  /// radius below 1 copies. Either direction may be left out; without both nothing is written. Alpha is
+  /// treated like a colour. `dest` may not be the picture itself: nil. With several iterations the result is
+  /// a new picture, and `dest` has the first; with less than 1 it is the picture itself.
   Picture BoxBlurFilter(const Picture& dest, double radius) const;
   Picture BoxBlurFilter(const Picture& dest, double radius, bool vertical, bool horizontal) const;
   Picture BoxBlurFilter(const Picture& dest, double radius, std::int32_t iterations) const;
   Picture BoxBlurFilter(const Picture& dest, double radius, std::int32_t iterations, bool vertical,
                         bool horizontal) const;
   ///@}
-  /// A blur by less than a pixel: the neighbours count by the radius' fraction.
+  /// A blur by less than a pixel: the neighbours count by the fraction of the radius, so 2.5 is as 0.5, and a
+  /// whole number copies. Alpha is treated like a colour. Nil for pixels without colours.
   Picture BoxBlurFractionalFilter(const Picture& dest, double radius) const;
-  /// Two colours with a step between them where the picture, blurred by `radius`, passes `threshold`; the
-  /// step is `softness` wide, both with 1 for 255. Gives a new picture without alpha; `dest`, which may not
-  /// be the picture itself, receives the first blur.
+  /// Two colours with a step between them where the picture, blurred three times by a third of `radius`,
+  /// passes `threshold`; the step is `softness` wide, 0 for a hard one, both with 1 for 255. A radius below 3
+  /// doesn't blur. For gray, which takes the green of the colours, and RGB. Gives a new picture, alpha left
+  /// out; `dest`, which may not be the picture itself, receives the first blur.
   Picture StampFilter(const Picture& dest, double radius, double threshold, double softness, Color black,
                       Color white) const;
   /// Pushes each sample away from that of `original`, a blurred copy as a rule, by 4 `amount` times their
-  /// difference, in place; differences below `threshold` (in sample values) are left alone. False unless both
-  /// have one size and format.
+  /// difference, in place, alpha included; an `amount` of 0 changes nothing, and one below 0 goes the other
+  /// way. Differences below `threshold` (in sample values) are left alone, with 0 or less none. False unless
+  /// both are `Valid` and have one size and format.
   bool UnsharpFilter(const Picture& original, double amount, std::int32_t threshold) const;
-  /// The mean of the most frequent among `levels` classes of values (1 to 256) within `range` pixels. Nil for
-  /// a `dest` with pixels of another size.
+  /// The mean of the most frequent among `levels` classes of values within `range` pixels, alpha like a
+  /// colour. `levels` are 1 to 256, and others count as the nearer of these; a `range` below 0 counts as 0,
+  /// which changes nothing. Nil for a `dest` with pixels of another size. `dest` as in `ApplyMatrix`.
   Picture OilFilter(const Picture& dest, std::int32_t levels, std::int32_t range) const;
-  /// Each pixel from a place up to `level` columns and rows away, by the process's `rand`. For gray and RGB.
+  /// Each pixel from a place up to `level` columns and rows away, or from the edge where that is nearer, by
+  /// the process's `rand`. A `level` below 0 counts as 0, which copies. For gray and RGB, alpha included.
+  /// `dest` as in `ApplyMatrix`.
   Picture DiffuseFilter(const Picture& dest, std::int32_t level) const;
-  /// 128 and the difference to the sample `level` columns and rows further on. For gray and RGB.
+  /// 128 and the difference to the sample `level` columns and rows further on, or back below 0, or at the
+  /// edge where that is nearer; 0 to 255 at most. For gray and RGB, alpha included. `dest` as in
+  /// `ApplyMatrix`.
   Picture EngraveFilter(const Picture& dest, std::int32_t level) const;
-  /// Edges: the root of 2 (a^2 + b^2) of the differences to the samples below and to the right.
+  /// Edges: the root of 2 (a^2 + b^2), at most 255, of the differences to the samples below and to the right,
+  /// alpha like a colour. Below the last row lies 0.
   Picture NeonFilter(const Picture& dest = {}) const;
-  /// Ordered dithering to `levels` evenly spaced values, 2 to 256. For gray and RGB.
+  /// Ordered dithering to `levels` evenly spaced values, 2 to 256; others count as the nearer of these. For
+  /// gray and RGB, alpha included. A number that isn't one of the matrices leaves `dest` as it is.
   Picture DitherFilter(const Picture& dest, DitherMatrix matrix, std::int32_t levels) const;
 
-  // Composition, in place. Without a rectangle all of the picture.
+  // Composition, in place. Without a rectangle all of the picture. What lies outside the picture is left out,
+  // and nothing is done to one that isn't `Valid`.
 
   ///@{
-  /// The low 8 bits of a value into every sample, alpha included; filler bytes stay.
+  /// The low 8 bits of a value into every sample, alpha included; filler bytes, and pixels without colours,
+  /// stay.
   void FillRect(std::int32_t value) const;
   void FillRect(const Rect& rect, std::int32_t value) const;
   ///@}
@@ -535,28 +575,34 @@ class Picture : public Object {
   void FillRectRGB(const Rect& rect, Color color, std::int32_t alpha) const;
   ///@}
   ///@{
-  /// Random samples by the process's `rand`.
+  /// Random samples, alpha included, by the process's `rand`; filler bytes, and pixels without colours, stay.
   void FillRectRandom() const;
   void FillRectRandom(const Rect& rect) const;
   ///@}
   ///@{
-  /// Zeros, filler bytes included.
+  /// Zeros, filler bytes and pixels without colours included.
   void ClearRect() const;
   void ClearRect(const Rect& rect) const;
   ///@}
-  /// The sum of the absolute differences of all samples; -1 when the two can't be compared.
+  /// The sum of the absolute differences of all samples, alpha included, whatever their order in the pixel; 0
+  /// for equal ones. -1 for nil, another size, other colours, alpha in one of the two only, pixels without
+  /// colours, or a picture that isn't `Valid`.
   std::int64_t CompareImages(const Picture& other) const;
   ///@{
-  /// Copies `source`, or a block of it, to a place in this picture, with colours converted as by
-  /// `RowInFormat`, cut off at both pictures' edges. False where the formats have no way to each other, or
-  /// nothing is left.
+  /// Copies `source`, or a block of it of dest's size, to a place in this picture, unscaled and cut off at
+  /// both pictures' edges. Colours are converted as by `RowInFormat`, but that gray becomes black ink alone;
+  /// alpha goes along where both have it, and stays otherwise. False, and nothing changed, for nil, between
+  /// RGB and CMYK, for pixels without colours, or where nothing is left.
   bool CopyPixels(const Picture& source) const;
   bool CopyPixels(const Picture& source, const Rect& dest) const;
   bool CopyPixels(const Picture& source, const Rect& dest, std::int32_t sourceX, std::int32_t sourceY) const;
   ///@}
 
-  /// Lays a block of `image`, from `sourceX`, `sourceY` on, over this picture at dest's place and size. False
-  /// where the two, or the mask, don't fit together.
+  /// Lays a block of `image`, from `sourceX`, `sourceY` on, over this picture at dest's place and size,
+  /// unscaled and cut off at both pictures' edges. With neither a mask nor a colour it is `CopyPixels`;
+  /// otherwise for gray and RGB, and with other colours anywhere nothing is written, though the result is
+  /// true. False, and nothing changed, for a nil `image`, a width or height below 1, a mask of another size
+  /// than the image, a picture that isn't `Valid`, or where nothing is left.
   bool Combine(const Picture& image, const Rect& dest, std::int32_t sourceX, std::int32_t sourceY,
                const CombineOptions& options) const;
 };
@@ -564,13 +610,16 @@ class Picture : public Object {
 /// What decides how much of the destination stays where an image is laid over it: 255 keeps it, 0 takes the
 /// image.
 struct CombineOptions {
-  /// The image's samples have been scaled by their coverage already, so they are added.
+  /// The image's samples have been scaled by their coverage already, so they are added; a sum above 255 keeps
+  /// its low 8 bits.
   bool PreMultipliedSource = false;
-  /// As large as the image; decides alone where it is given.
+  /// As large as the image; decides alone where it is given, colour by colour, and for alpha by its own,
+  /// which counts as 255 where it has none. With the colours below alpha stays.
   Picture Mask{};
-  /// Whether `MaskColour` counts; otherwise it stands for 0.
+  /// Whether `MaskColour` counts; otherwise, where it is given, black stands for it and takes the image.
   bool UseColours = false;
-  /// A flat colour that the image is the mask for, where there is no `MaskColour`.
+  /// A flat colour that the image is the mask for, where there is no `MaskColour`. A pixel of red, green and
+  /// blue counts by their mean.
   std::optional<Color> ForeColour{};
   /// One mask value a channel.
   std::optional<Color> MaskColour{};
@@ -579,7 +628,8 @@ struct CombineOptions {
 /// Makes the pictures that operations need, in the program's own way.
 class PictureFactory : public Object {
  public:
-  /// Gives a picture of at least the size asked for; an empty one lets the next way be tried.
+  /// Gives a picture of at least the size asked for; an empty one, or one that is smaller or not `Valid`,
+  /// lets the next way be tried. An exception that it throws comes out of the call that asked.
   using Handler = std::function<Picture(std::int32_t width, std::int32_t height, Format format)>;
 
   /// None.
