@@ -37,8 +37,7 @@ set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS
   "picturezor (= ${PROJECT_VERSION}), libpng-dev, libjpeg-dev, libtiff-dev, liblcms2-dev")
 # Those that it is built with.
-foreach(pair libwebp:libwebp-dev libjxl:libjxl-dev libheif:libheif-dev libopenjp2:libopenjp2-7-dev
-    openslide:libopenslide-dev libisal:libisal-dev)
+foreach(pair libwebp:libwebp-dev libopenjp2:libopenjp2-7-dev libisal:libisal-dev)
   string(REPLACE ":" ";" pair ${pair})
   list(GET pair 0 library)
   list(GET pair 1 package)

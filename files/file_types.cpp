@@ -1,5 +1,10 @@
 #include "file_types.h"
 
+#include <algorithm>
+
+#include "failure.h"
+#include "temporary_files.h"
+
 namespace picturezor::files {
 
 std::span<const FileType* const> FileTypes() {
@@ -28,6 +33,62 @@ std::span<const FileType* const> FileTypes() {
   };
   // clang-format on
   return all;
+}
+
+namespace {
+
+std::string Listed(const std::vector<std::string>& words) {
+  std::string text;
+  for (std::size_t i = 0; i < words.size(); ++i)
+    text += (i == 0 ? "" : i + 1 == words.size() ? " or " : ", ") + words[i];
+  return text;
+}
+
+/// Null where no type has the ending, and then all that there are.
+const FileType* TypeOfEnding(std::string extension, std::vector<std::string>& endings) {
+  std::ranges::transform(extension, extension.begin(),
+                         [](unsigned char c) { return c >= 'A' && c <= 'Z' ? c + 32 : c; });
+  for (const FileType* type : FileTypes())
+    for (const std::string_view ending : type->Extensions) {
+      if (!type->Create) continue;
+      if (extension == ending) return type;
+      endings.emplace_back(ending);
+    }
+  return nullptr;
+}
+
+}
+
+std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& options) {
+  const Bytes start = input.Start(64);
+  if (start.empty()) throw Failure(input.Name(), "the file is empty");
+  std::vector<std::string> names;
+  for (const FileType* type : FileTypes()) {
+    if (type->Begins(start) && (!type->Is || type->Is(input))) {
+      if (options.Page > 0 && !type->Several)
+        throw Failure(input.Name(), "only the first picture of a file can be read");
+      const bool asItIs = type->InOrder || input.Seekable();
+      const auto& spool = options.TempDirectory.empty() ? DefaultTempDirectory() : options.TempDirectory;
+      std::unique_ptr<ImageReader> reader = type->Open(asItIs ? input : input.Spooled(spool), options);
+      reader->About.Type = type;
+      return reader;
+    }
+    if (!type->Is) names.emplace_back(type->Name);
+  }
+  throw Failure(input.Name(), "not a " + Listed(names) + " image");
+}
+
+const FileType& TypeByExtension(const std::filesystem::path& file) {
+  std::vector<std::string> endings;
+  if (const FileType* type = TypeOfEnding(file.extension().string(), endings)) return *type;
+  throw UsageFailure(file, "the name must end in " + Listed(endings));
+}
+
+const FileType& TypeByName(const std::string& name) {
+  std::vector<std::string> endings;
+  if (const FileType* type = TypeOfEnding('.' + name, endings)) return *type;
+  for (std::string& ending : endings) ending.erase(0, 1);
+  throw UsageFailure("--type: " + name + " isn't " + Listed(endings));
 }
 
 }

@@ -14,6 +14,7 @@
 namespace picturezor::files {
 
 struct FileType;
+struct ReadOptions;
 
 /// Pixels per inch.
 struct Resolution {
@@ -46,6 +47,8 @@ struct ImageInfo {
   std::vector<Extent> Levels;
   /// What the reader had to change or leave out.
   std::vector<std::string> Notes;
+  /// What the file is that was read.
+  const FileType* Type = nullptr;
 };
 
 /// Reads an image file row by row. All failures are thrown as Failure, naming the file.
@@ -53,7 +56,6 @@ class ImageReader {
  public:
   virtual ~ImageReader() = default;
   const ImageInfo& Info() const { return About; }
-  virtual const FileType& Type() const = 0;
   /// Before the first row: a type that can give the picture smaller for less work (JPEG by its transform, a
   /// file with smaller copies of itself) does so, as long as it stays at least this large; the proportions
   /// stay to within a pixel. Info() has the new size then. Other types change nothing.
@@ -73,6 +75,7 @@ class ImageReader {
   virtual void Finish() = 0;
 
  protected:
+  friend std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& options);
   ImageInfo About;
 };
 

@@ -90,7 +90,6 @@ class ProfileReader final : public ImageReader {
     About.Profile = target.Profile;
   }
 
-  const FileType& Type() const override { return Source->Type(); }
   void Reduce(std::int32_t leastWidth, std::int32_t leastHeight) override {
     Source->Reduce(leastWidth, leastHeight);
     Describe();

@@ -16,8 +16,6 @@ class PartReader : public ImageReader {
     About.Height = part.Height;
   }
 
-  const FileType& Type() const override { return Whole->Type(); }
-
   void ReadRow(std::uint8_t* row) override {
     for (; Above < At.Y; ++Above) Whole->ReadRow(Line.data());
     if (At.Width == Whole->Info().Width) return Whole->ReadRow(row);

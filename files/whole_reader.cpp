@@ -19,7 +19,7 @@ void WholeReader::ReadRow(std::uint8_t* row) {
   if (Pixels.empty()) {
     const std::int64_t size = channels * Whole.Width * Whole.Height;
     RequireWithinLimit(From.Name(), size * Needs, Options.MemoryLimit,
-                       std::string("a picture in ") + Type().Name);
+                       std::string("a picture in ") + About.Type->Name);
     Pixels.resize(std::size_t(size));
     Decode(Pixels.data(), Whole);
   }

@@ -21,7 +21,7 @@ int Info(Session& session, const std::filesystem::path& file) {
   const ImageInfo& stored = reader->Info();
   const ImageInfo upright = Upright(stored);
   std::printf("file:        %s\n", file.c_str());
-  std::printf("type:        %s\n", reader->Type().Name);
+  std::printf("type:        %s\n", reader->Info().Type->Name);
   std::printf("size:        %d x %d\n", upright.Width, upright.Height);
   std::printf("pixels:      %s\n", Describe(stored.Pixels).c_str());
   std::printf("bits:        %d a sample\n", stored.Bits);

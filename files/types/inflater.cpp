@@ -95,7 +95,8 @@ void Inflater::Unpack(std::span<const std::uint8_t>& in, std::span<std::uint8_t>
 bool Inflater::Ended() const { return Of->Ended; }
 
 std::uint32_t Inflater::Checksum(std::uint32_t before, std::span<const std::uint8_t> bytes) {
-  return std::uint32_t(crc32_z(before, bytes.data(), bytes.size()));
+  // Without a place zlib takes it for a question.
+  return bytes.empty() ? before : std::uint32_t(crc32_z(before, bytes.data(), bytes.size()));
 }
 
 #endif

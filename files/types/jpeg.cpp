@@ -35,8 +35,6 @@ class JPEGReader : public ImageReader {
   }
   ~JPEGReader() override { jpeg_destroy_decompress(&Jpeg); }
 
-  const FileType& Type() const override { return JPEGType; }
-
   /// The transform gives a half, a quarter or an eighth for less work.
   void Reduce(std::int32_t leastWidth, std::int32_t leastHeight) override {
     const JDIMENSION width = Jpeg.image_width, height = Jpeg.image_height;

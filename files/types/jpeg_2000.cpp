@@ -115,8 +115,6 @@ class JPEG2000Reader : public WholeReader {
     Needs = 1 + 4 * std::int64_t(image->numcomps) / ChannelsOf(About.Pixels) + 4;
   }
 
-  const FileType& Type() const override { return JPEG2000Type; }
-
   /// Half, quarter and so on are the first things that stand in the file.
   void Reduce(std::int32_t leastWidth, std::int32_t leastHeight) override {
     opj_codestream_info_v2_t* info = opj_get_cstr_info(Reading.get());

@@ -76,8 +76,6 @@ class PNGReader : public ImageReader, PNGFile {
   }
   ~PNGReader() override { png_destroy_read_struct(&Png, &Header, nullptr); }
 
-  const FileType& Type() const override { return PNGType; }
-
   void ReadRow(std::uint8_t* row) override {
     const std::size_t size = std::size_t(About.Width) * ChannelsOf(About.Pixels);
     if (Whole.empty())

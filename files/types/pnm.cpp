@@ -38,8 +38,6 @@ class PNMReader : public ImageReader {
     if (!Of.Text()) Line.resize(std::size_t(Of.RowBytes()));
   }
 
-  const FileType& Type() const override { return PNMType; }
-
   void ReadRow(std::uint8_t* row) override {
     const std::int64_t samples = Of.Width * Of.Depth;
     if (!Of.Text() && std::fread(Line.data(), 1, Line.size(), File.get()) != Line.size()) CutOff();

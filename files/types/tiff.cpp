@@ -49,8 +49,6 @@ class TIFFReader : public ImageReader {
     Lines.resize(Planes.size());
   }
 
-  const FileType& Type() const override { return TIFFType; }
-
   bool Select(const Rect& part) override {
     About.Width = part.Width;
     About.Height = part.Height;

@@ -91,8 +91,6 @@ class PageReader final : public ImageReader {
     for (const Place& place : Of.Smaller) About.Levels.push_back(place.Size);
   }
 
-  const FileType& Type() const override { return Reading->Type(); }
-
   void Reduce(std::int32_t leastWidth, std::int32_t leastHeight) override {
     for (auto place = Of.Smaller.rbegin(); place != Of.Smaller.rend(); ++place) {
       if (place->Size.Width < leastWidth || place->Size.Height < leastHeight) continue;

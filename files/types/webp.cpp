@@ -46,7 +46,6 @@ class WebPReader : public WholeReader {
     Needs = Animated ? 3 : 1;
   }
 
-  const FileType& Type() const override { return WebPType; }
 
  private:
   WebPData Data() const { return {File.data(), File.size()}; }

@@ -23,23 +23,45 @@ std::filesystem::path& LoadedModule() {
 std::mutex LoadMutex;
 std::atomic<bool> Loaded = false;
 
-std::filesystem::path InstalledModule() {
-  if (const char* named = std::getenv("PICTUREZOR_MODULE"); named && *named) return named;
-  // The file that this code is in, a shared library or a program that was linked with it.
+/// The file that this code is in, a shared library or a program that was linked with it.
+std::filesystem::path OwnFile() {
   Dl_info code{};
-  dladdr(reinterpret_cast<void*>(&InstalledModule), &code);
+  dladdr(reinterpret_cast<void*>(&OwnFile), &code);
   std::error_code failed;
   auto file = std::filesystem::read_symlink("/proc/self/exe", failed);
   if (code.dli_fname && std::strchr(code.dli_fname, '/')) {
     const auto library = std::filesystem::canonical(code.dli_fname, failed);
     if (!failed) file = library;
   }
-  for (const auto* place : {"PictureZOR.so", "picturezor/PictureZOR.so",
-                            "../" PICTUREZOR_LIBRARY_DIR "/picturezor/PictureZOR.so"})
-    if (const auto module = file.parent_path() / place; std::filesystem::exists(module, failed))
-      return module.lexically_normal();
-  throw ModuleError("the module PictureZOR.so isn't beside " + file.string() +
-                    "; the environment variable PICTUREZOR_MODULE can name it");
+  return file;
+}
+
+/// Where the module and what belongs to it may stand.
+std::vector<std::filesystem::path> Places() {
+  const auto own = OwnFile().parent_path();
+  return {own, own / "picturezor", own / "../" PICTUREZOR_LIBRARY_DIR "/picturezor"};
+}
+
+std::filesystem::path FoundIn(const std::vector<std::filesystem::path>& places,
+                              const std::filesystem::path& file) {
+  std::error_code failed;
+  for (const auto& place : places)
+    if (std::filesystem::exists(place / file, failed)) return (place / file).lexically_normal();
+  return {};
+}
+
+std::filesystem::path NamedModule() {
+  const char* named = std::getenv("PICTUREZOR_MODULE");
+  return named ? named : "";
+}
+
+std::filesystem::path InstalledModule() {
+  if (auto named = NamedModule(); !named.empty()) return named;
+  auto module = FoundIn(Places(), "PictureZOR.so");
+  if (module.empty())
+    throw ModuleError("the module PictureZOR.so isn't beside " + OwnFile().string() +
+                      "; the environment variable PICTUREZOR_MODULE can name it");
+  return module;
 }
 
 std::vector<Host::MethodInfo> InfosOf(const std::vector<MethodEntry>& rows) {
@@ -80,6 +102,13 @@ void Host::Load(const std::filesystem::path& module, const Options& options) {
 void Host::Load() { Load(InstalledModule()); }
 
 bool Host::IsLoaded() { return Loaded; }
+
+std::filesystem::path Host::Beside(const std::filesystem::path& file) {
+  std::vector<std::filesystem::path> places = Places();
+  if (const auto named = NamedModule(); !named.empty()) places.insert(places.begin(), named.parent_path());
+  if (IsLoaded()) places.insert(places.begin(), LoadedModule().parent_path());
+  return FoundIn(places, file);
+}
 
 void Host::OnYield(std::function<void()> hook) {
   auto next = hook ? std::make_shared<const std::function<void()>>(std::move(hook)) : nullptr;

@@ -16,7 +16,6 @@ class FourPixels final : public ImageReader {
     About.Height = 1;
     About.Pixels = format;
   }
-  const FileType& Type() const override { return *FileTypes()[0]; }
   void ReadRow(std::uint8_t* row) override {
     constexpr std::uint8_t pixels[4][4] = {
         {255, 0, 0, 255}, {0, 255, 0, 255}, {0, 0, 255, 128}, {128, 128, 128, 7}};

@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 #include <tiffio.h>
 #include <unistd.h>
+#include <zlib.h>
 
 #include <array>
 #include <cmath>
@@ -90,7 +91,7 @@ TEST(Types, GiveBackWhatTheyTook) {
       const Bytes samples = Waves(info);
       const Bytes file = Written(*type, info, samples, {.Quality = 100, .Lossless = !lossy});
       const Input input = Input::Memory(file, "made");
-      EXPECT_STREQ(OpenImage(input, Generous)->Type().Name, type->Name);
+      EXPECT_STREQ(OpenImage(input, Generous)->Info().Type->Name, type->Name);
       const Bytes read = Read(input);
       EXPECT_LE(MeanDifference(read, samples), lossy ? 2 : 0);
       EXPECT_EQ(ThroughPipe(file), read);
@@ -207,6 +208,84 @@ TEST(Types, TIFFOfSeveralPages) {
     EXPECT_EQ(row, Bytes(std::size_t(width), sample));
   }
   EXPECT_THROW(OpenImage(input, {.MemoryLimit = 64 << 20, .Page = 2}), Failure);
+}
+
+void AppendChunk(Bytes& file, const std::string& name, const Bytes& data) {
+  const auto number = [&](std::uint32_t value) {
+    for (int shift = 24; shift >= 0; shift -= 8) file.push_back(std::uint8_t(value >> shift));
+  };
+  number(std::uint32_t(data.size()));
+  const std::size_t start = file.size();
+  file.insert(file.end(), name.begin(), name.end());
+  file.insert(file.end(), data.begin(), data.end());
+  number(std::uint32_t(crc32(0, &file[start], uInt(file.size() - start))));
+}
+
+Bytes Deflated(const Bytes& data) {
+  uLongf size = compressBound(uLong(data.size()));
+  Bytes stream(size);
+  compress(stream.data(), &size, data.data(), uLong(data.size()));
+  stream.resize(size);
+  return stream;
+}
+
+// Catches pixels that are lost between chunks or between threads, and damage that goes unnoticed.
+TEST(Types, PNGWhoseChunksAreUnusual) {
+  // The larger one is unpacked on another thread.
+  for (const std::int32_t width : {37, 5000}) {
+    constexpr std::int32_t height = 23;
+    const std::size_t rowBytes = std::size_t(width) * 3;
+    Bytes rows;
+    for (std::uint32_t y = 0, random = 1; y < height; ++y) {
+      rows.push_back(0);
+      for (std::size_t i = 0; i < rowBytes; ++i)
+        rows.push_back(std::uint8_t((random = random * 1664525 + 1013904223) >> 24));
+    }
+    const Bytes stream = Deflated(rows);
+    Bytes wrongSum = stream, behind = stream, more = rows;
+    wrongSum.back() ^= 1;
+    behind.resize(behind.size() + 5000);
+    more.resize(more.size() + 300000);
+    const Bytes half(rows.begin(), rows.begin() + std::ptrdiff_t(rows.size() / 2));
+    const struct {
+      const char* Name;
+      Bytes Stream;
+      std::size_t Piece;
+      bool Whole;
+      std::string Between = "IDAT";
+    } cases[] = {
+        {"in one", stream, stream.size(), true},
+        {"in small ones, and empty ones between", stream, 11, true},
+        {"with data behind the stream", behind, 3000, true},
+        {"with more rows", Deflated(more), 100000, true},
+        {"with another sum", wrongSum, stream.size(), false},
+        {"with half of the rows", Deflated(half), stream.size(), false},
+        {"with others between", stream, stream.size() / 2, false, "teXt"},
+    };
+    for (const auto& one : cases) {
+      SCOPED_TRACE(testing::Message() << one.Name << ", " << width);
+      Bytes file{0x89, 'P', 'N', 'G', '\r', '\n', 0x1A, '\n'};
+      AppendChunk(file, "IHDR",
+                  {0, 0, std::uint8_t(width >> 8), std::uint8_t(width), 0, 0, 0, height, 8, 2, 0, 0, 0});
+      for (std::size_t at = 0; at < one.Stream.size(); at += one.Piece) {
+        const auto start = one.Stream.begin() + std::ptrdiff_t(at);
+        AppendChunk(file, "IDAT",
+                    {start, start + std::ptrdiff_t(std::min(one.Piece, one.Stream.size() - at))});
+        AppendChunk(file, one.Between, {});
+      }
+      AppendChunk(file, "IEND", {});
+      if (!one.Whole) {
+        EXPECT_THROW(Read(Input::Memory(file, "odd")), Failure);
+        continue;
+      }
+      Bytes expected;
+      for (std::size_t at = 1; at < rows.size(); at += rowBytes + 1)
+        expected.insert(expected.end(), &rows[at], &rows[at] + rowBytes);
+      EXPECT_TRUE(Read(Input::Memory(file, "odd")) == expected);
+      file[file.size() - 30] ^= 1;
+      EXPECT_THROW(Read(Input::Memory(file, "odd")), Failure);
+    }
+  }
 }
 
 TEST(Types, PNMOfEveryKind) {

@@ -14,7 +14,6 @@ class MadeReader final : public files::ImageReader {
     About.Pixels = file.Of;
     About.Orientation = file.Orientation;
   }
-  const files::FileType& Type() const override { return *files::FileTypes()[0]; }
   bool StartsAnywhere() const override { return Of.StartsAnywhere; }
   bool Select(const Rect& part) override {
     if (!Of.StartsAnywhere) return false;

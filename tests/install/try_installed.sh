@@ -26,6 +26,9 @@ unset PICTUREZOR_MODULE
 export LD_LIBRARY_PATH=$PWD/$libraries PKG_CONFIG_PATH=$PWD/$libraries/pkgconfig CMAKE_PREFIX_PATH=$PWD/usr
 
 usr/bin/picturezor scale lake.jpg --percent 50 --kernel box -o expected.png
+# A type whose code is in a file of its own.
+usr/bin/picturezor convert expected.png --lossless -o expected.jxl
+usr/bin/picturezor compare expected.png expected.jxl
 cmake -S . -B by_cmake >>log
 cmake --build by_cmake >>log
 g++ outside.cpp -o by_pkg_config $(pkg-config --cflags --libs picturezor-files)
@@ -42,8 +45,13 @@ python=usr/lib/python3/dist-packages
 if grep -q '^PICTUREZOR_PYTHON:BOOL=ON' "$build/CMakeCache.txt"; then
   PYTHONPATH=$python /usr/bin/python3 -c "
 import picturezor as pz
-pz.open('lake.jpg').scale(percent=50, kernel='box').save('half.png')"
+half = pz.open('lake.jpg').scale(percent=50, kernel='box')
+assert half.compare_images(pz.open('expected.jxl')) == 0
+half.save('half.png')"
   usr/bin/picturezor compare expected.png half.png
 fi
 PATH=$PWD/usr/bin:$PATH picturezor-batch 'scale --percent 50 --kernel box' lake.jpg -o 'out/{stem}.png' --workers 1 --quiet
 usr/bin/picturezor compare expected.png out/lake.png
+
+rm -r "$libraries/picturezor/types"
+(usr/bin/picturezor info expected.jxl || true) 2>&1 | grep -q 'JPEGXL needs types/jpeg_xl.so'

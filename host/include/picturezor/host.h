@@ -66,6 +66,9 @@ class Host {
   static void Load();
   /// Whether a module has been loaded; it stays so.
   static bool IsLoaded();
+  /// A file that is installed with the module, by its path from there on: looked for beside the module that
+  /// has been loaded, and then where `Load` looks for one. Empty where there is none.
+  static std::filesystem::path Beside(const std::filesystem::path& file);
 
   /// Called when the module lets other host threads run; empty for nothing. An exception that it throws comes
   /// out of the call that yielded, once the module has returned.
