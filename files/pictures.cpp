@@ -40,6 +40,8 @@ std::int64_t MemoryOf(const PictureSize& size) {
   return (std::int64_t{size.Width} * BytesPerPixel(size.Of) + 63) / 64 * 64 * size.Height;
 }
 
+/// Of fewer bytes nobody has to ask whether there is room.
+constexpr std::int64_t FewBytes = 16 << 20;
 /// The module keeps smaller pictures than this in memory of its own, and takes blocks of no more than that.
 constexpr std::int64_t MostOfItsOwn = INT32_MAX, MostOfBlocks = sizeof(void*) > 4 ? UINT32_MAX : INT32_MAX;
 
@@ -162,8 +164,6 @@ std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector
   std::iota(order.begin(), order.end(), 0);
   std::ranges::stable_sort(order, {}, [&](std::size_t i) { return MemoryOf(sizes[i]); });
   std::vector<Picture> pictures(sizes.size());
-  // Of fewer bytes nobody has to ask.
-  constexpr std::int64_t few = 16 << 20;
   std::int64_t used = 0;
   for (const std::size_t i : order) {
     const PictureSize& size = sizes[i];
@@ -172,7 +172,7 @@ std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector
                       (options.Kind == Store::Memory || used + bytes <= options.MemoryLimit);
     if (fits || size.Height < fewestMapped) {
       used += bytes;
-      if (used > few && used > FreeMemory())
+      if (used > FewBytes && used > FreeMemory())
         throw Failure(SizeText(size) + " need " + Megabytes(bytes) + " of memory, more than is free");
       pictures[i] = MakeInMemory(size);
     } else if (options.Kind == Store::Memory) {
@@ -183,6 +183,14 @@ std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector
     }
   }
   return pictures;
+}
+
+Picture MakeToFill(const StoreOptions& options, const PictureSize& size) {
+  // What is larger is as quickly zeroed, and has to be asked for.
+  if (options.Kind != Store::Mapped && MemoryOf(size) <= std::min(FewBytes, options.MemoryLimit))
+    if (const Picture picture = Picture::ToBeFilled(size.Width, size.Height, size.Of); picture.Valid())
+      return picture;
+  return MakePictures(options, {size})[0];
 }
 
 ImageInfo Upright(const ImageInfo& info) {

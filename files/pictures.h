@@ -40,6 +40,9 @@ void RequireRoom(const std::filesystem::path& directory, std::int64_t bytes, con
 /// behind. Throws Failure where there is no room.
 std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector<PictureSize>& sizes);
 
+/// One that is filled completely, so that it need not be zeroed.
+Picture MakeToFill(const StoreOptions& options, const PictureSize& size);
+
 /// The pictures that filters make live where the image does: in temporary files when it is too large. While
 /// this lives, the module asks here.
 struct PicturesLike {

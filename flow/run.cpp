@@ -106,7 +106,7 @@ class Stream {
 
   Picture TakePicture() {
     if (Standing) {
-      const Picture made = files::MakePictures(Options.Stores, {{Of.Width, Of.Height, Of.Of}})[0];
+      const Picture made = files::MakeToFill(Options.Stores, {Of.Width, Of.Height, Of.Of});
       // A view may count its rows another way.
       if (!StandsIn.Parent() && !made.IsMapping()) {
         const BandChain chain(std::exchange(Bands, {}), BandsFrom);

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 #include <limits>
+#include <memory>
 
 #include "invoke.h"
 
@@ -97,6 +98,20 @@ Picture Picture::InBlock(std::int32_t width, std::int32_t height, Format format)
     // The constructor refuses nil.
   }
   return Picture(block, width, height, format, block ? std::int32_t(bytes / height) : 0);
+}
+
+Picture Picture::ToBeFilled(std::int32_t width, std::int32_t height, Format format) {
+  // Of so much the system hands out pages that it has cleared already.
+  constexpr std::int64_t fresh = 32 << 20;
+  const std::int64_t bytes = CalculateMemory(width, height, format);
+  if (bytes <= 0 || bytes >= fresh) return Picture(width, height, format);
+  const auto size = std::size_t(bytes), stride = size / std::size_t(height);
+  const auto memory = std::make_shared_for_overwrite<std::uint8_t[]>(size);
+  const std::size_t used = std::size_t(width) * std::size_t(BytesPerPixel(format));
+  for (std::size_t at = used; at < size && used < stride; at += stride)
+    std::memset(&memory[at], 0, stride - used);
+  return Picture(MemoryBlock::Over({memory.get(), size}, memory), width, height, format,
+                 std::int32_t(stride));
 }
 
 Picture::Picture(const HostPicture& picture, bool useAlpha) : Object(NewPictureObject()) {

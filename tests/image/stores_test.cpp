@@ -265,6 +265,17 @@ TEST(MemoryStore, MayBeABlockOf4GiB) {
   EXPECT_FALSE(Picture::InBlock(0, 5, Format::G).Valid());
 }
 
+// Catches rows that lie otherwise than in a picture of the module's own, and memory of others behind them.
+TEST(Store, OneThatIsToBeFilledHasTheSameRows) {
+  for (const std::int32_t width : {1, 21, 64, 4000}) {
+    const Picture picture = Picture::ToBeFilled(width, 7, Format::RGB), own(width, 7, Format::RGB);
+    EXPECT_TRUE(picture.CopyPixels(own));
+    for (std::int32_t y = 0; y < 7; ++y) EXPECT_EQ(picture.Row(y), own.Row(y)) << width << ' ' << y;
+  }
+  EXPECT_TRUE(Picture::ToBeFilled(6000, 3000, Format::RGBA).Valid());
+  EXPECT_FALSE(Picture::ToBeFilled(0, 5, Format::G).Valid());
+}
+
 TEST(MemoryStore, TakesABlockSizeToo) {
   if (OtherPages()) GTEST_SKIP();
   const Picture picture(10, 9, Format::G);

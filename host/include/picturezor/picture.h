@@ -134,6 +134,9 @@ class Picture : public Object {
   /// Memory is taken as rows are touched. Not `Valid` where there plainly isn't as much. `Clone` gives nil
   /// from 2 GiB on.
   static Picture InBlock(std::int32_t width, std::int32_t height, Format format);
+  /// In memory too, but its samples are whatever they are, for who writes all of them: to clear a picture
+  /// takes about as long as to copy one. Below 2 GiB.
+  static Picture ToBeFilled(std::int32_t width, std::int32_t height, Format format);
   /// Over the pixels of a host picture: what is written to one shows in the other. Only of one in a GWorld of
   /// 24 or 32 bits; of others it isn't `Valid`. In 32 bits `useAlpha` says whether the byte before the
   /// colours is alpha.
