@@ -67,12 +67,6 @@ Picture MakeInMemory(const PictureSize& size) {
   return picture;
 }
 
-std::uint8_t* RowOf(const Picture& picture, std::int32_t y) {
-  const MemoryBlock row = picture.RawRow(y);
-  if (!row) throw Failure("a row of a picture can't be reached");
-  return row.Start();
-}
-
 /// A pixel as one value, so that copying it is one move where the size allows.
 template <int N>
 struct Pixel {
@@ -191,6 +185,12 @@ Picture MakeToFill(const StoreOptions& options, const PictureSize& size) {
     if (const Picture picture = Picture::ToBeFilled(size.Width, size.Height, size.Of); picture.Valid())
       return picture;
   return MakePictures(options, {size})[0];
+}
+
+std::uint8_t* RowOf(const Picture& picture, std::int32_t y) {
+  const MemoryBlock row = picture.RawRow(y);
+  if (!row) throw Failure("a row of a picture can't be reached");
+  return row.Start();
 }
 
 ImageInfo Upright(const ImageInfo& info) {

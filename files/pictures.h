@@ -40,7 +40,7 @@ void RequireRoom(const std::filesystem::path& directory, std::int64_t bytes, con
 /// behind. Throws Failure where there is no room.
 std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector<PictureSize>& sizes);
 
-/// One that is filled completely, so that it need not be zeroed.
+/// One whose samples are anything at all: the caller fills all of them.
 Picture MakeToFill(const StoreOptions& options, const PictureSize& size);
 
 /// The pictures that filters make live where the image does: in temporary files when it is too large. While
@@ -57,6 +57,8 @@ struct PicturesLike {
 
 /// What an image file is once its orientation has been applied.
 ImageInfo Upright(const ImageInfo& info);
+/// The samples of a row of a picture that isn't a view. Throws Failure.
+std::uint8_t* RowOf(const Picture& picture, std::int32_t y);
 /// Where a part of the upright image is stored.
 Rect Stored(const Rect& upright, const ImageInfo& info);
 /// Reads all rows into a picture of the upright size and the file's format.

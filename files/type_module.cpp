@@ -2,6 +2,7 @@
 
 #include <dlfcn.h>
 
+#include <cstring>
 #include <mutex>
 
 #include "failure.h"
@@ -20,7 +21,10 @@ const TypeCode& CodeOf(const char* module, const char* type) {
   void* library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
   const void* code = library ? dlsym(library, (std::string("PictureZORType") + type).c_str()) : nullptr;
   if (!code) throw Failure(needs + path.string() + ": " + dlerror());
-  return *static_cast<const TypeCode*>(code);
+  const auto& found = *static_cast<const TypeCode*>(code);
+  if (std::strcmp(found.Version, PICTUREZOR_VERSION) != 0)
+    throw Failure(needs + path.string() + ", of version " PICTUREZOR_VERSION " and not " + found.Version);
+  return found;
 }
 
 }

@@ -6,6 +6,8 @@ namespace picturezor::files {
 /// The code of a type whose libraries take so long to load that they wait until somebody needs them: it
 /// stands in a module, a file of its own. The members are those of FileType.
 struct TypeCode {
+  /// Of the library that it was built with, which has to be this one.
+  const char* Version;
   bool (*Is)(const Input& input);
   decltype(FileType::Open) Open;
   decltype(FileType::Create) Create;

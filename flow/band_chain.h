@@ -1,5 +1,4 @@
 #pragma once
-#include <span>
 #include <vector>
 
 #include "operation.h"

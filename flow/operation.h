@@ -36,7 +36,7 @@ struct Dependence {
   /// The first row that `Apply` gives of a band is a multiple of this in the whole result, where the work
   /// repeats itself from row to row.
   std::int32_t Period = 1;
-  /// Whether bands of the source come back as they were. The result may show them.
+  /// Whether the source comes back as it was. The result of bands may show it.
   bool KeepsSource = false;
 };
 

@@ -146,10 +146,4 @@ Picture OverRows(const RowBlock& rows, const Shape& shape) {
                  std::int32_t(rows.Stride));
 }
 
-std::uint8_t* RowOf(const Picture& picture, std::int32_t y) {
-  const MemoryBlock row = picture.RawRow(y);
-  if (!row) throw files::Failure("a row of a picture can't be reached");
-  return row.Start();
-}
-
 }

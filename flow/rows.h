@@ -63,7 +63,6 @@ RowSource RowsOf(const Picture& picture, const Shape& shape);
 
 /// A picture of rows that stand in memory for longer than it.
 Picture OverRows(const RowBlock& rows, const Shape& shape);
-/// The samples of a row of a picture that isn't a view.
-std::uint8_t* RowOf(const Picture& picture, std::int32_t y);
+using files::RowOf;
 
 }

@@ -63,7 +63,8 @@ class Stream {
     BandsFrom = shape;
     // Of a mapped one the rows come one by one, so that the work can be stopped.
     if (picture.IsMapping()) return;
-    Standing = shown;
+    // A view of its own: operations leave factories behind.
+    Standing = part ? shown : picture.ClipImage();
     StandsIn = picture;
     StandsAt = part.value_or(Rect{0, 0, shape.Width, shape.Height});
   }
@@ -135,10 +136,15 @@ class Stream {
     return row * Of.Height > MostArriving || BytesOf(result) > Options.Stores.MemoryLimit;
   }
 
-  /// Where the source stands in memory it is worked on as it is.
+  /// Where the source stands in memory it is worked on as it is, or a copy where the work would change it.
   bool AppliedToStanding(const Operation& work) {
     if (!Standing) return false;
     Report.Begin("working");
+    if (work.DependsOn(Of).Of != Kind::InOrder && !work.DependsOn(Of).KeepsSource) {
+      const Picture own = files::MakeToFill(Options.Stores, {Of.Width, Of.Height, Of.Of});
+      if (!own.CopyPixels(Standing)) throw files::Failure("a row of a picture can't be reached");
+      Standing = own;
+    }
     Whole = work.Apply(std::move(Standing), {.Stores = Options.Stores, .Threads = ThreadsOf(Options)});
     Standing = Picture();
     Coming.reset();

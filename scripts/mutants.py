@@ -129,7 +129,8 @@ def main():
     random.seed(options.seed)
     chosen = random.sample(changes, min(options.count, len(changes)))
     noticed = refused = 0
-    for name, start, end, new in chosen:
+    for number, (name, start, end, new) in enumerate(chosen, 1):
+        print(f"{number} of {len(chosen)}", end="\r", file=sys.stderr, flush=True)
         file = TREE / name
         whole = file.read_bytes()
         line = whole.count(b"\n", 0, start) + 1

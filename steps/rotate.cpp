@@ -40,7 +40,9 @@ class Rotating final : public flow::Operation {
     return result;
   }
   flow::Dependence DependsOn(const flow::Shape&) const override {
-    return {.Of = Turns() == 1 ? flow::Dependence::Kind::Bands : flow::Dependence::Kind::Whole};
+    // By nothing it is the source itself.
+    if (Turns() == 1) return {.Of = flow::Dependence::Kind::Bands};
+    return {.KeepsSource = true};
   }
   std::optional<int> Turns() const override {
     const double angle = Within360();

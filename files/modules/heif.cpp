@@ -209,7 +209,7 @@ std::unique_ptr<ImageWriter> Create(int descriptor, const std::filesystem::path&
 
 }
 
-PICTUREZOR_TYPE_CODE(AVIF){nullptr, Open<true>, Create<true>};
-PICTUREZOR_TYPE_CODE(HEIC){nullptr, Open<false>, Create<false>};
+PICTUREZOR_TYPE_CODE(AVIF){PICTUREZOR_VERSION, nullptr, Open<true>, Create<true>};
+PICTUREZOR_TYPE_CODE(HEIC){PICTUREZOR_VERSION, nullptr, Open<false>, Create<false>};
 
 }

@@ -270,6 +270,7 @@ class JPEGXLWriter : public WholeWriter {
 }
 
 PICTUREZOR_TYPE_CODE(JPEGXL){
+    PICTUREZOR_VERSION,
     nullptr,
     [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
       return std::make_unique<JPEGXLReader>(input, options);

@@ -50,22 +50,41 @@ class JPEGReader : public ImageReader {
     }
   }
 
+  /// Rows above the part are unpacked, but not transformed.
+  bool Select(const Rect& part) override {
+    if (Started) return false;
+    Line.resize(std::size_t(About.Width) * std::size_t(ChannelsOf(About.Pixels)));
+    Part = part;
+    About.Width = part.Width;
+    About.Height = part.Height;
+    return true;
+  }
+
   void ReadRow(std::uint8_t* row) override {
-    if (!Started) Try([&] { jpeg_start_decompress(&Jpeg); });
-    Started = true;
-    Try([&] { jpeg_read_scanlines(&Jpeg, &row, 1); });
+    if (!Started) Begin();
+    JSAMPROW whole = Line.empty() ? row : Line.data();
+    Try([&] { jpeg_read_scanlines(&Jpeg, &whole, 1); });
+    const auto channels = std::size_t(ChannelsOf(About.Pixels)), bytes = std::size_t(About.Width) * channels;
+    if (!Line.empty()) std::memcpy(row, &Line[std::size_t(Part.X) * channels], bytes);
     if (Inverted)
-      for (std::size_t i = 0; i < std::size_t(About.Width) * 4; ++i) row[i] = std::uint8_t(255 - row[i]);
+      for (std::size_t i = 0; i < bytes; ++i) row[i] = std::uint8_t(255 - row[i]);
   }
 
   void Finish() override {
-    Try([&] { jpeg_finish_decompress(&Jpeg); });
+    // Behind a part nothing is looked at.
+    if (Line.empty()) Try([&] { jpeg_finish_decompress(&Jpeg); });
   }
 
  private:
   template <class Call>
   void Try(Call call) {
     Errors.Try(Path, call);
+  }
+
+  void Begin() {
+    Try([&] { jpeg_start_decompress(&Jpeg); });
+    if (Part.Y > 0) Try([&] { jpeg_skip_scanlines(&Jpeg, JDIMENSION(Part.Y)); });
+    Started = true;
   }
 
   void Start(std::int64_t memoryLimit) {
@@ -131,6 +150,9 @@ class JPEGReader : public ImageReader {
   JPEGErrors Errors;
   jpeg_decompress_struct Jpeg{};
   bool Inverted = false, Started = false;
+  Rect Part;
+  /// A row of which the part is taken.
+  Bytes Line;
 };
 
 class JPEGWriter : public ImageWriter {

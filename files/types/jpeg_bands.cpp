@@ -2,7 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdlib>
+#include <new>
 
 #include "jpeg_errors.h"
 
@@ -15,22 +15,49 @@ constexpr std::uint8_t StartOfScan = 0xDA;
 
 UINT16 PerInch(double density) { return UINT16(std::clamp(std::lround(density), 1L, 65535L)); }
 
+/// What libjpeg writes, in memory.
+struct Written : jpeg_destination_mgr {
+  Bytes File;
+
+  Written() : jpeg_destination_mgr{} {
+    init_destination = [](j_compress_ptr jpeg) { Of(jpeg).Grow(jpeg); };
+    empty_output_buffer = [](j_compress_ptr jpeg) -> boolean {
+      Of(jpeg).Grow(jpeg);
+      return TRUE;
+    };
+    term_destination = [](j_compress_ptr jpeg) {
+      Of(jpeg).File.resize(Of(jpeg).File.size() - Of(jpeg).free_in_buffer);
+    };
+  }
+  static Written& Of(j_compress_ptr jpeg) { return *static_cast<Written*>(jpeg->dest); }
+  void Grow(j_compress_ptr jpeg) {
+    const std::size_t used = File.size();
+    bool grown = true;
+    try {
+      File.resize(std::max<std::size_t>(2 * used, 64 << 10));
+    } catch (const std::bad_alloc&) {
+      grown = false;
+    }
+    // Outside of what catches, since it jumps.
+    if (!grown) ERREXIT1(jpeg, JERR_OUT_OF_MEMORY, 0);
+    next_output_byte = &File[used];
+    free_in_buffer = File.size() - used;
+  }
+};
+
 /// A file in memory on its way through libjpeg.
 class Encoder {
  public:
   explicit Encoder(const std::filesystem::path& target) : Path(target) { Jpeg.err = &Errors.Manager; }
   Encoder(const Encoder&) = delete;
-  ~Encoder() {
-    jpeg_destroy_compress(&Jpeg);
-    std::free(Buffer);
-  }
+  ~Encoder() { jpeg_destroy_compress(&Jpeg); }
 
-  void Start(const ImageInfo& info, int quality) {
+  void Start(const ImageInfo& info, std::int32_t height, int quality) {
     Try([&] {
       jpeg_create_compress(&Jpeg);
-      jpeg_mem_dest(&Jpeg, &Buffer, &Size);
+      Jpeg.dest = &Into;
       Jpeg.image_width = JDIMENSION(info.Width);
-      Jpeg.image_height = JDIMENSION(info.Height);
+      Jpeg.image_height = JDIMENSION(height);
       Jpeg.input_components = ChannelsOf(info.Pixels);
       Jpeg.in_color_space = info.Pixels == Format::G     ? JCS_GRAYSCALE
                             : info.Pixels == Format::RGB ? JCS_RGB
@@ -75,7 +102,7 @@ class Encoder {
       }
       jpeg_finish_compress(&Jpeg);
     });
-    return {Buffer, Size};
+    return Into.File;
   }
 
  private:
@@ -87,8 +114,7 @@ class Encoder {
   const std::filesystem::path& Path;
   JPEGErrors Errors;
   jpeg_compress_struct Jpeg{};
-  std::uint8_t* Buffer = nullptr;
-  unsigned long Size = 0;
+  Written Into;
 };
 
 std::size_t Number16(const std::uint8_t* at) { return std::size_t(at[0]) << 8 | at[1]; }
@@ -121,7 +147,7 @@ JPEGBands::JPEGBands(const std::filesystem::path& target, const ImageInfo& info,
       MostWaiting(std::size_t(ThreadsFor(threads)) + 2),
       Bands(ThreadsFor(threads), [this](Band& band, int) { Pack(band); }) {
   Encoder encoder(Path);
-  encoder.Start(Info, Quality);
+  encoder.Start(Info, Info.Height, Quality);
   const std::int64_t units = (info.Width + encoder.UnitWidth() - 1) / encoder.UnitWidth();
   const std::int64_t bytes = std::int64_t(RowBytes) * encoder.UnitHeight();
   const std::int64_t rows = std::max<std::int64_t>(std::min(MostInterval / units, BandBytes / bytes), 1);
@@ -147,10 +173,8 @@ void JPEGBands::Pack(Band& band) const {
   // In files ink is counted from full to none.
   if (Info.Pixels == Format::CMYK)
     for (std::uint8_t& sample : band.Rows) sample = std::uint8_t(255 - sample);
-  ImageInfo info = Info;
-  info.Height = band.Count;
   Encoder encoder(Path);
-  encoder.Start(info, Quality);
+  encoder.Start(Info, band.Count, Quality);
   const bool first = band.Number == 0, last = Info.Height <= (band.Number + 1) * RowsPerBand;
   if (first)
     encoder.BeginFile(Head, Info.Profile, RestartInterval);

@@ -45,8 +45,10 @@ struct JPEGErrors {
       case JERR_FILE_READ: std::snprintf(self.Reason, sizeof self.Reason, "%s", std::strerror(errno)); break;
       case JERR_NO_BACKING_STORE:
       case JERR_OUT_OF_MEMORY:
-        std::snprintf(self.Reason, sizeof self.Reason,
-                      "a progressive JPEG of this size needs more memory than --memory-limit allows");
+        std::snprintf(self.Reason, sizeof self.Reason, "%s",
+                      file->is_decompressor
+                          ? "a progressive JPEG of this size needs more memory than --memory-limit allows"
+                          : "not enough memory");
         break;
       case JWRN_JPEG_EOF:
       case JERR_INPUT_EOF: std::snprintf(self.Reason, sizeof self.Reason, "the JPEG file is cut off"); break;

@@ -44,8 +44,6 @@ bool PNGSource::Read(std::uint8_t* into, std::size_t size) {
     return true;
   } catch (const Fault& fault) {
     Why = fault;
-  } catch (const std::system_error& error) {
-    Why = {error.code().message(), false};
   } catch (const std::bad_alloc&) {
     Why = {"not enough memory", false};
   }
@@ -107,7 +105,12 @@ Bytes PNGSource::NextOfChunk() {
 
 Bytes PNGSource::TakeStored() {
   if (!Ahead) return Stored();
-  if (!Thread.joinable()) Thread = std::thread([this] { UnpackAhead(); });
+  if (!Thread.joinable()) try {
+      Thread = std::thread([this] { UnpackAhead(); });
+    } catch (const std::system_error&) {
+      Ahead = false;
+      return Stored();
+    }
   std::unique_lock lock(Guard);
   Changed.wait(lock, [this] { return !Ready.empty() || Failed; });
   if (Ready.empty()) std::rethrow_exception(Failed);

@@ -21,7 +21,7 @@ namespace picturezor::files {
 /// gets none of its own chunks' and is told not to ask.
 class PNGSource {
  public:
-  /// `ahead`: the pixels are unpacked on another thread.
+  /// `ahead`: the pixels are unpacked on another thread, if one can be made.
   PNGSource(Stream file, bool ahead);
   PNGSource(const PNGSource&) = delete;
   ~PNGSource();
@@ -54,7 +54,7 @@ class PNGSource {
   Bytes ReadSum();
 
   const Stream File;
-  const bool Ahead;
+  bool Ahead;
 
   enum class Stage { Signature, Header, Chunk, Pixels } Next = Stage::Signature;
   /// What libpng is getting, and how much of it is gone.

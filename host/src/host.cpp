@@ -39,7 +39,7 @@ std::filesystem::path OwnFile() {
 /// Where the module and what belongs to it may stand.
 std::vector<std::filesystem::path> Places() {
   const auto own = OwnFile().parent_path();
-  return {own, own / "picturezor", own / "../" PICTUREZOR_LIBRARY_DIR "/picturezor"};
+  return {own, own / "picturezor", own / PICTUREZOR_LIBRARY_DIR "/picturezor"};
 }
 
 std::filesystem::path FoundIn(const std::vector<std::filesystem::path>& places,

@@ -106,7 +106,12 @@ Picture Picture::ToBeFilled(std::int32_t width, std::int32_t height, Format form
   const std::int64_t bytes = CalculateMemory(width, height, format);
   if (bytes <= 0 || bytes >= fresh) return Picture(width, height, format);
   const auto size = std::size_t(bytes), stride = size / std::size_t(height);
-  const auto memory = std::make_shared_for_overwrite<std::uint8_t[]>(size);
+  std::shared_ptr<std::uint8_t[]> memory;
+  try {
+    memory = std::make_shared_for_overwrite<std::uint8_t[]>(size);
+  } catch (const std::bad_alloc&) {
+    return Picture(width, height, format);
+  }
   const std::size_t used = std::size_t(width) * std::size_t(BytesPerPixel(format));
   for (std::size_t at = used; at < size && used < stride; at += stride)
     std::memset(&memory[at], 0, stride - used);

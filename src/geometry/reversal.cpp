@@ -28,9 +28,32 @@ constexpr int ToHigh(int j) {
   return j < Rest<Step> ? 0 : ToLow<Step>(j - Rest<Step>) - Rest<Step>;
 }
 
+/// How the bytes of a block change places: all at once, or by the halves of ever larger lanes where a
+/// processor can't do that.
+enum class By { Bytes, Lanes };
+
+using Words = std::uint16_t __attribute__((vector_size(16)));
+constexpr int ReversedQuad(int j) { return 3 - j; }
+
+/// The pixels of a block of the right side as they stand on the left, at its low end.
+template <int Step, By Way>
+Block FromRight(Block block) {
+  if constexpr (Way == By::Bytes) return Shuffled<ToLow<Step>>(block, block);
+  static_assert(Way == By::Bytes || Rest<Step> == 0);
+  if constexpr (Step == 1) block = Block(Words(block) >> 8 | Words(block) << 8);
+  if constexpr (Step <= 2) block = Block(Quads(block) >> 16 | Quads(block) << 16);
+  return Block(Shuffled<ReversedQuad>(Quads(block), Quads(block)));
+}
+/// The other way, at the high end.
+template <int Step, By Way>
+Block FromLeft(Block block) {
+  if constexpr (Way == By::Bytes) return Shuffled<ToHigh<Step>>(block, block);
+  return FromRight<Step, Way>(block);
+}
+
 constexpr Block Blend(Block changed, Block old, Block mask) { return (changed & mask) | (old & ~mask); }
 
-template <int Step>
+template <int Step, By Way>
 void SwapBlocks(Sample* left, Sample* rightEnd, std::ptrdiff_t blocks, const Sample* fromLow,
                 const Sample* fromHigh, std::ptrdiff_t toNext) {
   constexpr std::ptrdiff_t blocksInLine = CacheLine / BlockBytes;
@@ -52,13 +75,13 @@ void SwapBlocks(Sample* left, Sample* rightEnd, std::ptrdiff_t blocks, const Sam
       low = LoadBlock(left);
       high = LoadBlock(rightEnd - BlockBytes);
     }
-    StoreBlock(intoLeft, Blend(Shuffled<ToLow<Step>>(nowHigh, nowHigh), nowLow, lowMask));
-    StoreBlock(intoRight, Blend(Shuffled<ToHigh<Step>>(nowLow, nowLow), nowHigh, highMask));
+    StoreBlock(intoLeft, Blend(FromRight<Step, Way>(nowHigh), nowLow, lowMask));
+    StoreBlock(intoRight, Blend(FromLeft<Step, Way>(nowLow), nowHigh, highMask));
     if (blocks == 1) return;
   }
 }
 
-template <int Step>
+template <int Step, By Way>
 void CopyBlocks(const Sample* fromEnd, Sample* into, std::ptrdiff_t blocks, const Sample* fromLow) {
   constexpr int bytes = PixelsInBlock<Step> * Step;
   const Block mask = LoadBlock(fromLow);
@@ -68,7 +91,7 @@ void CopyBlocks(const Sample* fromEnd, Sample* into, std::ptrdiff_t blocks, cons
     const Block pixels = LoadBlock(fromEnd - BlockBytes), now = old;
     // Read before this one is written, as above.
     if (blocks > 1) old = LoadBlock(into + bytes);
-    StoreBlock(into, Blend(Shuffled<ToLow<Step>>(pixels, pixels), now, mask));
+    StoreBlock(into, Blend(FromRight<Step, Way>(pixels), now, mask));
     if (blocks == 1) return;
     into += bytes;
     fromEnd -= bytes;
@@ -82,11 +105,19 @@ std::ptrdiff_t BlocksIn(std::ptrdiff_t pixels) {
   return bytes < BlockBytes ? 0 : (bytes - BlockBytes) / taken + 1;
 }
 
+template <int Step, class Work>
+void ByBytesOrLanes(Work work) {
+  if constexpr (Rest<Step> == 0)
+    if (!ShufflesBytes()) return work.template operator()<By::Lanes>();
+  work.template operator()<By::Bytes>();
+}
+
 }
 
 Reversal::Reversal(const PlaneList& in, const PlaneList& out, bool inOrder)
     : In(in), Out(out), Edge(in.Offset[0] / in.Step * in.Step) {
-  InBlocks = !inOrder && ShufflesBytes() && in.Step == out.Step && in.Step <= 5;
+  InBlocks =
+      !inOrder && in.Step == out.Step && in.Step <= 5 && (ShufflesBytes() || BlockBytes % in.Step == 0);
   std::fill_n(FromLow, BlockBytes, Sample{0});
   std::fill_n(FromHigh, BlockBytes, Sample{0});
   const std::ptrdiff_t rest = BlockBytes % in.Step;
@@ -102,7 +133,10 @@ void Reversal::Swap(Sample* a, Sample* b, std::ptrdiff_t count, std::ptrdiff_t t
   std::ptrdiff_t done = 0;
   const auto swapBlocks = [&]<int Step>() {
     const std::ptrdiff_t blocks = BlocksIn<Step>(count);
-    OnBestTarget<SwapBlocks<Step>>(a + Edge, b + Edge + count * Step, blocks, FromLow, FromHigh, toNext);
+    ByBytesOrLanes<Step>([&]<By Way>() {
+      OnBestTarget<SwapBlocks<Step, Way>>(a + Edge, b + Edge + count * Step, blocks, FromLow, FromHigh,
+                                          toNext);
+    });
     done = blocks * PixelsInBlock<Step>;
   };
   if (InBlocks) ForPlaneCount(In.Step, [&](auto step) { swapBlocks.template operator()<step>(); });
@@ -118,7 +152,8 @@ void Reversal::Copy(Sample* from, Sample* into, std::ptrdiff_t count) const {
   const auto copyBlocks = [&]<int Step>() {
     const std::ptrdiff_t blocks = BlocksIn<Step>(count);
     const Sample* end = from + Edge + count * Step;
-    OnBestTarget<CopyBlocks<Step>>(end, into + Edge, blocks, FromLow);
+    ByBytesOrLanes<Step>(
+        [&]<By Way>() { OnBestTarget<CopyBlocks<Step, Way>>(end, into + Edge, blocks, FromLow); });
     done = blocks * PixelsInBlock<Step>;
   };
   if (InBlocks) ForPlaneCount(In.Step, [&](auto step) { copyBlocks.template operator()<step>(); });

@@ -83,6 +83,12 @@ void TransposeSquare(Vector (&rows)[Side]) {
 }
 
 /// Whether bytes are shuffled in one instruction.
-inline bool ShufflesBytes() { return CurrentTarget != Target::Plain; }
+inline bool ShufflesBytes() {
+#ifdef __aarch64__
+  return true;
+#else
+  return CurrentTarget != Target::Plain;
+#endif
+}
 
 }
