@@ -83,6 +83,22 @@ def test_refusals_speak_pythons_names():
             call()
 
 
+@pytest.mark.parametrize("size", [(40, 30), (3400, 3300)])
+def test_steps_leave_the_picture_as_it_is(size):
+    # Of more than 32 MB some take another way.
+    picture = pz.Picture(*size)
+    picture.fill_rect_random()
+    before = picture.clone()
+    picture.factory = pz.Factory(lambda *asked: None)
+    for step in ("mirror --vertical", "mirror --vertical --horizontal", "rotate --angle 90", "rotate --angle 180",
+                 "rotate --angle 0", "scale --percent 50", "crop --rect 1,1,20,20 : filter invert", "filter auto-level",
+                 "convert --format rgb", "filter gamma --gamma 2"):
+        made = picture.run(step)
+        assert picture.compare_images(before) == 0, step
+        assert not np.shares_memory(made, picture), step
+        assert picture.factory is not None, step
+
+
 @pytest.mark.skipif("PICTUREZOR_COMMAND" not in os.environ, reason="the command isn't there")
 def test_the_command_gives_the_same(tmp_path):
     picture = pz.Picture(150, 120, "RGBA")
