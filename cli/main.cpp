@@ -26,13 +26,13 @@ int Run(int count, char** arguments) {
   Session session;
   session.Stores.MemoryLimit = DefaultMemoryLimit();
   session.Stores.TempDirectory = DefaultTempDirectory();
-  CLI::App app("Scales, converts and combines images, also ones larger than memory.", "picturezor");
+  CLI::App app("Scale, convert and combine images, including images larger than memory.", "picturezor");
   app.set_version_flag("--version", "picturezor " PICTUREZOR_VERSION);
   app.require_subcommand(1);
   app.footer(
-      "picturezor COMMAND --help tells the options of a command, with examples.\n\n"
-      "Exit codes: 0 done; 1 compare found a difference; 2 it can't be done (the reason is on standard\n"
-      "error); 3 the command line is wrong.\n\n"
+      "picturezor COMMAND --help lists the options of a command, with examples.\n\n"
+      "Exit codes: 0 success; 1 compare found a difference; 2 failure (the reason is on standard error);\n"
+      "3 the command line is invalid.\n\n"
       "The module PictureZOR.so is looked for beside the program, then in the library directory beside\n"
       "it; the environment variable PICTUREZOR_MODULE names another one.");
   for (const auto add : {AddSteps, AddRun, AddChannels, AddCompare, AddInfo, AddFormats, AddThumbnail,

@@ -32,23 +32,23 @@ int Session::Complain(std::string text, ExitCode code) {
 void AddStoreOptions(CLI::App& command, Session& session) {
   static const std::map<std::string, Store> stores{
       {"auto", Store::Auto}, {"memory", Store::Memory}, {"mapped", Store::Mapped}};
-  command.add_flag("-q,--quiet", session.Quiet, "No notes, no progress bar");
+  command.add_flag("-q,--quiet", session.Quiet, "Print no notes and no progress bar");
   command
       .add_option_function<std::string>(
           "--store", [&session](const std::string& name) { session.Stores.Kind = stores.at(name); },
-          "Where pictures live: memory, mapped (in temporary files), or auto (mapped where --memory-limit\n"
-          "is passed; the default)")
+          "Where pixels are kept: memory, mapped (in temporary files), or auto (mapped where --memory-limit\n"
+          "is exceeded; the default)")
       ->type_name("KIND")
       ->check(CLI::IsMember({"auto", "memory", "mapped"}));
   command
       .add_option_function<std::string>(
           "--memory-limit",
           [&session](const std::string& text) { session.Stores.MemoryLimit = ParseBytes(text); },
-          "Memory for all pictures together, as 256M or 2G; half of the free memory by default")
+          "Memory for all pixel data together, such as 256M or 2G; half of the free memory by default")
       ->type_name("SIZE");
   command
       .add_option("--temp-dir", session.Stores.TempDirectory,
-                  "Directory of the temporary files; $TMPDIR or /var/tmp by default")
+                  "Directory for temporary files; $TMPDIR or /var/tmp by default")
       ->type_name("DIR");
 }
 
@@ -78,13 +78,13 @@ void AddWriteOptions(CLI::App& command, Session& session) {
   WriteOptions& writing = session.Writing;
   command
       .add_option("--type", session.TypeName,
-                  "Type of the image that is written, like png; what the name ends in otherwise")
+                  "Type of the output file, such as png; by default taken from its extension")
       ->type_name("NAME");
   command
       .add_option(
           "--quality", writing.Quality,
-          "Of JPEG, WebP and other types with loss, 1 to 100, 90 by default; from 90 on colours keep\n"
-          "their full resolution where the type has a choice")
+          "Quality of JPEG, WebP and other lossy types, 1 to 100, 90 by default; from 90 on chroma isn't\n"
+          "subsampled where the type has a choice")
       ->type_name("N")
       ->check(CLI::Range(1, 100));
   const auto target = [&session]() -> TargetProfile& {
@@ -102,28 +102,26 @@ void AddWriteOptions(CLI::App& command, Session& session) {
   command
       .add_option_function<std::string>(
           "--intent", [target](const std::string& name) { target().By = Intents().at(name); },
-          "How --profile carries colours over: perceptual (default), relative, saturation or absolute")
+          "Rendering intent of --profile: perceptual (default), relative, saturation or absolute")
       ->needs(profile)
       ->type_name("NAME")
       ->check(CLI::IsMember(Intents()));
-  command.add_flag("--strip", session.Strip,
-                   "Leave out EXIF, XMP, IPTC, the colour profile and the resolution");
-  command.add_flag(
-      "--lossless", writing.Lossless,
-      "Every sample as it is in WebP, JPEG XL, AVIF, HEIC and JPEG 2000; PNG, TIFF and PNM are so");
+  command.add_flag("--strip", session.Strip, "Drop EXIF, XMP, IPTC, the colour profile and the resolution");
+  command.add_flag("--lossless", writing.Lossless,
+                   "Lossless WebP, JPEG XL, AVIF, HEIC and JPEG 2000; PNG, TIFF and PNM always are");
   command
       .add_option_function<std::string>(
           "--compression", [&writing](const std::string& text) { SetCompression(writing, text); },
-          "How hard PNG and other types, or deflate and zstd in TIFF, try: 0 to 9. For TIFF also the way: "
-          "none, lzw,\n"
-          "deflate, zstd, jpeg or webp; lzw by default. Both may be given: --compression zstd,9")
+          "Compression effort of PNG and other types, or of deflate and zstd in TIFF: 0 to 9. For TIFF also\n"
+          "the method: none, lzw, deflate, zstd, jpeg or webp; lzw by default. Both may be given:\n"
+          "--compression zstd,9")
       ->type_name("N|NAME");
-  command.add_option("--tile", writing.Tile, "Square tiles in TIFF, of this edge, a multiple of 16")
+  command.add_option("--tile", writing.Tile, "TIFF with square tiles of N x N pixels, N a multiple of 16")
       ->type_name("N")
       ->check(CLI::Range(16, 1 << 14));
-  command.add_flag("--bigtiff", writing.Big, "TIFF with offsets of 64 bits, however small it is");
+  command.add_flag("--bigtiff", writing.Big, "Write a BigTIFF (64-bit offsets), whatever its size");
   command.add_flag("--pyramid", writing.Pyramid,
-                   "TIFF with smaller copies of the picture, each half as large as the one before");
+                   "TIFF with smaller copies of the image, each half the size of the one before");
 }
 
 void KeepMemory() {
@@ -159,14 +157,14 @@ Target::Target(Session& session, const std::filesystem::path& file)
   if (&Type != &TIFFType &&
       (asked.Packing != Compression::Usual || asked.Tile > 0 || asked.Big || asked.Pyramid))
     throw UsageFailure(file, std::string(Type.Name) +
-                                 " has no tiles, no pyramid, no 64-bit offsets, and of --compression at most "
-                                 "0 to 9; TIFF has all of them");
+                                 " has no tiles, pyramid or 64-bit offsets, and takes at most 0 to 9 for "
+                                 "--compression; TIFF has all of them");
 }
 Target::~Target() = default;
 
 Format Target::Storable(Session& session, Format pixels) const {
   const Format format = StorableFormat(File, Type, pixels);
-  if (format != pixels) session.Note(File, std::string(Type.Name) + " has no alpha, it is left out");
+  if (format != pixels) session.Note(File, std::string(Type.Name) + " has no alpha, so it is dropped");
   return format;
 }
 

@@ -23,7 +23,7 @@ HostPicture SmallPicture(Session& session, OpenedImage& image, std::int32_t widt
     chain.push_back(ScaleTo(session, {width, height}, false));
   const auto rows = image.Rows(session, chain);
   HostPicture picture = flow::Gather(*rows, session.Stores, session.Bar).CopyPictureWithMask();
-  if (!picture) throw Failure(image.File, "no picture can be made of it");
+  if (!picture) throw Failure(image.File, "no picture can be made from it");
   return picture;
 }
 

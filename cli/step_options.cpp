@@ -33,12 +33,12 @@ std::string Footer(const std::string& more, const std::vector<const char*>& exam
 }
 
 void AddCarryOptions(CLI::App& command, Session& session, std::filesystem::path& out) {
-  command.add_option("-o,--output", out, "Image to write; the name's ending says its type")
+  command.add_option("-o,--output", out, "Image to write; the file extension sets its type")
       ->required()
       ->type_name("OUT");
   command
       .add_option("--threads", session.Threads,
-                  "Threads to work on; 0, the default, is one a processor. The result is the same")
+                  "Number of threads; 0, the default, is one per processor. The result doesn't depend on it")
       ->type_name("N")
       ->check(CLI::Range(0, 32));
   AddWriteOptions(command, session);
@@ -59,7 +59,7 @@ Format PixelsBehind(Session& session, const OpenedImage& source, const flow::Cha
   for (const auto& work : chain) {
     const flow::Shape result = work->Result(shape);
     if (WithoutAlpha(shape.Of) == Format::CMYK && WithoutAlpha(result.Of) == Format::G)
-      session.Note(source.File, "gray is made of the black ink alone");
+      session.Note(source.File, "gray is made from the black ink alone");
     shape = result;
   }
   return shape.Of;

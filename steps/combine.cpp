@@ -71,13 +71,13 @@ class Combining final : public flow::Operation {
     const bool blends = Mask || OwnMask() || How.ForeColour || How.MaskColour;
     for (const Format format : {source.Of, Overlay.Size.Of, Mask ? Mask->Size.Of : source.Of})
       if (blends && files::WithoutAlpha(format) == Format::CMYK)
-        throw Unserved("blending isn't there for CMYK");
+        throw Unserved("blending doesn't support CMYK");
     if (!files::Convertible(Overlay.Size.Of, source.Of))
-      throw Failure(Overlay.File, "there is no way from " + files::Describe(Overlay.Size.Of) + " to " +
+      throw Failure(Overlay.File, files::Describe(Overlay.Size.Of) + " can't be converted to " +
                                       files::Describe(source.Of));
     if (At[0] >= source.Width || At[1] >= source.Height || At[0] + Overlay.Size.Width <= 0 ||
         At[1] + Overlay.Size.Height <= 0)
-      throw Failure(Overlay.File, "nothing of it lies on the base at " + std::to_string(At[0]) + "," +
+      throw Failure(Overlay.File, "it lies entirely outside the base at " + std::to_string(At[0]) + "," +
                                       std::to_string(At[1]));
     return source;
   }
@@ -93,7 +93,7 @@ class Combining final : public flow::Operation {
     if (!Read) ReadOverlay(source.ImageFormat());
     const Rect place{std::int32_t(At[0]), std::int32_t(top), Overlay.Size.Width, Overlay.Size.Height};
     if (!source.Combine(OverlayPicture, place, 0, 0, How))
-      throw Failure(Overlay.File, "it can't be laid over");
+      throw Failure(Overlay.File, "it can't be combined with the base");
     return source;
   }
 
@@ -131,34 +131,34 @@ class Combining final : public flow::Operation {
 
 const Step Combine{
     .Name = "combine",
-    .Help = "Lay an image over another one",
+    .Help = "Overlay one image on another",
     .More =
-        "A mask says how much of the base stays: white keeps it, black takes the overlay. Without a mask or\n"
-        "a colour the overlay's alpha decides, if it has one; an alpha of the base stays as it is then, but\n"
-        "with --premultiplied it becomes that of both together.",
+        "A mask sets how much of the base is kept: white keeps the base, black takes the overlay. Without a\n"
+        "mask or a colour, the overlay's alpha is used, if it has one; the base's own alpha then doesn't\n"
+        "change, except with --premultiplied, where it becomes the combined alpha of both.",
     .Examples = {"combine photo.jpg badge.png --at 20,20 -o marked.jpg",
                  "combine photo.jpg other.jpg --mask soft-edge.png -o both.jpg",
                  "combine photo.jpg letters.png --fore ff8000 -o titled.jpg"},
     .Options = {{.Name = "overlay",
                  .Of = Kind::File,
-                 .Help = "Image that is laid over it",
+                 .Help = "Image to lay over the base",
                  .Required = true,
                  .ByPlace = true},
                 {.Name = "mask",
                  .Of = Kind::File,
-                 .Help = "Gray or RGB image as large as the overlay",
+                 .Help = "Gray or RGB image of the same size as the overlay",
                  .Placeholder = "MASK"},
-                {.Name = "at", .Of = Kind::Point, .Help = "Where its top left corner goes", .Default = "0,0"},
+                {.Name = "at", .Of = Kind::Point, .Help = "Top left corner of the overlay", .Default = "0,0"},
                 {.Name = "premultiplied",
                  .Of = Kind::Flag,
-                 .Help = "The overlay's colours have been scaled by their coverage, so they are added"},
+                 .Help = "The overlay's colours are premultiplied by their coverage, so they are added"},
                 {.Name = "fore",
                  .Of = Kind::Colour,
-                 .Help = "A flat colour, as ff8000, that the overlay is the mask for",
+                 .Help = "A solid colour, such as ff8000, to paint with the overlay as its mask",
                  .Excludes = {"mask", "mask-colour"}},
                 {.Name = "mask-colour",
                  .Of = Kind::Colour,
-                 .Help = "One mask value a channel for all pixels, as 808080",
+                 .Help = "One mask value per channel for all pixels, such as 808080",
                  .Excludes = {"mask"}}},
     .Make = [](const Values& values, const Surroundings& around) -> std::unique_ptr<const flow::Operation> {
       return std::make_unique<Combining>(values, around);

@@ -22,8 +22,7 @@ class Converting final : public flow::Operation {
     flow::Shape result = source;
     result.Of = To.value_or(source.Of);
     if (!files::Convertible(source.Of, result.Of))
-      throw Unserved("there is no way from " + files::Describe(source.Of) + " to " +
-                     files::Describe(result.Of));
+      throw Unserved(files::Describe(source.Of) + " can't be converted to " + files::Describe(result.Of));
     return result;
   }
   flow::Dependence DependsOn(const flow::Shape&) const override {
@@ -43,12 +42,12 @@ const Step Convert{
     .Name = "convert",
     .Help = "Change the file type or the pixel format",
     .More =
-        "Gray goes to and from everything; RGB and CMYK have no way to each other. Gray becomes black\n"
-        "ink, and of CMYK only the black ink becomes gray.",
+        "Gray converts to and from every format; RGB and CMYK don't convert to each other. Gray becomes\n"
+        "black ink, and only the black ink of CMYK becomes gray.",
     .Examples = {"convert scan.tif -o scan.png", "convert photo.jpg --format gray -o gray.tif"},
     .Options = {{.Name = "format",
                  .Of = Kind::Choice,
-                 .Help = "Pixels of this kind; as in the input by default",
+                 .Help = "Pixel format; that of the input by default",
                  .Choices = {"gray", "graya", "rgb", "rgba", "cmyk"}}},
     .Make = [](const Values& values, const Surroundings&) -> std::unique_ptr<const flow::Operation> {
       return std::make_unique<Converting>(

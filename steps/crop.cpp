@@ -42,7 +42,7 @@ const Step Crop{
     .Examples = {"crop photo.jpg --rect 100,50,640,480 -o part.jpg"},
     .Options = {{.Name = "rect",
                  .Of = Kind::Rectangle,
-                 .Help = "What to cut out, counted from the top left corner",
+                 .Help = "Rectangle to cut out, from the top left corner",
                  .Required = true}},
     .Make = [](const Values& values, const Surroundings&) -> std::unique_ptr<const flow::Operation> {
       return std::make_unique<Cropping>(values.Get<Integers>("rect"));

@@ -29,7 +29,7 @@ class Mirroring final : public flow::Operation {
 const Step Mirror{
     .Name = "mirror",
     .Help = "Swap left and right, or top and bottom",
-    .More = "Both together are half a turn.",
+    .More = "Both together rotate the image by half a turn.",
     .Examples = {"mirror photo.jpg --horizontal -o mirrored.jpg"},
     .Options = {{.Name = "horizontal", .Of = Kind::Flag, .Help = "Left for right"},
                 {.Name = "vertical", .Of = Kind::Flag, .Help = "Top for bottom"}},

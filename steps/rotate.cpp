@@ -76,10 +76,11 @@ class Rotating final : public flow::Operation {
 
 const Step Rotate{
     .Name = "rotate",
-    .Help = "Turn by any angle",
+    .Help = "Rotate by any angle",
     .More =
-        "Counter-clockwise. Right angles move pixels as they are; others make the image larger, so that\n"
-        "all of it fits, and blur it a little. The corners are transparent where the image has alpha.",
+        "The direction is counter-clockwise. Multiples of 90 degrees move pixels unchanged; other angles\n"
+        "enlarge the image, so that all of it fits, and blur it a little. The corners are transparent if\n"
+        "the image has alpha.",
     .Examples = {"rotate scan.tif --angle 90 -o upright.tif",
                  "rotate photo.jpg --angle -2.5 --background ffffff -o straight.jpg"},
     .Options =

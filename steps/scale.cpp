@@ -28,7 +28,7 @@ class Scaling final : public flow::Operation {
   }
 
   flow::Shape Result(const flow::Shape& source) const override {
-    if (Fast && source.Of == Format::CMYK) throw Unserved("--fast has no way for CMYK");
+    if (Fast && source.Of == Format::CMYK) throw Unserved("--fast doesn't support CMYK");
     double width = Width, height = Height;
     if (!Fit.empty()) {
       const double factor = std::min(double(Fit[0]) / source.Width, double(Fit[1]) / source.Height);
@@ -42,7 +42,7 @@ class Scaling final : public flow::Operation {
     } else if (Width == 0) {
       width = height * source.Width / source.Height;
     }
-    if (width > MostSide || height > MostSide) throw files::UsageFailure("the size asked for is too large");
+    if (width > MostSide || height > MostSide) throw files::UsageFailure("the requested size is too large");
     flow::Shape result = source;
     result.Width = std::max(1, int(std::lround(width)));
     result.Height = std::max(1, int(std::lround(height)));
@@ -98,39 +98,39 @@ const Step Scale{
                  "scale map.tif --percent 12.5 --memory-limit 256M -o overview.tif"},
     .Options = {{.Name = "width",
                  .Of = Kind::Integer,
-                 .Help = "Columns; without --height it follows",
+                 .Help = "Width in pixels; if --height isn't given, it follows from this",
                  .Least = 1,
                  .Most = MostSide},
                 {.Name = "height",
                  .Of = Kind::Integer,
-                 .Help = "Rows; without --width it follows",
+                 .Help = "Height in pixels; if --width isn't given, it follows from this",
                  .Least = 1,
                  .Most = MostSide},
                 {.Name = "fit",
                  .Of = Kind::Size,
-                 .Help = "The largest size within this, as 1920x1080; enlarges too",
+                 .Help = "Fit within this size, such as 1920x1080; also enlarges",
                  .Excludes = {"width", "height", "percent"}},
                 {.Name = "percent",
                  .Of = Kind::Number,
-                 .Help = "Of both sides",
+                 .Help = "Percentage of the width and the height",
                  .Placeholder = "P",
                  .Least = 1e-6,
                  .Most = 1e9,
                  .Excludes = {"width", "height"}},
                 {.Name = "kernel",
                  .Of = Kind::Choice,
-                 .Help = "How pixels are weighed",
+                 .Help = "Resampling kernel",
                  .Default = "lanczos3",
                  .Choices = {"triangle", "box", "lanczos3", "lanczos8", "mitchell", "poly3", "cubic"}},
                 {.Name = "fast",
                  .Of = Kind::Flag,
-                 .Help = "Take the nearest pixels: quick and rough, without a kernel",
+                 .Help = "Take the nearest pixel, without a kernel: fast, but rough",
                  .Excludes = {"kernel"}},
                 {.Name = "draft",
                  .Of = Kind::Flag,
                  .Help =
-                     "Let the file's reader make it smaller first, where it can (JPEG) and the result is\n"
-                     "at least twice smaller still: quicker, and not to the bit"}},
+                     "Let the decoder shrink the image first, where it can (JPEG), to no less than twice\n"
+                     "the size of the result: faster, but not bit-exact"}},
     .Make = [](const Values& values, const Surroundings&) -> std::unique_ptr<const flow::Operation> {
       if (!values.Has("width") && !values.Has("height") && !values.Has("fit") && !values.Has("percent"))
         throw files::UsageFailure("give --width, --height, --fit or --percent");

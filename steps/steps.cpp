@@ -17,7 +17,7 @@ std::span<const Group> Groups() {
   static const Group groups[] = {
       {"filter",
        "Change the colours of an image, blur or sharpen it",
-       "Alpha stays as it is.",
+       "Alpha isn't changed.",
        {"filter gamma photo.jpg --gamma 1.4 -o brighter.jpg",
         "filter unsharp photo.jpg --radius 2 --amount 0.8 -o sharper.jpg",
         "filter matrix photo.png --weights 0,-1,0,-1,5,-1,0,-1,0 -o crisp.png",
@@ -46,7 +46,7 @@ std::unique_ptr<const flow::Operation> MakeOperation(const Step& step, std::map<
     if (option.Required && !given(option.Name)) throw files::UsageFailure(option.Shown() + " is required");
     for (const char* other : option.Excludes)
       if (given(option.Name) && given(other))
-        throw files::UsageFailure(option.Shown() + " and --" + other + " exclude each other");
+        throw files::UsageFailure(option.Shown() + " and --" + other + " can't be used together");
   }
   for (const Option& option : step.Options) {
     if (!values.contains(option.Name) && !option.Default.empty())

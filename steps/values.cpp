@@ -63,7 +63,7 @@ Integers NumbersOrFile(const Option& option, const std::string& text) {
   for (const std::string_view word : Split(all, ',')) {
     if (word.empty()) continue;
     std::int32_t number = 0;
-    if (!Parse(word, number)) Refuse(option, std::string(word) + " isn't a whole number of 32 bits");
+    if (!Parse(word, number)) Refuse(option, std::string(word) + " isn't a 32-bit whole number");
     numbers.push_back(number);
   }
   return numbers;
@@ -98,11 +98,11 @@ void RequireCount(const Option& option, const Integers& numbers, std::size_t cou
   if (numbers.size() != count) Refuse(option, "it takes " + std::to_string(count) + " whole numbers");
   for (const std::int64_t number : numbers)
     if (number < INT32_MIN / 2 || number > INT32_MAX / 2)
-      Refuse(option, std::to_string(number) + " is too far");
+      Refuse(option, std::to_string(number) + " is out of range");
 }
 
 void RequireSize(const Option& option, std::int64_t width, std::int64_t height) {
-  if (width < 1 || height < 1) Refuse(option, "a size is 1 or more");
+  if (width < 1 || height < 1) Refuse(option, "width and height must be at least 1");
 }
 
 template <class T>
@@ -158,7 +158,7 @@ std::string Option::Explained() const {
 Value ParseValue(const Option& option, const std::string& text) {
   switch (option.Of) {
     case Kind::Flag:
-      if (text != "true" && text != "false") Refuse(option, "it takes nothing");
+      if (text != "true" && text != "false") Refuse(option, "it takes no value");
       return text == "true";
     case Kind::Integer: {
       std::int64_t number = 0;
@@ -198,7 +198,7 @@ Value Checked(const Option& option, Value value) {
     case Kind::Choice:
       if (const auto& name = Require<std::string>(option, value, "a name");
           std::ranges::find(option.Choices, name) == option.Choices.end())
-        Refuse(option, name + " is none of its names");
+        Refuse(option, name + " isn't one of the choices");
       break;
     case Kind::Size: {
       const auto& size = Require<Integers>(option, value, "a size");
@@ -225,7 +225,7 @@ Value Checked(const Option& option, Value value) {
       if (Require<Integers>(option, value, "whole numbers").empty()) Refuse(option, "there are no numbers");
       for (const std::int64_t number : std::get<Integers>(value))
         if (number != std::int32_t(number))
-          Refuse(option, std::to_string(number) + " isn't a whole number of 32 bits");
+          Refuse(option, std::to_string(number) + " isn't a 32-bit whole number");
       break;
     case Kind::File:
       if (const auto* picture = std::get_if<Picture>(&value)) {

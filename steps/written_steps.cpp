@@ -83,12 +83,12 @@ class OptionWords {
   void TakePlaced(const std::string& word) {
     const auto option = std::ranges::find_if(
         Of.Of->Options, [&](const Option& one) { return one.ByPlace && !Of.Texts.contains(one.Name); });
-    if (option == Of.Of->Options.end()) throw UsageFailure(word + " isn't one of its options");
+    if (option == Of.Of->Options.end()) throw UsageFailure("unexpected argument " + word);
     Put(*option, word);
   }
 
   void Put(const Option& option, const std::string& text) {
-    if (!Of.Texts.emplace(option.Name, text).second) throw UsageFailure(option.Shown() + " comes twice");
+    if (!Of.Texts.emplace(option.Name, text).second) throw UsageFailure(option.Shown() + " is given twice");
   }
 
   WrittenStep& Of;
@@ -103,7 +103,7 @@ std::vector<WrittenStep> Parse(std::span<const std::string> words, const std::st
     const auto own = words.subspan(at, end - at);
     at = end;
     const std::string number = place + "step " + std::to_string(before + steps.size() + 1);
-    if (own.empty()) throw UsageFailure(number + ": there is none");
+    if (own.empty()) throw UsageFailure(number + ": the step is missing");
     const bool grouped = std::ranges::any_of(Groups(), [&](const Group& one) { return own[0] == one.Name; });
     const std::size_t named = grouped && own.size() > 1 ? 2 : 1;
     const std::string name = named == 2 ? own[0] + " " + own[1] : own[0];
@@ -135,7 +135,7 @@ std::vector<std::string> WordsOf(std::string_view line) {
       if (c == '"' && line[at] == '\\' && at + 1 < line.size()) ++at;
       *word += line[at];
     }
-    if (at >= line.size()) throw UsageFailure("a quote has no end");
+    if (at >= line.size()) throw UsageFailure("a quote isn't closed");
   }
   if (word) words.push_back(*word);
   return words;

@@ -59,15 +59,15 @@ int Channels(Session& session, const ChannelsOptions& options) {
 }
 
 void AddChannels(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("channels", "Write each channel to a gray image of its own");
+  CLI::App* command = app.add_subcommand("channels", "Write each channel to its own gray image");
   command->footer(
-      "Of CMYK white is full ink. The names are gray; red, green, blue; cyan, magenta, yellow, black; and\n"
-      "alpha.\n\n"
+      "For CMYK, white means full ink. The channels are named gray; red, green, blue; cyan, magenta,\n"
+      "yellow, black; and alpha.\n\n"
       "Example, which writes photo-red.png, photo-green.png and photo-blue.png:\n"
       "  picturezor channels photo.jpg -o photo-{}.png");
   auto options = std::make_shared<ChannelsOptions>();
   command->add_option("IN", options->In, "Image to read")->required()->type_name("");
-  command->add_option("-o,--output", options->Pattern, "Images to write; {} becomes the name of the channel")
+  command->add_option("-o,--output", options->Pattern, "Images to write; {} stands for the channel's name")
       ->required()
       ->type_name("PATTERN");
   AddWriteOptions(*command, session);

@@ -71,10 +71,10 @@ int Compare(Session& session, const CompareOptions& options) {
 }
 
 void AddCompare(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("compare", "Tell how far two images are from each other");
+  CLI::App* command = app.add_subcommand("compare", "Measure how much two images differ");
   command->footer(
-      "The total adds up the differences of all samples, alpha included.\n"
-      "Exit codes: 0 equal, 1 different, 2 not comparable, as for other sizes or pixel formats.\n\n"
+      "The total is the sum of the absolute differences of all samples, including alpha.\n"
+      "Exit codes: 0 equal, 1 different, 2 not comparable, such as different sizes or pixel formats.\n\n"
       "Example:\n  picturezor compare expected.png result.png");
   auto options = std::make_shared<CompareOptions>();
   command->add_option("A", options->A, "An image")->required()->type_name("");

@@ -101,8 +101,7 @@ void PrintSteps() {
 }
 
 void AddCompletion(CLI::App& app, Session& session) {
-  CLI::App* command =
-      app.add_subcommand("completion", "Print the completion of this command line for a shell");
+  CLI::App* command = app.add_subcommand("completion", "Print a completion script for a shell");
   command->footer(
       "Example:\n  picturezor completion bash >~/.local/share/bash-completion/completions/picturezor");
   auto shell = std::make_shared<std::string>();

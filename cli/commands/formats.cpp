@@ -27,11 +27,10 @@ int Formats() {
 }
 
 void AddFormats(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("formats", "Tell which types of files are built in");
+  CLI::App* command = app.add_subcommand("formats", "List the file types that are built in");
   command->footer(
-      "What a type holds: gray, alpha and CMYK as they are written; pages that FILE[2] picks; parts that "
-      "are\n"
-      "read without the rest of the picture; bytes in order, so that - needs no temporary file.");
+      "gray, alpha and CMYK: what the type can be written with. pages: FILE[2] selects the second image.\n"
+      "parts: a region can be read without the rest. stream: - needs no temporary file.");
   command->callback([&session] {
     session.NeedsModule = false;
     session.Work = Formats;

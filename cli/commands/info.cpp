@@ -45,10 +45,10 @@ int Info(Session& session, const std::filesystem::path& file) {
 }
 
 void AddInfo(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("info", "Tell what an image file holds");
-  command->footer("The size is the upright one; the pixels themselves aren't read.");
+  CLI::App* command = app.add_subcommand("info", "Describe an image file");
+  command->footer("The size is that of the upright image; the pixels themselves aren't read.");
   auto file = std::make_shared<std::filesystem::path>();
-  command->add_option("FILE", *file, "Image to look at")->required()->type_name("");
+  command->add_option("FILE", *file, "Image to describe")->required()->type_name("");
   command->callback([&session, file] { session.Work = [&session, file] { return Info(session, *file); }; });
 }
 

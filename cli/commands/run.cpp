@@ -79,33 +79,33 @@ int RunPairs(Session& session, const RunOptions& options) {
 }
 
 void AddRun(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("run", "Do several steps to an image, without files in between");
+  CLI::App* command = app.add_subcommand("run", "Apply several steps to an image, without files in between");
   command->footer(Footer(
       "picturezor run IN -o OUT [OPTIONS] STEP [: STEP]...\n\n"
-      "A step is the name of a command that does one thing to an image (scale, crop, convert, mirror,\n"
-      "rotate, combine, filter NAME) with that command's own options; a colon stands between two. In a file\n"
-      "of steps each line holds one, or several with colons. Words with blanks in them or # in front stand\n"
-      "in quotes there, and what follows another # is a comment.",
+      "A step is the name of a command (scale, crop, convert, mirror, rotate, combine, filter NAME) with\n"
+      "that command's own options; a colon separates two steps. In a file of steps, each line holds one\n"
+      "step, or several with colons between them. Quote words there that contain blanks or begin with #;\n"
+      "an unquoted word that begins with # starts a comment.",
       {"run photo.jpg -o out.jpg crop --rect 100,50,1600,1200 : scale --fit 1280x800 : filter unsharp",
        "run scan.tif -o page.png --steps page.steps"}));
   auto options = std::make_shared<RunOptions>();
   CLI::Option* const in = command->add_option("IN", options->In, "Image to read")->type_name("");
   CLI::Option* const file =
-      command->add_option("--steps", options->File, "A text file with the steps")->type_name("FILE");
+      command->add_option("--steps", options->File, "Text file that holds the steps")->type_name("FILE");
   command->add_flag_callback(
       "--list",
       [] {
         List();
         throw CLI::Success();
       },
-      "Name all steps with their options");
+      "List all steps with their options");
   AddCarryOptions(*command, session, options->Out);
   CLI::Option* const out = command->get_option("--output")->required(false);
   command
       ->add_option("--pairs", options->Pairs,
-                   "Instead of IN and OUT, a file with names of both in turn, each with a zero byte behind\n"
-                   "it; - is standard input. For each pair standard output gets \"done WIDTH HEIGHT\", the\n"
-                   "size of what was read, or \"failed REASON\", and a zero byte")
+                   "Instead of IN and OUT, a file that lists both names in turn, each ended by a zero byte;\n"
+                   "- is standard input. For each pair, standard output gets \"done WIDTH HEIGHT\", the\n"
+                   "size of the input, or \"failed REASON\", ended by a zero byte")
       ->type_name("FILE")
       ->needs(file)
       ->excludes(in)
@@ -115,8 +115,7 @@ void AddRun(CLI::App& app, Session& session) {
     session.Work = [&session, options, words = command->remaining()] {
       if (!options->Pairs.empty()) return RunPairs(session, *options);
       if (options->In.empty() || options->Out.empty()) throw UsageFailure("IN and -o OUT are required");
-      if (words.empty() == options->File.empty())
-        throw UsageFailure("give steps, or --steps and a file of them");
+      if (words.empty() == options->File.empty()) throw UsageFailure("give steps, or --steps with a file");
       const auto written = words.empty() ? StepsOf(options->File) : steps::ParseSteps(words);
       Carry(session, options->In, options->Out, steps::MakeChain(written, SurroundingsOf(session)));
       return int(Done);

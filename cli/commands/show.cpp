@@ -70,7 +70,7 @@ int Show(Session& session, const ShowOptions& options) {
   OpenedImage image(session, options.File);
   const PictureSize size = SizeInWindow(image.Size(), options.Width);
   constexpr std::int32_t mostRows = 32767;
-  if (size.Height > mostRows) throw Failure(options.File, "it is too high to be shown at this width");
+  if (size.Height > mostRows) throw Failure(options.File, "it is too tall to be shown at this width");
   const HostPicture picture = SmallPicture(session, image, size.Width, size.Height);
   session.Bar.Clear();
   Print(picture);
@@ -80,17 +80,16 @@ int Show(Session& session, const ShowOptions& options) {
 }
 
 void AddShow(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("show", "Print an image into a terminal with 24-bit colours");
+  CLI::App* command = app.add_subcommand("show", "Show an image in a terminal with 24-bit colour");
   command->footer(
-      "The image fills the window as far as its proportions allow; where there is no window it is 80 "
-      "columns\n"
-      "wide. Pixels of little alpha let the terminal's background through.\n\n"
+      "The image fills the terminal window as far as its aspect ratio allows; without a window it is\n"
+      "80 columns wide. The terminal's background shows through pixels with little alpha.\n\n"
       "Examples:\n"
       "  picturezor show photo.jpg\n"
       "  picturezor show photo.jpg --width 120 | less -R");
   auto options = std::make_shared<ShowOptions>();
   command->add_option("FILE", options->File, "Image to show")->required()->type_name("");
-  command->add_option("--width", options->Width, "Columns, whatever the window")
+  command->add_option("--width", options->Width, "Width in columns, whatever the window's")
       ->type_name("N")
       ->check(CLI::Range(1, 4000));
   AddStoreOptions(*command, session);

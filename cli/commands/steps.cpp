@@ -46,23 +46,23 @@ void AddGroup(CLI::App& app, Session& session, const steps::Group& group) {
   const std::string name = group.Name;
   CLI::App* command = app.add_subcommand(name, group.Help);
   command->footer(
-      Footer("picturezor " + name + " NAME --help tells the options of a " + name + ". " + group.More,
+      Footer("picturezor " + name + " NAME --help lists the options of a " + name + ". " + group.More,
              group.Examples));
   command->require_subcommand(0, 1);
   auto list = std::make_shared<bool>(false);
-  command->add_flag("--list", *list, "Name all that there are");
+  command->add_flag("--list", *list, "List them all");
   for (const steps::Step* step : steps::Steps())
     if (const std::string own = NameIn(group, *step); !own.empty()) AddStep(*command, session, *step, own);
   command->allow_extras();
   command->callback([&session, &group, name, command, list] {
     if (command->get_subcommands().empty() && command->remaining_size() > 0)
       throw CLI::ValidationError(command->remaining().front(),
-                                 "there is no such " + name + "; --list names them all");
+                                 "there is no such " + name + "; --list shows them all");
     if (*list) {
       session.NeedsModule = false;
       session.Work = [&group] { return List(group); };
     } else if (command->get_subcommands().empty()) {
-      throw CLI::RequiredError(name + ": the name of one");
+      throw CLI::RequiredError("the name of a " + name);
     }
   });
 }

@@ -44,7 +44,7 @@ class InLight final : public flow::Operation {
   int Pictures() const override { return 3; }
   Picture Apply(Picture source, const flow::Workplace&) const override {
     const HostPicture light = source.CopyPictureWithMask();
-    if (!light) throw Failure("no picture can be made of it");
+    if (!light) throw Failure("no picture can be made from it");
     const Picture result(source.Width(), source.Height(), light.Mask() ? Format::RGBA : Format::RGB);
     result.DrawMaskedPictureRGB(light);
     return result;
@@ -74,7 +74,7 @@ std::string NameOf(const std::string& pattern, const path& in, const files::Exte
     }
     const auto word = words.find(pattern.substr(at + 1, end - at - 1));
     if (word == words.end())
-      throw UsageFailure("--name: {stem}, {name}, {ext}, {width} and {height} are filled in, and not " +
+      throw UsageFailure("--name: the placeholders are {stem}, {name}, {ext}, {width} and {height}, not " +
                          pattern.substr(at, end - at + 1));
     name += word->second;
     at = end;
@@ -114,7 +114,7 @@ std::vector<Thumbnail> Planned(Session& session, const ThumbnailOptions& options
   }
   for (const Thumbnail& one : thumbnails)
     if (const auto identity = IdentityOf(one.Out); identity && images.contains(*identity))
-      throw Failure(images[*identity], "its place would be taken by a thumbnail");
+      throw Failure(images[*identity], "it would be overwritten by a thumbnail");
   return thumbnails;
 }
 
@@ -189,28 +189,29 @@ int MakeThumbnails(Session& session, const ThumbnailOptions& options) {
 }
 
 void AddThumbnail(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("thumbnail", "Make a small image of each of many");
+  CLI::App* command = app.add_subcommand("thumbnail", "Make thumbnails of many images");
   command->footer(Footer(
-      "Each keeps its proportions; one that is small already keeps its size. Colours become RGB, alpha\n"
-      "stays where the type has it. JPEGs are made smaller as they are read. Images that can't be read are\n"
-      "told at the end, and the others made all the same.",
+      "Aspect ratios are kept, and images that are small already keep their size. Colours become RGB;\n"
+      "alpha is kept where the type has it. JPEGs are downscaled while they are decoded. Images that can't\n"
+      "be read are listed at the end; the others are made all the same.",
       {"thumbnail photos/*.jpg --size 160 -o contacts",
        "thumbnail photos/* --size 1024 --name '{stem}-{width}.jpg' --quality 80 -o web"}));
   auto options = std::make_shared<ThumbnailOptions>();
   command->add_option("IN", options->In, "Images to read")->required()->type_name("");
-  command->add_option("-o,--output", options->Directory, "Directory to write to; made if it isn't there")
+  command->add_option("-o,--output", options->Directory, "Directory to write to; created if it doesn't exist")
       ->required()
       ->type_name("DIR");
-  command->add_option("--size", options->Size, "Pixels of the longer side")
+  command->add_option("--size", options->Size, "Length of the longer side in pixels")
       ->required()
       ->type_name("N")
       ->check(CLI::Range(1, 32767));
   command
       ->add_option("--name", options->Name,
-                   "What they are called; {stem}, {name}, {ext}, {width} and {height} stand for the image's\n"
-                   "name without and with its ending, the ending, and the size; {stem}.png by default")
+                   "Names of the thumbnails, {stem}.png by default; {stem}, {name}, {ext}, {width} and\n"
+                   "{height} stand for the image's name without and with its extension, the extension,\n"
+                   "and the size")
       ->type_name("TEXT");
-  command->add_option("--jobs", options->Jobs, "Images at a time; 0, the default, is one a processor")
+  command->add_option("--jobs", options->Jobs, "Images at a time; 0, the default, is one per processor")
       ->type_name("N")
       ->check(CLI::Range(0, 256));
   AddWriteOptions(*command, session);

@@ -53,11 +53,11 @@ int Tiles(Session& session, Options options) {
 }
 
 void AddTiles(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("tiles", "Make an image pyramid for viewers on the web");
+  CLI::App* command = app.add_subcommand("tiles", "Make an image pyramid for web viewers");
   command->footer(
-      "Levels are halves, each as `scale` makes it of the picture itself. The pyramid stands "
-      "under\n"
-      "its name when it is complete; until then NAME.unfinished does, which --resume goes on with.\n\n"
+      "Each level is half the size of the one before, and is scaled from the full image, as by `scale`.\n"
+      "The pyramid gets its name when it is complete; until then it is NAME.unfinished, which --resume\n"
+      "continues.\n\n"
       "Examples:\n"
       "  picturezor tiles scan.tif -o scan --page\n"
       "  picturezor tiles scan.tif --layout iiif --address https://example.org/iiif -o scan\n"
@@ -69,7 +69,7 @@ void AddTiles(CLI::App& app, Session& session) {
   command->add_option("IN", options->In, "Image to read")->required()->type_name("");
   command
       ->add_option("-o,--output", options->Out,
-                   "Name of the pyramid: a folder, or a ZIP where it ends in .zip or .szi")
+                   "Name of the pyramid: a folder, or a ZIP file if it ends in .zip or .szi")
       ->required()
       ->type_name("NAME");
   command
@@ -78,57 +78,56 @@ void AddTiles(CLI::App& app, Session& session) {
           "deepzoom (NAME.dzi and NAME_files; the default), iiif (level 0 of version 3) or xyz (for maps)")
       ->type_name("KIND")
       ->check(CLI::IsMember({"deepzoom", "iiif", "xyz"}));
-  command->add_option("--tile", options->Making.Tile, "Edge of a tile in pixels, 256 by default")
+  command->add_option("--tile", options->Making.Tile, "Width and height of a tile in pixels, 256 by default")
       ->type_name("N")
       ->check(CLI::Range(16, 8192));
   command
       ->add_option("--overlap", options->Making.Overlap,
-                   "Pixels that a tile of deepzoom has of its neighbours, on each side; 0 by default")
+                   "Pixels by which deepzoom tiles overlap their neighbours, on each side; 0 by default")
       ->type_name("N")
       ->check(CLI::Range(0, 64));
   command->add_option("--format", options->Making.Type, "Type of the tiles: jpg (default), png or webp")
       ->type_name("NAME");
   command
       ->add_option("--quality", session.Writing.Quality,
-                   "JPEG quality, 1 to 100, 90 by default; from 90 on colours keep their full resolution")
+                   "JPEG quality, 1 to 100, 90 by default; from 90 on chroma isn't subsampled")
       ->type_name("N")
       ->check(CLI::Range(1, 100));
   command
       ->add_option("--kernel", options->Making.Kernel,
-                   "triangle, box (default), lanczos3, lanczos8, mitchell, poly3 or cubic. box reads the\n"
-                   "image once, others once for each level")
+                   "Resampling kernel: triangle, box (default), lanczos3, lanczos8, mitchell, poly3 or\n"
+                   "cubic. box reads the image once, the others once for each level")
       ->type_name("NAME")
       ->check(CLI::IsMember({"triangle", "box", "lanczos3", "lanczos8", "mitchell", "poly3", "cubic"}));
   command->add_flag("--use-levels", options->Making.UseLevels,
-                    "Take the smaller copies in the image for smaller levels, as those of a pyramidal TIFF");
+                    "Use the smaller copies in the file, as in a pyramidal TIFF, for smaller levels");
   command
-      ->add_option(
-          "--background", options->Background,
-          "What shows through where tiles have no alpha, and fills up tiles of xyz; white by default")
+      ->add_option("--background", options->Background,
+                   "Colour behind alpha in tiles without alpha, and padding of xyz tiles; white by default")
       ->type_name("RRGGBB");
   command->add_flag("--skip-blank", options->Making.SkipBlank,
-                    "Leave out tiles that show the background alone, or nothing");
+                    "Omit tiles that show only the background, or nothing");
   command
       ->add_option("--address", options->Making.Address,
-                   "Where the folder of iiif will be found, as https://example.org/iiif")
+                   "URL where the iiif folder will be served, such as https://example.org/iiif")
       ->type_name("URL");
   command->add_flag("--page", options->Making.Page,
-                    "Add a page that shows it: NAME.html beside NAME.dzi, else NAME/index.html");
-  command->add_flag("--resume", options->Making.Resume, "Go on with a folder that was interrupted");
+                    "Add a web page that shows the pyramid: NAME.html beside NAME.dzi, else NAME/index.html");
+  command->add_flag("--resume", options->Making.Resume, "Continue an interrupted folder");
   CLI::Option* part =
       command
           ->add_option_function<std::string>(
               "--part", [options](const std::string& text) { SetPart(options->Making, text); },
-              "Make part K of N only, from 1/N to N/N, at the same time or on several machines")
+              "Make only part K of N; parts may be made at the same time, and on several machines")
           ->type_name("K/N");
   command
       ->add_option(
           "--join", options->Making.Parts,
-          "Complete the pyramid when all N parts are made; with the options that they were made with")
+          "Complete the pyramid when all N parts are made; give the options that they were made with")
       ->type_name("N")
       ->check(CLI::Range(1, MostParts))
       ->excludes(part);
-  command->add_option("--threads", session.Threads, "Threads to work on; 0, the default, is one a processor")
+  command->add_option("--threads", session.Threads, "Number of threads; 0, the default, is one per processor")
       ->type_name("N")
       ->check(CLI::Range(0, 32));
   AddStoreOptions(*command, session);

@@ -37,19 +37,20 @@ int View(Session& session, Options options) {
 }
 
 void AddView(CLI::App& app, Session& session) {
-  CLI::App* command = app.add_subcommand("view", "Look at images of any size in the browser");
+  CLI::App* command = app.add_subcommand("view", "View images of any size in the browser");
   command->footer(
-      "The address is printed, and opened where there is a desktop. Only this machine can reach it, unless\n"
-      "--listen says otherwise. Ctrl-C ends it; nothing is left behind.\n\n"
+      "The address of the page is printed, and opened in the browser if there is a desktop. Only this\n"
+      "machine can reach it, unless --listen says otherwise. Ctrl-C ends the viewer, and nothing is left\n"
+      "behind.\n\n"
       "Examples:\n"
       "  picturezor view scan.tif\n"
       "  picturezor view --no-open photos/*.jpg");
   auto options = std::make_shared<Options>();
   command->add_option("FILE", options->Viewing.Files, "Images to show")->required()->type_name("");
-  command->add_flag("--no-open", options->NoOpen, "Print the address, and open nothing");
+  command->add_flag("--no-open", options->NoOpen, "Print the address, but don't open it");
   command
       ->add_option("--listen", options->Viewing.Listen,
-                   "Address to listen on, 127.0.0.1 by default. Whoever reaches another one sees the images")
+                   "Address to listen on, 127.0.0.1 by default. Anyone who can reach it sees the images")
       ->type_name("ADDRESS");
   AddStoreOptions(*command, session);
   command->callback(

@@ -5,12 +5,12 @@
 namespace picturezor::steps {
 
 const Step Engrave{.Name = "filter engrave",
-                   .Help = "Gray relief of the edges",
+                   .Help = "Emboss: a gray relief of the edges",
                    .More = "",
                    .Examples = {},
                    .Options = {{.Name = "level",
                                 .Of = Kind::Integer,
-                                .Help = "How deep, in pixels",
+                                .Help = "Depth of the relief in pixels",
                                 .Least = -10000,
                                 .Most = 10000,
                                 .Default = "1"}},

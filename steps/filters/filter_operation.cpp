@@ -29,10 +29,10 @@ class FilterOperation final : public flow::Operation {
   flow::Shape Result(const flow::Shape& source) const override {
     const Format colours = files::WithoutAlpha(source.Of);
     if (Rules.Groups == Serves::RGB && colours != Format::RGB)
-      throw Unserved(std::string(Rules.Name) + " is there for RGB only, and this is " +
+      throw Unserved(std::string(Rules.Name) + " supports only RGB, and this is " +
                      files::Describe(source.Of));
     if (Rules.Groups == Serves::GrayAndRGB && colours == Format::CMYK)
-      throw Unserved(std::string(Rules.Name) + " isn't there for CMYK");
+      throw Unserved(std::string(Rules.Name) + " doesn't support CMYK");
     if (Rules.NotForGray && colours == Format::G) throw files::UsageFailure(Rules.NotForGray);
     return source;
   }

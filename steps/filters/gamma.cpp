@@ -12,7 +12,7 @@ std::vector<std::int32_t> TableOf(double gamma) {
   Bytes samples(256);
   std::iota(samples.begin(), samples.end(), std::uint8_t{0});
   ramp.SetRowInFormat(0, Format::G, samples);
-  if (!ramp.GammaFilter(ramp, gamma)) throw files::Failure("there is no such gamma");
+  if (!ramp.GammaFilter(ramp, gamma)) throw files::Failure("this gamma can't be applied");
   samples = ramp.RowInFormat(0, Format::G);
   return {samples.begin(), samples.end()};
 }
@@ -20,12 +20,12 @@ std::vector<std::int32_t> TableOf(double gamma) {
 }
 
 const Step Gamma{.Name = "filter gamma",
-                 .Help = "Brighten with more than 1, darken with less",
+                 .Help = "Correct the gamma: above 1 brightens, below 1 darkens",
                  .More = "",
                  .Examples = {},
                  .Options = {{.Name = "gamma",
                               .Of = Kind::Numbers,
-                              .Help = "One gamma, or those of red, green and blue, as 2.2,1.8,2",
+                              .Help = "One gamma, or one each for red, green and blue, such as 2.2,1.8,2",
                               .Placeholder = "G",
                               .Least = 1e-6,
                               .Most = 1e6,
@@ -33,7 +33,7 @@ const Step Gamma{.Name = "filter gamma",
                  .Make = [](const Values& values, const Surroundings&) {
                    const Numbers g = values.Get<Numbers>("gamma");
                    if (g.size() != 1 && g.size() != 3)
-                     throw files::UsageFailure("--gamma: give one number, or three with commas");
+                     throw files::UsageFailure("--gamma: give one number, or three separated by commas");
                    return MakeFilter({.Name = "gamma",
                                       .Groups = Serves::GrayAndRGB,
                                       .NotForGray = g.size() > 1 ? "--gamma: a gray image has one" : nullptr},

@@ -3,7 +3,7 @@
 namespace picturezor::steps {
 
 const Step Invert{.Name = "filter invert",
-                  .Help = "The complement of every colour",
+                  .Help = "Invert the colours",
                   .More = "",
                   .Examples = {},
                   .Options = {},

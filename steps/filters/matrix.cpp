@@ -6,24 +6,24 @@ namespace picturezor::steps {
 
 const Step Matrix{
     .Name = "filter matrix",
-    .Help = "Weigh the samples around each one",
+    .Help = "Convolve with a square kernel",
     .More = "",
     .Examples = {},
     .Options = {{.Name = "weights",
                  .Of = Kind::IntegersOrFile,
                  .Help =
-                     "A square of weights, row by row, in the option or in a file; from 255 on a place is\n"
-                     "left out",
+                     "Square kernel of weights, row by row, in the option or in a file; a weight of 255 or\n"
+                     "more leaves its sample out",
                  .Required = true},
                 {.Name = "delta",
                  .Of = Kind::Integer,
-                 .Help = "Added to the sum",
+                 .Help = "Offset that is added to the weighted sum",
                  .Least = -1000000,
                  .Most = 1000000,
                  .Default = "0"},
                 {.Name = "scale",
                  .Of = Kind::Number,
-                 .Help = "Then multiplied by this; 1 divided by the sum of the weights by default",
+                 .Help = "Factor that is applied after it; 1 divided by the sum of the weights by default",
                  .Least = -1e6,
                  .Most = 1e6}},
     .Make = [](const Values& values, const Surroundings&) {
@@ -32,7 +32,7 @@ const Step Matrix{
       const int side = int(std::lround(std::sqrt(double(weights.size()))));
       if (std::size_t(side) * std::size_t(side) != weights.size() || side > 50)
         throw files::UsageFailure("--weights: " + std::to_string(weights.size()) +
-                                  " numbers are no square of at most 50 x 50");
+                                  " numbers don't form a square of at most 50 x 50");
       double sum = 0;
       for (const std::int32_t weight : weights) sum += weight < 255 ? weight : 0;
       double scale = values.Has("scale") ? values.Number("scale") : 0;

@@ -3,12 +3,12 @@
 namespace picturezor::steps {
 
 const Step SoftBlur{.Name = "filter soft-blur",
-                    .Help = "A blur by less than a pixel",
+                    .Help = "Blur by less than a pixel",
                     .More = "",
                     .Examples = {},
                     .Options = {{.Name = "radius",
                                  .Of = Kind::Number,
-                                 .Help = "A fraction of a pixel",
+                                 .Help = "Radius, a fraction of a pixel",
                                  .Least = 0,
                                  .Most = 0.999,
                                  .Default = "0.5"}},

@@ -3,7 +3,7 @@
 namespace picturezor::steps {
 
 const Step Solarize{.Name = "filter solarize",
-                    .Help = "Dark and bright become bright, the middle dark",
+                    .Help = "Make dark and bright tones bright, and midtones dark",
                     .More = "",
                     .Examples = {},
                     .Options = {},

@@ -7,7 +7,7 @@ namespace {
 std::vector<std::int32_t> TableOf(const char* name, const Values& values) {
   const Integers& numbers = values.Get<Integers>(name);
   if (numbers.size() > 256)
-    throw files::UsageFailure(std::string("--") + name + ": a table has 256 numbers at most");
+    throw files::UsageFailure(std::string("--") + name + ": a table has at most 256 numbers");
   return {numbers.begin(), numbers.end()};
 }
 
@@ -15,24 +15,24 @@ std::vector<std::int32_t> TableOf(const char* name, const Values& values) {
 
 const Step Transfer{
     .Name = "filter transfer",
-    .Help = "Send the samples through tables of numbers",
+    .Help = "Map samples through lookup tables",
     .More = "",
     .Examples = {},
-    .Options =
-        {{.Name = "table",
-          .Of = Kind::IntegersOrFile,
-          .Help = "What becomes of the samples 0 to 255, in the option or in a file; what is missing is 0"},
-         {.Name = "red", .Of = Kind::IntegersOrFile, .Help = "The same for one channel"},
-         {.Name = "green", .Of = Kind::IntegersOrFile, .Help = "The same for one channel"},
-         {.Name = "blue", .Of = Kind::IntegersOrFile, .Help = "The same for one channel"}},
+    .Options = {{.Name = "table",
+                 .Of = Kind::IntegersOrFile,
+                 .Help =
+                     "New values for the samples 0 to 255, in the option or in a file; missing ones are 0"},
+                {.Name = "red", .Of = Kind::IntegersOrFile, .Help = "The same, for red only"},
+                {.Name = "green", .Of = Kind::IntegersOrFile, .Help = "The same, for green only"},
+                {.Name = "blue", .Of = Kind::IntegersOrFile, .Help = "The same, for blue only"}},
     .Make = [](const Values& values, const Surroundings&) {
       const int channels = values.Has("red") + values.Has("green") + values.Has("blue");
       if (values.Has("table") == (channels > 0))
         throw files::UsageFailure("give --table, or --red, --green and --blue");
-      if (channels % 3 != 0) throw files::UsageFailure("--red, --green and --blue go together");
+      if (channels % 3 != 0) throw files::UsageFailure("give --red, --green and --blue together");
       const FilterRules rules{.Name = "transfer",
                               .Groups = Serves::GrayAndRGB,
-                              .NotForGray = channels > 0 ? "a gray image has one --table" : nullptr};
+                              .NotForGray = channels > 0 ? "for a gray image, give --table" : nullptr};
       if (channels == 0)
         return MakeFilter(rules, [table = TableOf("table", values)](const Picture& colours) {
           return colours.TransferFilter(colours, IntegerArray(table));

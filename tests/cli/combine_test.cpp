@@ -30,7 +30,7 @@ TEST_F(Combine, LaysTheOverlayWhereItIsAskedTo) {
       EXPECT_EQ(Combined({"--at=" + std::to_string(left) + "," + std::to_string(top)}, store), wanted)
           << left << "," << top << " " << store;
     }
-  Fail({"combine", "base.png", "over.png", "--at", "12,0", "-o", "x.png"}, "over.png", "nothing of it lies");
+  Fail({"combine", "base.png", "over.png", "--at", "12,0", "-o", "x.png"}, "over.png", "entirely outside");
 }
 
 TEST_F(Combine, BlendsByAlphaMaskOrColour) {
@@ -69,7 +69,7 @@ TEST_F(Combine, RefusesWhatDoesntFit) {
   WritePNG(At("mask.png"), Noise(8, 9, 1));
   WriteTIFF(At("ink.tif"), Noise(9, 9, 4), {.CMYK = true});
   Fail({"combine", "base.png", "base.png", "--mask", "mask.png", "-o", "x.png"}, "mask.png", "as large as");
-  Fail({"combine", "base.png", "ink.tif", "-o", "x.png"}, "ink.tif", "no way from CMYK to RGB");
+  Fail({"combine", "base.png", "ink.tif", "-o", "x.png"}, "ink.tif", "CMYK can't be converted to RGB");
   for (const Arguments& wrong : {Arguments{"--fore", "12345"},
                                  {"--at", "1"},
                                  {"--at", "a,b"},

@@ -52,7 +52,7 @@ TEST_F(Filter, EveryOneRunsInBothStoresAndLeavesAlpha) {
     for (const Arguments& filter : EveryFilter) {
       SCOPED_TRACE(filter[0] + " of " + std::to_string(channels));
       if (filter[0] == "auto-level" && channels < 3) {
-        Fail({"filter", "auto-level", "in.png", "-o", "none.png"}, "in.png", "there for RGB only");
+        Fail({"filter", "auto-level", "in.png", "-o", "none.png"}, "in.png", "supports only RGB");
         continue;
       }
       const Raster result = Filtered(filter, "in.png");
@@ -99,8 +99,8 @@ TEST_F(Filter, SaysWhatTheOptionsSay) {
 TEST_F(Filter, RefusesInkWhereThereIsNoWay) {
   WriteTIFF(At("ink.tif"), Noise(20, 10, 4), {.CMYK = true});
   for (const char* filter : {"stamp", "gain", "diffuse", "engrave", "dither"})
-    Fail({"filter", filter, "ink.tif", "-o", "out.tif"}, "ink.tif", "isn't there for CMYK");
-  Fail({"filter", "auto-level", "ink.tif", "-o", "out.tif"}, "ink.tif", "there for RGB only");
+    Fail({"filter", filter, "ink.tif", "-o", "out.tif"}, "ink.tif", "doesn't support CMYK");
+  Fail({"filter", "auto-level", "ink.tif", "-o", "out.tif"}, "ink.tif", "supports only RGB");
   Do({"filter", "invert", "ink.tif", "-o", "out.tif"});
   Raster inverted = ReadTIFF(At("ink.tif"));
   for (auto& sample : inverted.Samples) sample = std::uint8_t(255 - sample);

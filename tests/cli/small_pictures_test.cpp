@@ -52,7 +52,7 @@ TEST_F(Thumbnails, NeverCostAnImage) {
   std::filesystem::create_directory(At("b"));
   for (const char* name : {"a.png", "b/a.png"}) WritePNG(At(name), Noise(9, 7, 3));
   WriteJPEG(At("a.jpg"), Waves(9, 7, 3));
-  Fail({"thumbnail", "a.png", "--size", "5", "-o", "."}, "a.png", "taken by a thumbnail");
+  Fail({"thumbnail", "a.png", "--size", "5", "-o", "."}, "a.png", "overwritten by a thumbnail");
   Fail({"thumbnail", "b/a.png", "a.png", "--size", "5", "-o", "."}, "a.png", "the name of that of b/a.png");
   Fail({"thumbnail", "a.png", "a.jpg", "--size", "5", "-o", "out"}, "a.jpg", "the name of that of a.png");
   Fail({"thumbnail", "a.png", "a.jpg", "--name", "{width}.tif", "--size", "5", "-o", "out"}, "a.jpg",
@@ -143,7 +143,7 @@ TEST_F(Shown, FitsTheWindow) {
 TEST_F(Shown, NeedsAnImage) {
   Fail({"show", "none.png"}, "none.png", "No such file");
   WritePNG(At("high.png"), Noise(1, 600, 1));
-  Fail({"show", "high.png", "--width", "60"}, "high.png", "too high");
+  Fail({"show", "high.png", "--width", "60"}, "high.png", "too tall");
   EXPECT_EQ(Run({"show", "high.png", "--width", "0"}).Code, 3);
 }
 

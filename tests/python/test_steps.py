@@ -67,7 +67,7 @@ def test_values_come_in_every_way(lake, tmp_path):
 def test_refusals_speak_pythons_names():
     picture = pz.Picture(4, 3)
     for call, raised, said in ((lambda: picture.scale(), ValueError, "give width, height, fit or percent"),
-                               (lambda: picture.scale(width=5, fit=(3, 3)), ValueError, "fit and width exclude"),
+                               (lambda: picture.scale(width=5, fit=(3, 3)), ValueError, "fit and width can't be used"),
                                (lambda: picture.scale(width=0), ValueError, "width"),
                                (lambda: picture.scale(width="many"), ValueError, "whole number"),
                                (lambda: picture.scale(width=[1]), TypeError, "width can't be"),
