@@ -84,7 +84,7 @@ class ProfileReader final : public ImageReader {
     if (target.By == Intent::Relative) flags |= cmsFLAGS_BLACKPOINTCOMPENSATION;
     Converting.reset(cmsCreateTransform(from.get(), LayoutOf(stored.Pixels), to.get(), LayoutOf(Pixels),
                                         cmsUInt32Number(target.By), flags));
-    if (!Converting) throw Failure(file, "there is no way from its profile to the one asked for");
+    if (!Converting) throw Failure(file, "its colours can't be converted to the profile asked for");
     Line.resize(std::size_t(stored.Width) * std::size_t(ChannelsOf(stored.Pixels)));
     Describe();
     About.Profile = target.Profile;

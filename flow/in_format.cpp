@@ -6,7 +6,7 @@ namespace picturezor::flow {
 
 Shape InFormat::Result(const Shape& source) const {
   if (!files::Convertible(source.Of, To))
-    throw files::Failure("there is no way from " + files::Describe(source.Of) + " to " + files::Describe(To));
+    throw files::Failure(files::Describe(source.Of) + " can't be converted to " + files::Describe(To));
   Shape result = source;
   result.Of = To;
   return result;

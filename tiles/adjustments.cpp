@@ -51,7 +51,7 @@ flow::Chain Adjustments::Chain(const files::StoreOptions& stores) const {
 }
 
 SampleTable AutoLevelTable(const Picture& picture) {
-  if (!picture.IsRGB()) throw files::Failure("auto-level is there for RGB only");
+  if (!picture.IsRGB()) throw files::Failure("auto-level supports only RGB");
   const Picture levelled = picture.Clone();
   if (!levelled || !levelled.AutoLevel()) throw files::Failure("the levels can't be stretched");
   // It sends all channels through one table, of which the samples that there are show a part; between them

@@ -81,7 +81,7 @@ class Journal:
             self._base.execute("COMMIT")
             taken = self._base.execute("SELECT input FROM plan WHERE input IN (SELECT target FROM plan)").fetchone()
         if taken:
-            raise BatchFailure(f"{os.fsdecode(_bytes(taken[0]))}: its place would be taken by a result")
+            raise BatchFailure(f"{os.fsdecode(_bytes(taken[0]))}: it would be overwritten by a result")
 
     def settle(self, recipe, redo):
         """Tells what is done already from what isn't. Gives the number of results that another recipe made, which

@@ -1,8 +1,10 @@
 #pragma once
 #include <pybind11/pybind11.h>
 
+#include <algorithm>
 #include <charconv>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -51,11 +53,15 @@ struct Named {
   Enum Of;
 };
 
+/// Small letters and capitals count alike.
 template <class Enum>
 Enum FromName(const std::string& text) {
+  const auto small = [](char letter) {
+    return letter >= 'A' && letter <= 'Z' ? letter - 'A' + 'a' : int{letter};
+  };
   std::string known;
   for (const auto& [member, value] : EnumNames<Enum>::Members) {
-    if (text == member) return value;
+    if (std::ranges::equal(text, std::string_view(member), {}, small, small)) return value;
     known += (known.empty() ? "" : ", ") + std::string(member);
   }
   throw py::value_error(text + " is no " + EnumNames<Enum>::Name + "; there are " + known);

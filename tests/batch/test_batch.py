@@ -65,7 +65,7 @@ def test_bad_inputs_are_told_and_the_rest_is_made(batch):
     (["steps", "in/*", "-o", "out/"], 3, "the name of a directory"),
     (["steps", "in/*", "-o", "out/{stem}.gif"], 3, "must end in"),
     (["steps", "in/*", "-o", "out/{ext}.png"], 2, "its result would have the name of that of"),
-    (["steps", "in/*", "-o", "in/{stem}.png"], 2, "its place would be taken"),
+    (["steps", "in/*", "-o", "in/{stem}.png"], 2, "it would be overwritten"),
     (["steps", "-o", "out/{stem}.png"], 3, "there are no inputs"),
     (["steps", "in", "-o", "out/{stem}.png"], 3, "a directory"),
     (["steps", "nothing/*", "-o", "out/{stem}.png"], 3, "no file has such a name"),
