@@ -106,7 +106,8 @@ class RowRuns {
   /// The part of the background, and behind it those of all samples.
   void FillParts(const Sample* from, const Shift& shift) const {
     const SampleTable table = PartsOf(shift.Part);
-    for (int c = 0; c < Step; ++c) Parts[c] = table[Pixel[c]];
+    // Some compilers see a sixth sample coming.
+    for (int c = 0; c < std::min(Step, int(Pixel.size())); ++c) Parts[c] = table[Pixel[c]];
     const std::ptrdiff_t count = std::ptrdiff_t{Of.From.Width} * Step;
     Sample* parts = Parts.get() + Step;
     Multiplier multiplier;

@@ -71,6 +71,33 @@ LOOP_INLINE int SampleIn(const Sample* unit, int sample, int line) {
   std::memcpy(&number, unit + (sample / 8 * 16 + line * 8 + sample % 8) * int(sizeof number), sizeof number);
   return number;
 }
+#ifdef __ARM_NEON
+LOOP_INLINE void StoreWidened(const Bytes& even, const Bytes& odd, Sample* unit) {
+  Store(unit, vmovl_u8(vget_low_u8(uint8x16_t(even))));
+  Store(unit + Width, vmovl_u8(vget_low_u8(uint8x16_t(odd))));
+  Store(unit + Width * 2, vmovl_u8(vget_high_u8(uint8x16_t(even))));
+  Store(unit + Width * 3, vmovl_u8(vget_high_u8(uint8x16_t(odd))));
+}
+LOOP_INLINE int16x4_t DigitsOf(const std::int16_t* two) {
+  std::int32_t both;
+  std::memcpy(&both, two, sizeof both);
+  return vreinterpret_s16_s32(vdup_n_s32(both));
+}
+template <int Line>
+LOOP_INLINE void AddLine(Sums* sums, const Sample* unit, int16x4_t digits) {
+  UNROLL
+  for (int half = 0; half < 2; ++half) {
+    const auto numbers = Load<int16x8_t>(unit + (half * 2 + Line) * Width);
+    sums[half * 2] = Sums(vmlal_lane_s16(int32x4_t(sums[half * 2]), vget_low_s16(numbers), digits, Line));
+    sums[half * 2 + 1] =
+        Sums(vmlal_lane_s16(int32x4_t(sums[half * 2 + 1]), vget_high_s16(numbers), digits, Line));
+  }
+}
+LOOP_INLINE void AddProducts(Sums* sums, const Sample* unit, int16x4_t digits) {
+  AddLine<0>(sums, unit, digits);
+  AddLine<1>(sums, unit, digits);
+}
+#else
 using HalfBytes [[gnu::vector_size(8)]] = std::uint8_t;
 using HalfNumbers [[gnu::vector_size(8)]] = std::int16_t;
 LOOP_INLINE void StoreWidened(const Bytes& even, const Bytes& odd, Sample* unit) {
@@ -80,20 +107,17 @@ LOOP_INLINE void StoreWidened(const Bytes& even, const Bytes& odd, Sample* unit)
       Store(unit + (half * 2 + line) * Width, __builtin_convertvector(Load<HalfBytes>(bytes), Numbers));
     }
 }
-LOOP_INLINE Bytes Narrowed(const Sample* unit, int line) {
-  return Packed(Load<Numbers>(unit + line * Width), Load<Numbers>(unit + (2 + line) * Width));
-}
 LOOP_INLINE const std::int16_t* DigitsOf(const std::int16_t* two) { return two; }
 LOOP_INLINE void AddProducts(Sums* sums, const Sample* unit, const std::int16_t* digits) {
   for (int k = 0; k < 4; ++k)
     for (int line = 0; line < 2; ++line) {
       const auto numbers = Load<HalfNumbers>(unit + (k / 2 * 2 + line) * Width + k % 2 * 8);
-#ifdef __ARM_NEON
-      sums[k] = Sums(vmlal_n_s16(int32x4_t(sums[k]), int16x4_t(numbers), digits[line]));
-#else
       sums[k] += __builtin_convertvector(numbers, Sums) * std::int32_t{digits[line]};
-#endif
     }
+}
+#endif
+LOOP_INLINE Bytes Narrowed(const Sample* unit, int line) {
+  return Packed(Load<Numbers>(unit + line * Width), Load<Numbers>(unit + (2 + line) * Width));
 }
 
 /// The sums of one sample with either digit.
