@@ -35,7 +35,7 @@ def test_failures_have_types_of_their_own():
 
 
 def test_results_are_the_very_objects():
-    assert pz.Picture(1, 1, "xBGR").image_format is pz.Format.XBGR
+    assert pz.Picture(1, 1, "xBGR").image_format == pz.Format.XBGR
     picture, dest = pz.Picture(4, 3), pz.Picture(4, 3)
     assert picture.gamma_filter(dest=dest, gamma=2) is dest
     assert picture.gamma_filter(picture, gamma=2) is picture
