@@ -67,9 +67,11 @@ std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& op
     if (type->Begins(start) && (!type->Is || type->Is(input))) {
       if (options.Page > 0 && !type->Several)
         throw Failure(input.Name(), "only the first picture of a file can be read");
+      const auto reachable = [&] {
+        return input.Spooled(options.TempDirectory.empty() ? DefaultTempDirectory() : options.TempDirectory);
+      };
       const bool asItIs = type->InOrder || input.Seekable();
-      const auto& spool = options.TempDirectory.empty() ? DefaultTempDirectory() : options.TempDirectory;
-      std::unique_ptr<ImageReader> reader = type->Open(asItIs ? input : input.Spooled(spool), options);
+      std::unique_ptr<ImageReader> reader = type->Open(asItIs ? input : reachable(), options);
       reader->About.Type = type;
       return reader;
     }

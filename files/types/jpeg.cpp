@@ -168,15 +168,15 @@ class JPEGWriter : public ImageWriter {
   void Finish() override { Flush(File, Path); }
 
  private:
-  static JPEGHead HeadOf(const std::filesystem::path& target, const ImageInfo& info,
-                         const WriteOptions& options) {
+  static JPEGMarkers HeadOf(const std::filesystem::path& target, const ImageInfo& info,
+                            const WriteOptions& options) {
     if (options.Lossless) throw UsageFailure(target, "JPEG has no --lossless; JPEG XL, WebP and PNG have");
-    JPEGHead head;
+    JPEGMarkers head;
     const auto add = [&](int marker, std::string_view start, const Bytes& data) {
       // One that would be too long is left out.
       if (data.empty() || start.size() + data.size() > MostMarkerBytes) return;
-      head.Markers.push_back({marker, Bytes(start.begin(), start.end())});
-      head.Markers.back().Data.insert(head.Markers.back().Data.end(), data.begin(), data.end());
+      head.push_back({marker, Bytes(start.begin(), start.end())});
+      head.back().Data.insert(head.back().Data.end(), data.begin(), data.end());
     };
     // CMYK has no JFIF header, so its density needs a block of EXIF.
     if (!info.Exif.empty() || info.Pixels == Format::CMYK) add(NotesMarker, ExifStart, ExifToWrite(info));

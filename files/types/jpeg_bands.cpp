@@ -76,11 +76,11 @@ class Encoder {
   std::int64_t UnitWidth() const { return BlockEdge * Jpeg.comp_info[0].h_samp_factor; }
   std::int64_t UnitHeight() const { return BlockEdge * Jpeg.comp_info[0].v_samp_factor; }
 
-  void BeginFile(const JPEGHead& head, const Bytes& profile, unsigned interval) {
+  void BeginFile(const JPEGMarkers& head, const Bytes& profile, unsigned interval) {
     Try([&] {
       Jpeg.restart_interval = interval;
       jpeg_start_compress(&Jpeg, TRUE);
-      for (const JPEGHead::Marker& marker : head.Markers)
+      for (const JPEGMarker& marker : head)
         jpeg_write_marker(&Jpeg, marker.Code, marker.Data.data(), unsigned(marker.Data.size()));
       if (!profile.empty()) jpeg_write_icc_profile(&Jpeg, profile.data(), unsigned(profile.size()));
     });
@@ -136,8 +136,8 @@ std::size_t ScanOf(std::span<std::uint8_t> file, std::int32_t height) {
 
 }
 
-JPEGBands::JPEGBands(const std::filesystem::path& target, const ImageInfo& info, JPEGHead head, int quality,
-                     int threads, Sink sink)
+JPEGBands::JPEGBands(const std::filesystem::path& target, const ImageInfo& info, JPEGMarkers head,
+                     int quality, int threads, Sink sink)
     : Path(target),
       Info(info),
       Head(std::move(head)),

@@ -11,14 +11,12 @@
 
 namespace picturezor::files {
 
-/// What stands before the pixels of a JPEG.
-struct JPEGHead {
-  struct Marker {
-    int Code;
-    Bytes Data;
-  };
-  std::vector<Marker> Markers;
+/// A segment that stands before the pixels of a JPEG.
+struct JPEGMarker {
+  int Code;
+  Bytes Data;
 };
+using JPEGMarkers = std::vector<JPEGMarker>;
 
 /// Makes a baseline JPEG out of its rows, band by band on several threads. Nothing leads from one band into
 /// the next but the coding of means by differences, which a restart marker between them begins anew: so bands
@@ -29,7 +27,7 @@ class JPEGBands {
   using Sink = std::function<void(std::span<const std::uint8_t>)>;
   /// `info` has the size, pixels, density and profile. `sink` gets the file in pieces, on the caller's
   /// thread.
-  JPEGBands(const std::filesystem::path& target, const ImageInfo& info, JPEGHead head, int quality,
+  JPEGBands(const std::filesystem::path& target, const ImageInfo& info, JPEGMarkers head, int quality,
             int threads, Sink sink);
   /// The next row; with the last one all of the file has been given.
   void Add(const std::uint8_t* row);
@@ -47,7 +45,7 @@ class JPEGBands {
 
   const std::filesystem::path Path;
   const ImageInfo Info;
-  const JPEGHead Head;
+  const JPEGMarkers Head;
   const int Quality;
   const Sink Into;
   std::size_t RowBytes;

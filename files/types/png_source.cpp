@@ -122,23 +122,20 @@ Bytes PNGSource::TakeStored() {
 }
 
 void PNGSource::UnpackAhead() {
-  for (bool more = true; more;) {
-    Bytes stored;
-    std::exception_ptr failed;
-    try {
-      stored = Stored();
-    } catch (...) {
-      failed = std::current_exception();
-    }
-    more = !failed && !stored.empty();
-    std::unique_lock lock(Guard);
-    Changed.wait(lock, [this] { return Stopping || Ready.size() < MostReady; });
-    if (Stopping) return;
-    if (failed)
-      Failed = failed;
-    else
+  try {
+    for (bool more = true; more; Changed.notify_all()) {
+      Bytes stored = Stored();
+      more = !stored.empty();
+      std::unique_lock lock(Guard);
+      Changed.wait(lock, [this] { return Stopping || Ready.size() < MostReady; });
+      if (Stopping) return;
       Ready.push_back(std::move(stored));
-    lock.unlock();
+    }
+  } catch (...) {
+    {
+      const std::lock_guard lock(Guard);
+      Failed = std::current_exception();
+    }
     Changed.notify_all();
   }
 }
