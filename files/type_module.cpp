@@ -23,7 +23,7 @@ const TypeCode& CodeOf(const char* module, const char* type) {
   if (!code) throw Failure(needs + path.string() + ": " + dlerror());
   const auto& found = *static_cast<const TypeCode*>(code);
   if (std::strcmp(found.Version, PICTUREZOR_VERSION) != 0)
-    throw Failure(needs + path.string() + ", of version " PICTUREZOR_VERSION " and not " + found.Version);
+    throw Failure(needs + path.string() + ", of version " + PICTUREZOR_VERSION + " and not " + found.Version);
   return found;
 }
 
