@@ -38,7 +38,6 @@ class Cropping final : public flow::Operation {
 const Step Crop{
     .Name = "crop",
     .Help = "Cut out a rectangle",
-    .More = "",
     .Examples = {"crop photo.jpg --rect 100,50,640,480 -o part.jpg"},
     .Options = {{.Name = "rect",
                  .Of = Kind::Rectangle,

@@ -23,8 +23,7 @@ class Rotating final : public flow::Operation {
     // Quarters of a turn, and within 45 degrees what is left.
     const double angle = Within360();
     const int quarters = angle > 315 ? 0 : int(std::ceil((angle - 45) / 90));
-    double rest = angle - 90 * quarters;
-    if (angle > 315) rest = angle;
+    const double rest = angle - 90 * quarters;
     flow::Shape result = source;
     if (quarters % 2 == 1) {
       std::swap(result.Width, result.Height);

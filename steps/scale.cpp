@@ -92,7 +92,6 @@ class Scaling final : public flow::Operation {
 const Step Scale{
     .Name = "scale",
     .Help = "Scale an image",
-    .More = "",
     .Examples = {"scale photo.jpg --width 800 -o small.jpg",
                  "scale photo.png --fit 1920x1080 --kernel mitchell -o screen.png",
                  "scale map.tif --percent 12.5 --memory-limit 256M -o overview.tif"},

@@ -35,9 +35,9 @@ struct Step {
   /// One line, and what else is to be said; examples as a person types them with the command, without its
   /// name.
   const char* Help;
-  const char* More;
-  std::vector<const char*> Examples;
-  std::vector<Option> Options;
+  const char* More = "";
+  std::vector<const char*> Examples{};
+  std::vector<Option> Options{};
   /// The values are checked one by one. Throws files::Failure where they don't go together.
   std::unique_ptr<const flow::Operation> (*Make)(const Values& values, const Surroundings& around);
 };

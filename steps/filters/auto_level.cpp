@@ -2,15 +2,14 @@
 
 namespace picturezor::steps {
 
-const Step AutoLevel{.Name = "filter auto-level",
-                     .Help = "Stretch the levels from black to white",
-                     .More = "",
-                     .Examples = {},
-                     .Options = {},
-                     .Make = [](const Values&, const Surroundings&) {
-                       return MakeFilter(
-                           {.Name = "auto-level", .Groups = Serves::RGB, .Needs = {}},
-                           [](const Picture& colours) { return colours.AutoLevel() ? colours : Picture(); });
-                     }};
+const Step AutoLevel{
+    .Name = "filter auto-level",
+    .Help = "Stretch the levels from black to white",
+    .Make =
+        [](const Values&, const Surroundings&) {
+          return MakeFilter({.Name = "auto-level", .Groups = Serves::RGB, .Needs = {}},
+                            [](const Picture& colours) { return colours.AutoLevel() ? colours : Picture(); });
+        },
+};
 
 }

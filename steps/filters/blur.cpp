@@ -7,8 +7,6 @@ namespace picturezor::steps {
 const Step Blur{
     .Name = "filter blur",
     .Help = "Box blur: the mean of a square around each sample",
-    .More = "",
-    .Examples = {},
     .Options = {{.Name = "radius",
                  .Of = Kind::Number,
                  .Help = "Radius in whole pixels",

@@ -4,8 +4,6 @@ namespace picturezor::steps {
 
 const Step Diffuse{.Name = "filter diffuse",
                    .Help = "Scatter the pixels",
-                   .More = "",
-                   .Examples = {},
                    .Options = {{.Name = "level",
                                 .Of = Kind::Integer,
                                 .Help = "Largest distance in pixels",

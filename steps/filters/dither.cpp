@@ -23,8 +23,6 @@ const std::map<std::string, Pattern> Patterns{
 
 const Step Dither{.Name = "filter dither",
                   .Help = "Ordered dithering to a few levels per channel",
-                  .More = "",
-                  .Examples = {},
                   .Options = {{.Name = "pattern",
                                .Of = Kind::Choice,
                                .Help = "Threshold pattern",

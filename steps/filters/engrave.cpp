@@ -6,8 +6,6 @@ namespace picturezor::steps {
 
 const Step Engrave{.Name = "filter engrave",
                    .Help = "Emboss: a gray relief of the edges",
-                   .More = "",
-                   .Examples = {},
                    .Options = {{.Name = "level",
                                 .Of = Kind::Integer,
                                 .Help = "Depth of the relief in pixels",

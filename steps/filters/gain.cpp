@@ -4,8 +4,6 @@ namespace picturezor::steps {
 
 const Step Gain{.Name = "filter gain",
                 .Help = "Change the contrast and brightness of midtones",
-                .More = "",
-                .Examples = {},
                 .Options = {{.Name = "gain",
                              .Of = Kind::Number,
                              .Help = "0.5 changes nothing, more raises contrast",

@@ -21,8 +21,6 @@ std::vector<std::int32_t> TableOf(double gamma) {
 
 const Step Gamma{.Name = "filter gamma",
                  .Help = "Correct the gamma: above 1 brightens, below 1 darkens",
-                 .More = "",
-                 .Examples = {},
                  .Options = {{.Name = "gamma",
                               .Of = Kind::Numbers,
                               .Help = "One gamma, or one each for red, green and blue, such as 2.2,1.8,2",

@@ -2,16 +2,16 @@
 
 namespace picturezor::steps {
 
-const Step Invert{.Name = "filter invert",
-                  .Help = "Invert the colours",
-                  .More = "",
-                  .Examples = {},
-                  .Options = {},
-                  .Make = [](const Values&, const Surroundings&) {
-                    return MakeFilter({.Name = "invert"}, [](const Picture& colours) {
-                      colours.Invert();
-                      return colours;
-                    });
-                  }};
+const Step Invert{
+    .Name = "filter invert",
+    .Help = "Invert the colours",
+    .Make =
+        [](const Values&, const Surroundings&) {
+          return MakeFilter({.Name = "invert"}, [](const Picture& colours) {
+            colours.Invert();
+            return colours;
+          });
+        },
+};
 
 }

@@ -7,8 +7,6 @@ namespace picturezor::steps {
 const Step Matrix{
     .Name = "filter matrix",
     .Help = "Convolve with a square kernel",
-    .More = "",
-    .Examples = {},
     .Options = {{.Name = "weights",
                  .Of = Kind::IntegersOrFile,
                  .Help =

@@ -4,8 +4,6 @@ namespace picturezor::steps {
 
 const Step Oil{.Name = "filter oil",
                .Help = "Oil painting: take the most frequent colour in the neighbourhood",
-               .More = "",
-               .Examples = {},
                .Options = {{.Name = "range",
                             .Of = Kind::Integer,
                             .Help = "Radius of the neighbourhood in pixels",

@@ -4,8 +4,6 @@ namespace picturezor::steps {
 
 const Step SoftBlur{.Name = "filter soft-blur",
                     .Help = "Blur by less than a pixel",
-                    .More = "",
-                    .Examples = {},
                     .Options = {{.Name = "radius",
                                  .Of = Kind::Number,
                                  .Help = "Radius, a fraction of a pixel",

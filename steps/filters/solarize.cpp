@@ -2,15 +2,14 @@
 
 namespace picturezor::steps {
 
-const Step Solarize{.Name = "filter solarize",
-                    .Help = "Make dark and bright tones bright, and midtones dark",
-                    .More = "",
-                    .Examples = {},
-                    .Options = {},
-                    .Make = [](const Values&, const Surroundings&) {
-                      return MakeFilter({.Name = "solarize"}, [](const Picture& colours) {
-                        return colours.SolarizeFilter(colours);
-                      });
-                    }};
+const Step Solarize{
+    .Name = "filter solarize",
+    .Help = "Make dark and bright tones bright, and midtones dark",
+    .Make =
+        [](const Values&, const Surroundings&) {
+          return MakeFilter({.Name = "solarize"},
+                            [](const Picture& colours) { return colours.SolarizeFilter(colours); });
+        },
+};
 
 }

@@ -7,8 +7,6 @@ namespace picturezor::steps {
 const Step Stamp{
     .Name = "filter stamp",
     .Help = "Threshold every channel to one of two colours, with a soft edge",
-    .More = "",
-    .Examples = {},
     .Options =
         {{.Name = "radius",
           .Of = Kind::Number,

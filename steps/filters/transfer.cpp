@@ -16,8 +16,6 @@ std::vector<std::int32_t> TableOf(const char* name, const Values& values) {
 const Step Transfer{
     .Name = "filter transfer",
     .Help = "Map samples through lookup tables",
-    .More = "",
-    .Examples = {},
     .Options = {{.Name = "table",
                  .Of = Kind::IntegersOrFile,
                  .Help =

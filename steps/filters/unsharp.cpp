@@ -7,8 +7,6 @@ namespace picturezor::steps {
 const Step Unsharp{
     .Name = "filter unsharp",
     .Help = "Unsharp mask: sharpen by the difference from a blurred copy",
-    .More = "",
-    .Examples = {},
     .Options = {{.Name = "radius",
                  .Of = Kind::Number,
                  .Help = "Radius of the blur, in whole pixels",
