@@ -132,7 +132,6 @@ PictureZOR* Rotate180(PictureZOR* self, PictureZOR* dest) {
   return RunFilter(self, dest, {.InPlace = false}, [](const FilterCall& call) {
     // Rows are read from the top where the order makes the result. Else from the bottom, so that both
     // pictures are gone through in one direction from end to end.
-    const bool inOrder = call.SharesPixels || !RowsAreApart(call.Dest);
     const Reversal reversal(call.In, call.Out, call.SharesPixels);
     const std::int32_t width = call.Source.Width, height = call.Source.Height;
     const std::int32_t most = std::min(RowsAtOnce(call.Source), RowsAtOnce(call.Dest));
@@ -141,7 +140,7 @@ PictureZOR* Rotate180(PictureZOR* self, PictureZOR* dest) {
       const bool reached = WithRows({call.Source, y, count}, {call.Dest, height - y - count, count},
                                     [&](const RowRun& from, const RowRun& into) {
                                       for (std::int32_t i = 0; i < count; ++i) {
-                                        const std::int32_t row = inOrder ? i : count - 1 - i;
+                                        const std::int32_t row = call.SharesPixels ? i : count - 1 - i;
                                         reversal.Copy(from[row], into[count - 1 - row], width);
                                       }
                                     });

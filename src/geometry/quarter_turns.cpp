@@ -44,8 +44,7 @@ struct Tile {
                     [&](const RowRun& from, const RowRun& into) {
                       const Transposition pixels = Between(from, into);
                       // Where what is written shows in other places too, the order makes the result.
-                      const bool free = !Call.SharesPixels && RowsAreApart(Call.Dest);
-                      free ? Transpose(pixels, Call.In, Call.Out) : InOrder(pixels);
+                      Call.SharesPixels ? InOrder(pixels) : Transpose(pixels, Call.In, Call.Out);
                     });
   }
   /// Row by row from the top, pixel by pixel from the left.

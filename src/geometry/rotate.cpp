@@ -136,19 +136,15 @@ PictureZOR* Rotate(PictureZOR* self, Double angle, Integer Red, Integer Green, I
   }
   if (!base) return nullptr;
   const auto background = [&]() -> std::array<Sample, 5> {
-    const auto low = [](Integer value) { return Sample(value & 255); };
-    switch (GroupOf(base.Data())) {
-      case Group::None: return {};
-      case Group::Gray:
-      case Group::GrayAlpha: return {low(Gray), low(Alpha)};
-      case Group::RGB:
-      case Group::RGBAlpha: return {low(Red), low(Green), low(Blue), low(Alpha)};
-      case Group::CMYK:
-      case Group::CMYKAlpha: return {low(Cyan), low(Magenta), low(Yellow), low(Black), low(Alpha)};
+    switch (FamilyOf(base.Data())) {
+      case Family::None: break;
+      case Family::Gray: return {Sample(Gray), Sample(Alpha)};
+      case Family::RGB: return {Sample(Red), Sample(Green), Sample(Blue), Sample(Alpha)};
+      case Family::CMYK: return {Sample(Cyan), Sample(Magenta), Sample(Yellow), Sample(Black), Sample(Alpha)};
     }
     return {};
   }();
-  if (GroupOf(base.Data()) == Group::None) return nullptr;
+  if (FamilyOf(base.Data()) == Family::None) return nullptr;
   return Rotation(DataOf(self), base.Data(), angle, background).Run();
 }
 

@@ -24,6 +24,11 @@ struct Line {
   Sample& operator[](std::int64_t i) const { return First[(i - FirstIndex) * Stride]; }
 };
 
+/// What stands behind the last sample of a line, which gave `taken`.
+Sample LastOf(const Shift& shift, Sample background, Sample taken) {
+  return Sample(Truncate(background - (background * shift.Part - taken)));
+}
+
 /// Writes samples first .. end - 1 of a line that comes of `length` samples.
 void ShearLine(const Line& in, std::int32_t length, const Line& out, std::int32_t first, std::int32_t end,
                const Shift& shift, Sample background) {
@@ -34,14 +39,9 @@ void ShearLine(const Line& in, std::int32_t length, const Line& out, std::int32_
       continue;
     }
     const Sample taken = PartOf(shift.Part, i > 0 ? in[i - 1] : background);
-    out[x] = i < length ? Sample(in[i] - (PartOf(shift.Part, in[i]) - taken))
-                        : Sample(Truncate(background - (background * shift.Part - taken)));
+    out[x] =
+        i < length ? Sample(in[i] - (PartOf(shift.Part, in[i]) - taken)) : LastOf(shift, background, taken);
   }
-}
-
-/// What stands behind the last sample of a line, which gave `taken`.
-Sample LastOf(const Shift& shift, Sample background, Sample taken) {
-  return Sample(Truncate(background - (background * shift.Part - taken)));
 }
 
 /// The background as it stands in a pixel.
