@@ -1,6 +1,5 @@
 #include <algorithm>
 #include <cstring>
-#include <limits>
 
 #include "composition/composition.h"
 #include "image/clip.h"
@@ -88,9 +87,9 @@ class BlockCopy {
             into + std::ptrdiff_t(Of.Dest.X) * Dest.PixelSize, Of.Dest.Width);
   }
   bool Reserve(std::int32_t rows) {
-    const std::int64_t row = StoredRowBytes(Source), all = row * rows;
+    const std::int64_t row = StoredRowBytes(Source);
     RowBytes = std::size_t(row);
-    if (all <= std::numeric_limits<std::ptrdiff_t>::max()) Rows = NewBuffer(std::size_t(all));
+    Rows = NewBuffer(rows, row);
     return Rows != nullptr;
   }
   bool Read(std::int32_t y, std::int32_t slot) {

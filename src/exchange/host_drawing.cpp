@@ -21,9 +21,8 @@ using DrawPictureMethod = void (*)(void* graphics, HostPicture* image, std::int3
                                    std::int32_t w, std::int32_t h, std::int32_t sx, std::int32_t sy,
                                    std::int32_t sw, std::int32_t sh);
 constexpr char DrawPictureDeclaration[] =
-    "DrawPicture(Image as Picture, x as Integer, y as Integer, w as Integer, h as Integer, sx as Integer = "
-    "0, "
-    "sy as Integer = 0, sw as Integer = -10000, sh as Integer = -10000)";
+    "DrawPicture(Image as Picture, x as Integer, y as Integer, w as Integer, h as Integer, "
+    "sx as Integer = 0, sy as Integer = 0, sw as Integer = -10000, sh as Integer = -10000)";
 
 bool CopyRows(const RowTableRecord& from, const RowTableRecord& into) {
   if (!from.Usable() || !into.Usable() || from.Width != into.Width || from.Height != into.Height ||

@@ -14,8 +14,6 @@ namespace {
 
 constexpr double FlagsChangedIn = 2010.029;
 
-double HostVersion = 0;
-
 void RewriteFlags(Word& flags) {
   if (flags & 0x40000) flags |= 4;
   if (flags & 0x80000) flags |= 8;
@@ -66,14 +64,14 @@ extern "C" [[gnu::visibility("default")]] void REALPluginMain(zor::Resolver reso
   SetResolver(resolver);
   SetResolver(reinterpret_cast<Resolver>(Resolve("ResolverPPC")));
   RegisterPluginVersion(9);
-  HostVersion = REALGetRBVersion();
+  const double hostVersion = REALGetRBVersion();
   std::srand(unsigned(std::time(nullptr)));
   InitPageSize();
   WritePictureClass();
   WriteFactoryClass();
   BuildConstantDeclarations(&PictureClass, 0, 0, 0);
-  RewriteVersionFlags(PictureClass, HostVersion);
-  RewriteVersionFlags(FactoryClass, HostVersion);
+  RewriteVersionFlags(PictureClass, hostVersion);
+  RewriteVersionFlags(FactoryClass, hostVersion);
   RegisterClassRounded(PictureClass);
   RegisterClassRounded(FactoryClass);
 }

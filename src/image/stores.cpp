@@ -243,8 +243,8 @@ std::int32_t RoundedRowSize(const PictureData& data, std::int32_t unit) {
 
 bool UseOwnMemory(PictureData& data) {
   if (data.TotalSize > Int32Max) return false;
-  // Of so much the system hands out fresh pages, the large ones at multiples of their size: what stands before
-  // the first of them and behind the last comes in small ones.
+  // Of so much the system hands out fresh pages, the large ones at multiples of their size: what stands
+  // before the first of them and behind the last comes in small ones.
   constexpr std::size_t large = 2 << 20, fresh = 32 << 20;
   const auto bytes = std::size_t(data.TotalSize), spare = bytes < fresh ? 0 : large - 1;
   auto* memory = static_cast<Sample*>(std::calloc(1, bytes + spare));
@@ -353,8 +353,7 @@ bool SharePixels(const PictureData& a, const PictureData& b) {
 }
 
 std::int64_t StoreRowOf(const PictureData& picture, std::int32_t y) {
-  const bool mirrored = picture.RowGetter == PlainRowMirrored || picture.RowGetter == MappedRowMirrored;
-  return mirrored ? MirroredStoreRow(picture, y) : StoreRow(picture, y);
+  return IsMirrored(picture) ? MirroredStoreRow(picture, y) : StoreRow(picture, y);
 }
 
 bool RowsAreApart(const PictureData& picture) { return StoredRowBytes(picture) <= picture.RowSize; }
