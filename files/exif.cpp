@@ -64,6 +64,13 @@ void SetExif(ImageInfo& info, Bytes block) {
   info.Exif = std::move(block);
 }
 
+void SetExifOfBox(ImageInfo& info, const Bytes& box) {
+  if (box.size() < 4) return;
+  const std::uint32_t at = std::uint32_t(box[0]) << 24 | box[1] << 16 | box[2] << 8 | box[3];
+  if (at < box.size() - 4) SetExif(info, Bytes(box.begin() + 4 + std::ptrdiff_t(at), box.end()));
+  info.Orientation = 1;
+}
+
 Bytes ExifToWrite(const ImageInfo& info) {
   ExifBlock block(info.Exif);
   if (!block.Valid()) {

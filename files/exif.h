@@ -18,6 +18,9 @@ Exif ReadExif(std::span<const std::uint8_t> block);
 /// Keeps a block that a file holds, and takes the orientation and the resolution from it. "Exif" and two
 /// zeros before it, which some files have, are left out.
 void SetExif(ImageInfo& info, Bytes block);
+/// The same with a box of HEIF or JPEG XL, which begins with the block's place behind that number. Decoders
+/// of these turn pictures upright themselves.
+void SetExifOfBox(ImageInfo& info, const Bytes& box);
 
 /// The block of EXIF that belongs into a file of `info`: the notes it came with, with an upright orientation,
 /// the size and resolution of `info` and without a thumbnail. Nothing else moves, so that notes of makers

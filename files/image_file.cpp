@@ -18,6 +18,11 @@ bool StartsWith(std::span<const std::uint8_t> bytes, std::string_view magic) {
   return bytes.size() >= magic.size() && std::memcmp(bytes.data(), magic.data(), magic.size()) == 0;
 }
 
+void ImageReader::SetBits(int bits) {
+  About.Bits = bits;
+  if (bits > 8) About.Notes.push_back(std::to_string(bits) + " bits a sample reduced to 8");
+}
+
 void ImageReader::ReadRows(std::uint8_t* rows, std::ptrdiff_t stride, std::int32_t count) {
   for (std::int32_t i = 0; i < count; ++i, rows += stride) ReadRow(rows);
 }

@@ -76,6 +76,9 @@ class ImageReader {
 
  protected:
   friend std::unique_ptr<ImageReader> OpenImage(const Input& input, const ReadOptions& options);
+  /// Tells the bits of a sample in the file, and what is lost of them.
+  void SetBits(int bits);
+
   ImageInfo About;
 };
 
@@ -153,6 +156,17 @@ struct FileType {
   std::unique_ptr<ImageWriter> (*Create)(int descriptor, const std::filesystem::path& target,
                                          const ImageInfo& info, const WriteOptions& options);
 };
+
+/// For `Open` and `Create`: classes that are made of what these get.
+template <class Reader>
+std::unique_ptr<ImageReader> OpenAs(const Input& input, const ReadOptions& options) {
+  return std::make_unique<Reader>(input, options);
+}
+template <class Writer>
+std::unique_ptr<ImageWriter> CreateAs(int descriptor, const std::filesystem::path& target,
+                                      const ImageInfo& info, const WriteOptions& options) {
+  return std::make_unique<Writer>(descriptor, target, info, options);
+}
 
 /// All types. What they begin with is tried in this order.
 std::span<const FileType* const> FileTypes();

@@ -43,18 +43,6 @@ std::vector<Picture> MakePictures(const StoreOptions& options, const std::vector
 /// One whose samples are anything at all: the caller fills all of them.
 Picture MakeToFill(const StoreOptions& options, const PictureSize& size);
 
-/// The pictures that filters make live where the image does: in temporary files when it is too large. While
-/// this lives, the module asks here.
-struct PicturesLike {
-  explicit PicturesLike(const StoreOptions& stores) {
-    PictureFactory::SetFactory(
-        PictureFactory([stores](std::int32_t width, std::int32_t height, Format format) {
-          return MakePictures(stores, {{width, height, format}})[0];
-        }));
-  }
-  ~PicturesLike() { PictureFactory::SetFactory({}); }
-};
-
 /// What an image file is once its orientation has been applied.
 ImageInfo Upright(const ImageInfo& info);
 /// The samples of a row of a picture that isn't a view. Throws Failure.

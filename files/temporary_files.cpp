@@ -189,6 +189,10 @@ void WriteAll(int descriptor, std::span<const std::uint8_t> bytes, const std::fi
   }
 }
 
+void WriteAll(int descriptor, std::string_view text, const std::filesystem::path& target) {
+  WriteAll(descriptor, std::span(reinterpret_cast<const std::uint8_t*>(text.data()), text.size()), target);
+}
+
 PrivateDirectory::PrivateDirectory(const std::filesystem::path& parent) {
   std::string name = (parent / "picturezor-XXXXXX").string();
   const SignalsHeldBack held;

@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <span>
+#include <string_view>
 
 #include "output.h"
 
@@ -54,6 +55,7 @@ class OutputFile final : public Output {
 int NamelessFile(const std::filesystem::path& directory);
 /// Throws Failure with the target's name.
 void WriteAll(int descriptor, std::span<const std::uint8_t> bytes, const std::filesystem::path& target);
+void WriteAll(int descriptor, std::string_view text, const std::filesystem::path& target);
 
 /// A directory that only this process sees, gone with this object.
 class PrivateDirectory {

@@ -11,6 +11,9 @@ class WholeReader : public ImageReader {
   void Finish() override {}
 
  protected:
+  /// Pictures of one colour take hardly any bytes, whatever their size.
+  static constexpr double MostPixelsPerByte = 1e9;
+
   WholeReader(const Input& input, const ReadOptions& options) : From(input), Options(options) {}
   /// Gives packed pixels from the top down, of the whole size: Info() may have that of a part by now.
   virtual void Decode(std::uint8_t* pixels, const Extent& size) = 0;

@@ -16,9 +16,6 @@ namespace picturezor::files {
 
 namespace {
 
-/// Pictures of one colour take hardly any bytes, whatever their size.
-constexpr double MostPixelsPerByte = 1e9;
-
 using Context = Handle<heif_context, heif_context_free>;
 using Colours = Handle<heif_color_profile_nclx, heif_nclx_color_profile_free>;
 
@@ -39,8 +36,7 @@ class HEIFReader : public WholeReader {
     About.Width = heif_image_handle_get_width(image);
     About.Height = heif_image_handle_get_height(image);
     About.Pixels = heif_image_handle_has_alpha_channel(image) ? Format::RGBA : Format::RGB;
-    About.Bits = std::max(1, heif_image_handle_get_luma_bits_per_pixel(image));
-    if (About.Bits > 8) About.Notes.push_back(std::to_string(About.Bits) + " bits a sample reduced to 8");
+    SetBits(std::max(1, heif_image_handle_get_luma_bits_per_pixel(image)));
     ReadExtras();
     // Planes as they are packed, and as they are given.
     Needs = 4 * std::max(1, (About.Bits + 7) / 8);
@@ -81,11 +77,7 @@ class HEIFReader : public WholeReader {
       if (block.empty()) continue;
       Check(heif_image_handle_get_metadata(Image.get(), id, block.data()));
       if (kind == "mime" && content == "application/rdf+xml") About.Xmp = block;
-      if (kind != "Exif" || block.size() < 4) continue;
-      // The place of EXIF in its block stands before it.
-      const std::size_t at = 4 + (std::size_t(block[0]) << 24 | block[1] << 16 | block[2] << 8 | block[3]);
-      if (at < block.size()) SetExif(About, Bytes(block.begin() + std::ptrdiff_t(at), block.end()));
-      About.Orientation = 1;
+      if (kind == "Exif") SetExifOfBox(About, block);
     }
   }
 

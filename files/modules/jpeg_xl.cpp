@@ -19,9 +19,6 @@ namespace picturezor::files {
 
 namespace {
 
-/// Pictures of one colour take hardly any bytes, whatever their size.
-constexpr double MostPixelsPerByte = 1e9;
-
 using Runner = Handle<void, JxlThreadParallelRunnerDestroy>;
 
 Runner StartRunner(int threads) {
@@ -120,8 +117,7 @@ class JPEGXLReader : public WholeReader {
     // The decoder turns the picture upright itself.
     About.Width = std::int32_t(info.xsize);
     About.Height = std::int32_t(info.ysize);
-    About.Bits = int(info.bits_per_sample);
-    if (About.Bits > 8) About.Notes.push_back(std::to_string(About.Bits) + " bits a sample reduced to 8");
+    SetBits(int(info.bits_per_sample));
     About.Pixels = info.num_color_channels == 1 ? Format::G : Format::RGB;
     if (info.alpha_bits) About.Pixels = WithAlpha(About.Pixels);
     // What it works on besides has four bytes a sample.
@@ -151,11 +147,7 @@ class JPEGXLReader : public WholeReader {
 
   void TakeBox(const std::string& kind, const Bytes& box) {
     if (kind == "xml ") About.Xmp = box;
-    // The place of EXIF in its box stands before it.
-    if (kind != "Exif" || box.size() < 4) return;
-    const std::uint32_t at = std::uint32_t(box[0]) << 24 | box[1] << 16 | box[2] << 8 | box[3];
-    if (at < box.size() - 4) SetExif(About, Bytes(box.begin() + 4 + std::ptrdiff_t(at), box.end()));
-    About.Orientation = 1;
+    if (kind == "Exif") SetExifOfBox(About, box);
   }
 
   void Decode(std::uint8_t* pixels, const Extent& whole) override {
@@ -272,13 +264,8 @@ class JPEGXLWriter : public WholeWriter {
 PICTUREZOR_TYPE_CODE(JPEGXL){
     PICTUREZOR_VERSION,
     nullptr,
-    [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<JPEGXLReader>(input, options);
-    },
-    [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-       const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
-      return std::make_unique<JPEGXLWriter>(descriptor, target, info, options);
-    },
+    OpenAs<JPEGXLReader>,
+    CreateAs<JPEGXLWriter>,
 };
 
 }

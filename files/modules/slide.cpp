@@ -125,9 +125,7 @@ class SlideReader : public ImageReader {
 PICTUREZOR_TYPE_CODE(Slide){
     PICTUREZOR_VERSION,
     [](const Input& input) { return openslide_detect_vendor(input.Path().c_str()) != nullptr; },
-    [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<SlideReader>(input, options);
-    },
+    OpenAs<SlideReader>,
     nullptr,
 };
 

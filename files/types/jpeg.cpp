@@ -22,12 +22,12 @@ constexpr double MostPixelsPerByte = 512;
 
 class JPEGReader : public ImageReader {
  public:
-  JPEGReader(const Input& input, std::int64_t memoryLimit)
+  JPEGReader(const Input& input, const ReadOptions& options)
       : Path(input.Name()), FileSize(input.Size()), File(input.Open()) {
     Jpeg.err = &Errors.Manager;
     try {
       Try([&] { jpeg_create_decompress(&Jpeg); });
-      Start(memoryLimit);
+      Start(options.MemoryLimit);
     } catch (...) {
       jpeg_destroy_decompress(&Jpeg);
       throw;
@@ -203,13 +203,8 @@ const FileType JPEGType{
     .MostEdge = 65500,
     .Begins = [](std::span<const std::uint8_t> start) { return StartsWith(start, "\xFF\xD8"); },
     .InOrder = true,
-    .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<JPEGReader>(input, options.MemoryLimit);
-    },
-    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-                 const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
-      return std::make_unique<JPEGWriter>(descriptor, target, info, options);
-    },
+    .Open = OpenAs<JPEGReader>,
+    .Create = CreateAs<JPEGWriter>,
 };
 
 }

@@ -23,9 +23,6 @@ constexpr auto BoxedMagic = "\0\0\0\x0CjP  \r\n\x87\n"sv, BareMagic = "\xFF\x4F\
 constexpr auto XmpUuid = "\xBE\x7A\xCF\xCB\x97\xA9\x42\xE8\x9C\x71\x99\x94\x91\xE3\xAF\xAC"sv;
 constexpr auto ExifUuid = "JpgTiffExif->JP2"sv;
 constexpr double MetresOfInch = 0.0254;
-/// Pictures of one colour take hardly any bytes, whatever their size.
-constexpr double MostPixelsPerByte = 1e9;
-
 void Append(Bytes& bytes, std::string_view text) {
   const std::size_t at = bytes.size();
   bytes.resize(at + text.size());
@@ -195,8 +192,7 @@ class JPEG2000Reader : public WholeReader {
     const int left = colours - ChannelsOf(About.Pixels);
     if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples a pixel left out");
     if (WithAlphaChannel) About.Pixels = WithAlpha(About.Pixels);
-    About.Bits = PaletteChannels ? 8 : int(Header->comps[0].prec);
-    if (About.Bits > 8) About.Notes.push_back(std::to_string(About.Bits) + " bits a sample reduced to 8");
+    SetBits(PaletteChannels ? 8 : int(Header->comps[0].prec));
   }
 
   void Decode(std::uint8_t* pixels, const Extent& size) override {
@@ -387,13 +383,8 @@ const FileType JPEG2000Type{
           return StartsWith(start, BoxedMagic) || StartsWith(start, BareMagic);
         },
     .InOrder = false,
-    .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<JPEG2000Reader>(input, options);
-    },
-    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-                 const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
-      return std::make_unique<JPEG2000Writer>(descriptor, target, info, options);
-    },
+    .Open = OpenAs<JPEG2000Reader>,
+    .Create = CreateAs<JPEG2000Writer>,
 };
 
 }

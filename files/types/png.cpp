@@ -108,12 +108,11 @@ class PNGReader : public ImageReader, PNGFile {
     });
     const std::int64_t width = png_get_image_width(Png, Header), height = png_get_image_height(Png, Header);
     const int type = png_get_color_type(Png, Header);
-    About.Bits = png_get_bit_depth(Png, Header);
+    SetBits(png_get_bit_depth(Png, Header));
     const int bits = About.Bits * png_get_channels(Png, Header);
     RequirePlausible(Path, width, height, FileSize, MostInflation * 8 / bits);
     About.Width = std::int32_t(width);
     About.Height = std::int32_t(height);
-    if (About.Bits == 16) About.Notes.push_back("16 bits a sample reduced to 8");
 
     int passes = 1;
     Try([&] {
@@ -257,13 +256,8 @@ const FileType PNGType{
     .MostEdge = INT32_MAX,
     .Begins = [](std::span<const std::uint8_t> start) { return StartsWith(start, "\x89PNG"); },
     .InOrder = true,
-    .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<PNGReader>(input, options);
-    },
-    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-                 const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
-      return std::make_unique<PNGWriter>(descriptor, target, info, options);
-    },
+    .Open = OpenAs<PNGReader>,
+    .Create = CreateAs<PNGWriter>,
 };
 
 }

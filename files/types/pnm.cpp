@@ -25,15 +25,14 @@ struct PNMHeader {
 
 class PNMReader : public ImageReader {
  public:
-  explicit PNMReader(const Input& input) : Path(input.Name()), File(input.Open()) {
+  PNMReader(const Input& input, const ReadOptions&) : Path(input.Name()), File(input.Open()) {
     ReadHeader();
     const double bytes =
         Of.Bits() ? (Of.Text() ? 1 : 0.125) : double(Of.Depth) * (Of.Text() ? 1 : double(Of.SampleBytes()));
     RequirePlausible(Path, Of.Width, Of.Height, input.Size(), 1 / bytes);
     About.Width = std::int32_t(Of.Width);
     About.Height = std::int32_t(Of.Height);
-    About.Bits = Of.Bits() ? 1 : Of.Most > 255 ? 16 : 8;
-    if (Of.Most > 255) About.Notes.push_back("16 bits a sample reduced to 8");
+    SetBits(Of.Bits() ? 1 : Of.Most > 255 ? 16 : 8);
     ChoosePixels();
     if (!Of.Text()) Line.resize(std::size_t(Of.RowBytes()));
   }
@@ -144,7 +143,7 @@ class PNMReader : public ImageReader {
 
 class PNMWriter : public ImageWriter {
  public:
-  PNMWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info)
+  PNMWriter(int descriptor, const std::filesystem::path& target, const ImageInfo& info, const WriteOptions&)
       : Path(target),
         File(StreamOn(descriptor, target)),
         Size(std::size_t(info.Width) * std::size_t(ChannelsOf(info.Pixels))) {
@@ -185,13 +184,8 @@ const FileType PNMType{
                  (start[2] <= ' ' || start[2] == '#');
         },
     .InOrder = true,
-    .Open = [](const Input& input, const ReadOptions&) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<PNMReader>(input);
-    },
-    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-                 const WriteOptions&) -> std::unique_ptr<ImageWriter> {
-      return std::make_unique<PNMWriter>(descriptor, target, info);
-    },
+    .Open = OpenAs<PNMReader>,
+    .Create = CreateAs<PNMWriter>,
 };
 
 }

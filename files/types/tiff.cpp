@@ -38,8 +38,7 @@ class TIFFReader : public ImageReader {
                      MostPixelsPerByte(Of.Compression, Of.Width, double(Of.Bits) * Of.Samples));
     About.Width = std::int32_t(Of.Width);
     About.Height = std::int32_t(Of.Height);
-    About.Bits = Of.Bits;
-    if (Of.Bits == 16) About.Notes.push_back("16 bits a sample reduced to 8");
+    SetBits(Of.Bits);
     ReadExtras();
     for (int plane = 0; plane < Of.Planes(); ++plane) {
       // Samples that nobody asks for need no rows.
@@ -277,10 +276,7 @@ const FileType TIFFType{
         return std::make_unique<TIFFReader>(page, options);
       });
     },
-    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-                 const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
-      return WriteTIFF(descriptor, target, info, options);
-    },
+    .Create = WriteTIFF,
 };
 
 }

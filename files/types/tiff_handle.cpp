@@ -62,21 +62,25 @@ toff_t TIFFHandle::OnSeek(thandle_t user, toff_t offset, int whence) {
   return toff_t(self.At);
 }
 
+Handle<TIFFOpenOptions, TIFFOpenOptionsFree> TIFFHandle::Options() {
+  Handle<TIFFOpenOptions, TIFFOpenOptionsFree> options(TIFFOpenOptionsAlloc());
+  TIFFOpenOptionsSetErrorHandlerExtR(options.get(), OnError, this);
+  TIFFOpenOptionsSetWarningHandlerExtR(options.get(), OnWarning, this);
+  return options;
+}
+
 std::unique_ptr<TIFFHandle> TIFFHandle::Open(const Input& input, std::int64_t memoryLimit) {
   std::unique_ptr<TIFFHandle> handle(new TIFFHandle(input.Name()));
   handle->From = input;
-  TIFFOpenOptions* options = TIFFOpenOptionsAlloc();
+  const auto options = handle->Options();
   // Directories and tables of strips need some room however small the limit is.
-  TIFFOpenOptionsSetMaxSingleMemAlloc(options, std::max<std::int64_t>(memoryLimit, 64 << 20));
-  TIFFOpenOptionsSetErrorHandlerExtR(options, OnError, handle.get());
-  TIFFOpenOptionsSetWarningHandlerExtR(options, OnWarning, handle.get());
+  TIFFOpenOptionsSetMaxSingleMemAlloc(options.get(), std::max<std::int64_t>(memoryLimit, 64 << 20));
   const auto write = [](thandle_t, void*, tmsize_t) -> tmsize_t { return -1; };
   const auto finish = [](thandle_t) { return 0; };
   const auto size = [](thandle_t self) { return toff_t(static_cast<TIFFHandle*>(self)->From->Size()); };
   // Not mapped: the pages would count as memory in use.
   handle->File = TIFFClientOpenExt(input.Name().c_str(), "rm", handle.get(), OnRead, write, OnSeek, finish,
-                                   size, nullptr, nullptr, options);
-  TIFFOpenOptionsFree(options);
+                                   size, nullptr, nullptr, options.get());
   handle->Check(handle->File);
   return handle;
 }
@@ -87,13 +91,10 @@ std::unique_ptr<TIFFHandle> TIFFHandle::Create(int descriptor, const std::filesy
   handle->Writing = true;
   const int copy = fcntl(descriptor, F_DUPFD_CLOEXEC, 0);
   if (copy < 0) throw Failure(target, std::strerror(errno));
-  TIFFOpenOptions* options = TIFFOpenOptionsAlloc();
-  TIFFOpenOptionsSetErrorHandlerExtR(options, OnError, handle.get());
-  TIFFOpenOptionsSetWarningHandlerExtR(options, OnWarning, handle.get());
+  const auto options = handle->Options();
   errno = 0;
   handle->File =
-      TIFFFdOpenExt(copy, target.c_str(), (std::string(big ? "w8" : "w") + order).c_str(), options);
-  TIFFOpenOptionsFree(options);
+      TIFFFdOpenExt(copy, target.c_str(), (std::string(big ? "w8" : "w") + order).c_str(), options.get());
   if (!handle->File) close(copy);
   handle->Check(handle->File);
   return handle;
@@ -113,14 +114,11 @@ std::unique_ptr<TIFFHandle> TIFFHandle::CreateInMemory(const std::filesystem::pa
     constexpr toff_t end = 64;
     return from == SEEK_END ? end : place;
   };
-  TIFFOpenOptions* options = TIFFOpenOptionsAlloc();
-  TIFFOpenOptionsSetErrorHandlerExtR(options, OnError, handle.get());
-  TIFFOpenOptionsSetWarningHandlerExtR(options, OnWarning, handle.get());
+  const auto options = handle->Options();
   errno = 0;
   handle->File = TIFFClientOpenExt(
       target.c_str(), "w8m", &written, read, write, seek, [](thandle_t) { return 0; },
-      [](thandle_t) -> toff_t { return 0; }, nullptr, nullptr, options);
-  TIFFOpenOptionsFree(options);
+      [](thandle_t) -> toff_t { return 0; }, nullptr, nullptr, options.get());
   handle->Check(handle->File);
   return handle;
 }

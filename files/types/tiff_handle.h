@@ -7,6 +7,7 @@
 #include <optional>
 #include <string>
 
+#include "handle.h"
 #include "input.h"
 #include "picturezor/picture.h"
 
@@ -45,6 +46,8 @@ class TIFFHandle {
 
  private:
   explicit TIFFHandle(std::filesystem::path path) : Path(std::move(path)) {}
+  /// With what libtiff says going to this object.
+  Handle<TIFFOpenOptions, TIFFOpenOptionsFree> Options();
   static tmsize_t OnRead(thandle_t self, void* into, tmsize_t size);
   static toff_t OnSeek(thandle_t self, toff_t offset, int whence);
   static int OnError(TIFF*, void* self, const char*, const char* format, va_list arguments);

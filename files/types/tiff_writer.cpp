@@ -1,7 +1,6 @@
 #include "tiff_writer.h"
 
 #include <cerrno>
-#include <cstdlib>
 #include <cstring>
 
 #include "exif.h"
@@ -21,13 +20,7 @@ constexpr std::int32_t UsualTile = 256;
 class PackedPieces {
  public:
   void Add(const std::filesystem::path& target, const Bytes& piece) {
-    if (!File) {
-      std::string name = DefaultTempDirectory() / "picturezor-XXXXXX";
-      const int descriptor = mkstemp(name.data());
-      if (descriptor < 0) throw Failure(DefaultTempDirectory(), std::strerror(errno));
-      std::filesystem::remove(name);
-      File = Stream(fdopen(descriptor, "w+"));
-    }
+    if (!File) File = Stream(fdopen(NamelessFile(DefaultTempDirectory()), "w+"));
     Sizes.push_back(piece.size());
     if (std::fwrite(piece.data(), 1, piece.size(), File.get()) != piece.size())
       throw Failure(target, std::strerror(errno));

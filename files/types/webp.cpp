@@ -16,9 +16,6 @@ namespace picturezor::files {
 
 namespace {
 
-/// Pictures of one colour take hardly any bytes, whatever their size.
-constexpr double MostPixelsPerByte = 1e9;
-
 class WebPReader : public WholeReader {
  public:
   WebPReader(const Input& input, const ReadOptions& options)
@@ -45,7 +42,6 @@ class WebPReader : public WholeReader {
     // An animation is put together in two canvases of the library.
     Needs = Animated ? 3 : 1;
   }
-
 
  private:
   WebPData Data() const { return {File.data(), File.size()}; }
@@ -171,13 +167,8 @@ const FileType WebPType{
         },
     .InOrder = false,
     .Several = true,
-    .Open = [](const Input& input, const ReadOptions& options) -> std::unique_ptr<ImageReader> {
-      return std::make_unique<WebPReader>(input, options);
-    },
-    .Create = [](int descriptor, const std::filesystem::path& target, const ImageInfo& info,
-                 const WriteOptions& options) -> std::unique_ptr<ImageWriter> {
-      return std::make_unique<WebPWriter>(descriptor, target, info, options);
-    },
+    .Open = OpenAs<WebPReader>,
+    .Create = CreateAs<WebPWriter>,
 };
 
 }
