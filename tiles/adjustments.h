@@ -16,7 +16,6 @@ struct Adjustments {
   double Gamma = 1, Gain = 0.5, Bias = 0.5;
   double Radius = 1, Amount = 0;
 
-  bool Nothing() const { return !AutoLevel && Gamma == 1 && Gain == 0.5 && Bias == 0.5 && Amount == 0; }
   /// The steps that they stand for, as they are written on a command line; auto-level is the first one.
   std::string Steps() const;
   /// The steps that work on parts: all but auto-level, which has to see the whole picture.

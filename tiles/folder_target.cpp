@@ -96,9 +96,7 @@ FolderTarget::FolderTarget(const path& parent, const std::string& name, const st
   if (!goesOn && std::filesystem::exists(Unfinished))
     throw Failure(Unfinished, "parts of a pyramid, or something else, are there; remove it first");
   Journal = std::make_unique<PlainFile>(JournalName, O_WRONLY | O_APPEND);
-  const std::string start = goesOn ? "\n" : task + "\n";
-  files::WriteAll(Journal->Descriptor(), {reinterpret_cast<const std::uint8_t*>(start.data()), start.size()},
-                  JournalName);
+  files::WriteAll(Journal->Descriptor(), goesOn ? "\n" : task + "\n", JournalName);
 }
 
 std::unique_ptr<files::Output> FolderTarget::Begin(const std::string& name) const {
@@ -106,8 +104,7 @@ std::unique_ptr<files::Output> FolderTarget::Begin(const std::string& name) cons
 }
 
 void FolderTarget::AddRow(int level, std::int32_t row) {
-  const std::string line = std::to_string(level) + " " + std::to_string(row) + "\n";
-  files::WriteAll(Journal->Descriptor(), {reinterpret_cast<const std::uint8_t*>(line.data()), line.size()},
+  files::WriteAll(Journal->Descriptor(), std::to_string(level) + " " + std::to_string(row) + "\n",
                   JournalName);
 }
 
@@ -131,9 +128,7 @@ SharedFolderTarget::SharedFolderTarget(const path& parent, const std::string& na
       if (!entry.path().filename().string().starts_with(".picturezor-") && !std::filesystem::exists(taskName))
         throw Failure(Unfinished, "something else is there");
     files::OutputFile file(taskName);
-    const std::string line = task + "\n";
-    files::WriteAll(file.Descriptor(), {reinterpret_cast<const std::uint8_t*>(line.data()), line.size()},
-                    taskName);
+    files::WriteAll(file.Descriptor(), task + "\n", taskName);
     file.Commit();
   }
   std::ifstream file(taskName);

@@ -24,9 +24,7 @@ std::uint32_t NumberAt(const std::uint8_t* bytes) {
 }
 
 SumsWriter::SumsWriter(const std::filesystem::path& file, const std::string& task) : File(file) {
-  Buffer.assign(task.begin(), task.end());
-  Buffer.push_back('\n');
-  files::WriteAll(File.Descriptor(), Buffer, File.Target());
+  files::WriteAll(File.Descriptor(), task + "\n", File.Target());
 }
 
 void SumsWriter::Add(const BoxLevels::Part& part, int first) {

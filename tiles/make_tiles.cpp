@@ -271,8 +271,6 @@ class Maker {
   files::Conveyor<Job> Jobs;
 };
 
-bool EndsWith(const path& target, const char* ending) { return target.extension() == ending; }
-
 /// What the journal of an unfinished folder is compared with.
 std::string TaskOf(const path& source, const flow::Shape& shape, const TilesOptions& options) {
   std::error_code failed;
@@ -370,8 +368,8 @@ void MakeTiles(flow::OpenFile file, const path& source, const path& named, const
   const files::FileType& type = TileType(options.Type);
   const flow::Shape shape = flow::ShapeOf(file);
   const path target = named.has_filename() ? named : named.parent_path();
-  const bool slide = EndsWith(target, ".szi"), zip = slide || EndsWith(target, ".zip");
-  const bool described = options.How == Layout::DeepZoom && EndsWith(target, ".dzi");
+  const bool slide = target.extension() == ".szi", zip = slide || target.extension() == ".zip";
+  const bool described = options.How == Layout::DeepZoom && target.extension() == ".dzi";
   const std::string name = (zip || described ? target.stem() : target.filename()).string();
   if (name.empty() || name == "." || name == "..") throw files::UsageFailure(target, "a name is missing");
   if (options.How != Layout::DeepZoom && options.Overlap > 0)

@@ -15,8 +15,6 @@ namespace {
 
 using std::filesystem::path;
 
-constexpr double InchesOfMetre = 1 / 0.0254;
-
 std::string InHTML(const std::string& text) {
   std::string escaped;
   for (const char c : text) switch (c) {
@@ -47,26 +45,24 @@ void ReplaceAll(std::string& text, const std::string& what, const std::string& w
     text.replace(at, what.size(), with);
 }
 
-void CopyFile(TileTarget& target, const path& from, const std::string& to) {
-  constexpr std::int64_t most = 64 << 20;
-  const files::Input input(from);
-  const auto bytes = input.All(most);
-  WriteText(target, to, {reinterpret_cast<const char*>(bytes.data()), bytes.size()});
 }
 
+std::string PerMetre(const std::optional<files::Resolution>& density) {
+  constexpr double inchesOfMetre = 1 / 0.0254;
+  char text[32];
+  std::snprintf(text, sizeof text, "%.9g", density ? density->X * inchesOfMetre : 0);
+  return text;
 }
 
 std::string PyramidForPage(const Grid& grid, const std::string& base, const std::string& ending,
                            const std::optional<files::Resolution>& density) {
   constexpr const char* names[] = {"deepzoom", "iiif", "xyz"};
-  char perMetre[32];
-  std::snprintf(perMetre, sizeof perMetre, "%.9g", density ? density->X * InchesOfMetre : 0);
   return std::string("{\"layout\": \"") + names[int(grid.Of())] +
          "\", \"width\": " + std::to_string(grid.Level(0).Width) +
          ", \"height\": " + std::to_string(grid.Level(0).Height) +
          ", \"tile\": " + std::to_string(grid.Tile()) + ", \"overlap\": " + std::to_string(grid.Overlap()) +
          ", \"levels\": " + std::to_string(grid.LevelCount()) + ", \"format\": \"" + ending.substr(1) +
-         "\", \"base\": \"" + QuotedForJSON(base) + "\", \"perMetre\": " + perMetre + "}";
+         "\", \"base\": \"" + QuotedForJSON(base) + "\", \"perMetre\": " + PerMetre(density) + "}";
 }
 
 path OpenSeadragonFolder() {
@@ -84,10 +80,23 @@ path OpenSeadragonFolder() {
       "PICTUREZOR_OPENSEADRAGON names its folder");
 }
 
+std::map<std::string, std::string> OpenSeadragonFiles() {
+  constexpr std::int64_t most = 64 << 20;
+  const path folder = OpenSeadragonFolder();
+  std::map<std::string, std::string> contents;
+  for (const auto& entry : std::filesystem::recursive_directory_iterator(folder))
+    if (entry.is_regular_file()) {
+      const files::Input input(entry.path());
+      const auto bytes = input.All(most);
+      contents[std::filesystem::relative(entry.path(), folder).generic_string()].assign(bytes.begin(),
+                                                                                        bytes.end());
+    }
+  return contents;
+}
+
 void WriteText(TileTarget& target, const std::string& name, std::string_view text) {
   const auto file = target.Begin(name);
-  files::WriteAll(file->Descriptor(), {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()},
-                  file->Target());
+  files::WriteAll(file->Descriptor(), text, file->Target());
   file->Commit();
   target.Add(*file);
 }
@@ -104,11 +113,8 @@ void WritePage(TileTarget& target, const Grid& grid, const std::string& name, co
   ReplaceAll(page, "%STYLE%", std::string(PyramidCSS));
   ReplaceAll(page, "%SCRIPT%", std::string(PyramidJS));
   WriteText(target, beside ? name + ".html" : name + "/index.html", page);
-  const path from = OpenSeadragonFolder();
-  for (const auto& entry : std::filesystem::recursive_directory_iterator(from))
-    if (entry.is_regular_file())
-      CopyFile(target, entry.path(),
-               folder + "openseadragon/" + std::filesystem::relative(entry.path(), from).generic_string());
+  for (const auto& [file, content] : OpenSeadragonFiles())
+    WriteText(target, folder + "openseadragon/" + file, content);
 }
 
 }

@@ -1,5 +1,6 @@
 #pragma once
 #include <filesystem>
+#include <map>
 #include <optional>
 #include <string>
 
@@ -12,7 +13,11 @@ namespace picturezor::tiles {
 /// PICTUREZOR_OPENSEADRAGON names it, else it stands beside the program's folder or is installed. Throws
 /// files::Failure where it isn't there.
 std::filesystem::path OpenSeadragonFolder();
+/// The contents of its files, by their names from there on.
+std::map<std::string, std::string> OpenSeadragonFiles();
 
+/// The pixels of a metre as pages read it; 0 where nobody knows.
+std::string PerMetre(const std::optional<files::Resolution>& density);
 /// What pyramid.js wants to know of a pyramid, as JSON.
 std::string PyramidForPage(const Grid& grid, const std::string& base, const std::string& ending,
                            const std::optional<files::Resolution>& density);
@@ -23,8 +28,6 @@ void WritePage(TileTarget& target, const Grid& grid, const std::string& name, co
                const std::optional<files::Resolution>& density);
 
 /// Writes a file of a pyramid.
-/// Where OpenSeadragon is. Throws files::Failure where it isn't.
-std::filesystem::path OpenSeadragonFolder();
 void WriteText(TileTarget& target, const std::string& name, std::string_view text);
 
 }

@@ -6,10 +6,15 @@
 
 namespace picturezor::tiles {
 
+namespace {
+
+/// How many levels `parts` runs share: those with a row of tiles for each of them.
 int SharedLevels(const Grid& grid, std::int32_t parts) {
   int count = 0;
   while (count < grid.LevelCount() && grid.Down(count) >= parts) ++count;
   return count;
+}
+
 }
 
 Share ShareOf(const Grid& grid, std::int32_t part, std::int32_t parts) {

@@ -22,8 +22,6 @@ struct Share {
   std::int32_t FirstOwn = 0, EndOwn = 0;
 };
 
-/// How many levels `parts` runs share: those with a row of tiles for each of them.
-int SharedLevels(const Grid& grid, std::int32_t parts);
 /// What `part`, 0 to `parts` - 1, makes. A single one makes all. `parts` are no more than the picture has
 /// rows of tiles.
 Share ShareOf(const Grid& grid, std::int32_t part, std::int32_t parts);

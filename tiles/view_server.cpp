@@ -3,14 +3,12 @@
 #include <httplib.h>
 
 #include <charconv>
-#include <cmath>
-#include <cstdio>
+#include <functional>
 #include <map>
 #include <mutex>
 #include <set>
 
 #include "failure.h"
-#include "input.h"
 #include "named.h"
 #include "page.h"
 #include "pages.h"
@@ -118,15 +116,6 @@ std::string Quoted(const std::string& text) { return '"' + QuotedForJSON(text) +
 
 struct ViewServer::Implementation {
   explicit Implementation(const ViewOptions& options) : Options(options), Shown(options.Files.size()) {
-    const path folder = OpenSeadragonFolder();
-    constexpr std::int64_t most = 64 << 20;
-    for (const auto& entry : std::filesystem::recursive_directory_iterator(folder))
-      if (entry.is_regular_file()) {
-        const files::Input input(entry.path());
-        const auto bytes = input.All(most);
-        Library[std::filesystem::relative(entry.path(), folder).generic_string()].assign(bytes.begin(),
-                                                                                         bytes.end());
-      }
     Server.new_task_queue = [] { return new httplib::ThreadPool(ServingThreads); };
     Server.set_payload_max_length(MostRequestBytes);
     Server.set_default_headers(
@@ -177,8 +166,7 @@ struct ViewServer::Implementation {
         names += (names.empty() ? "" : ", ") + Quoted(file.filename().string());
       response.set_content("[" + names + "]", "application/json");
     });
-    Add(R"(/pictures/(\d+))",
-        [this](const Request& request, Response& response) { Describe(request, response); });
+    Add(R"(/pictures/(\d+))", std::bind_front(&Implementation::Describe, this));
     Add(R"(/pictures/(\d+)/state)", [this](const Request& request, Response& response) {
       const ShownPicture::State state = PictureOf(request).Progress();
       response.set_content("{\"rows\": " + std::to_string(state.Rows) +
@@ -186,16 +174,11 @@ struct ViewServer::Implementation {
                                ", \"failed\": " + Quoted(state.Failed) + "}",
                            "application/json");
     });
-    Add(R"(/pictures/(\d+)/tile/(\d+)/(\d+)/(\d+))",
-        [this](const Request& request, Response& response) { SendTile(request, response); });
-    Add(R"(/pictures/(\d+)/thumbnail)",
-        [this](const Request& request, Response& response) { SendThumbnail(request, response); });
-    Add(R"(/pictures/(\d+)/pixel)",
-        [this](const Request& request, Response& response) { SendPixel(request, response); });
-    Add(R"(/pictures/(\d+)/part)",
-        [this](const Request& request, Response& response) { SendPart(request, response); });
-    Add(R"(/pictures/(\d+)/command)",
-        [this](const Request& request, Response& response) { SendCommand(request, response); });
+    Add(R"(/pictures/(\d+)/tile/(\d+)/(\d+)/(\d+))", std::bind_front(&Implementation::SendTile, this));
+    Add(R"(/pictures/(\d+)/thumbnail)", std::bind_front(&Implementation::SendThumbnail, this));
+    Add(R"(/pictures/(\d+)/pixel)", std::bind_front(&Implementation::SendPixel, this));
+    Add(R"(/pictures/(\d+)/part)", std::bind_front(&Implementation::SendPart, this));
+    Add(R"(/pictures/(\d+)/command)", std::bind_front(&Implementation::SendCommand, this));
   }
 
   /// What goes wrong becomes a line of text, and a page shows it.
@@ -240,15 +223,12 @@ struct ViewServer::Implementation {
   void Describe(const Request& request, Response& response) {
     const flow::Shape& shape = PictureOf(request).About();
     const Grid& grid = PictureOf(request).Cut();
-    constexpr double inchesOfMetre = 1 / 0.0254;
-    char perMetre[32];
-    std::snprintf(perMetre, sizeof perMetre, "%.9g", shape.Density ? shape.Density->X * inchesOfMetre : 0);
     response.set_content("{\"width\": " + std::to_string(shape.Width) + ", \"height\": " +
                              std::to_string(shape.Height) + ", \"tile\": " + std::to_string(grid.Tile()) +
                              ", \"levels\": " + std::to_string(grid.LevelCount()) +
                              ", \"colours\": " + Quoted(NameOfFormat(shape.Of)) +
                              ", \"alpha\": " + (files::HasAlpha(shape.Of) ? "true" : "false") +
-                             ", \"perMetre\": " + perMetre + "}",
+                             ", \"perMetre\": " + PerMetre(shape.Density) + "}",
                          "application/json");
   }
 
@@ -339,7 +319,7 @@ struct ViewServer::Implementation {
   httplib::Server Server;
   int Port = 0;
   std::set<std::string> Hosts;
-  std::map<std::string, std::string> Library;
+  const std::map<std::string, std::string> Library = OpenSeadragonFiles();
   std::mutex Access;
   std::vector<std::unique_ptr<ShownPicture>> Shown;
 };
