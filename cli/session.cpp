@@ -54,17 +54,13 @@ void AddStoreOptions(CLI::App& command, Session& session) {
 
 namespace {
 
-const std::map<std::string, Compression> Packings{
-    {"none", Compression::None}, {"lzw", Compression::LZW},   {"deflate", Compression::Deflate},
-    {"zstd", Compression::Zstd}, {"jpeg", Compression::JPEG}, {"webp", Compression::WebP}};
-
 /// "9", "zstd", or both with a comma between them.
 void SetCompression(WriteOptions& writing, const std::string& text) {
   if (const std::size_t comma = text.find(','); comma != text.npos) {
     SetCompression(writing, text.substr(0, comma));
     return SetCompression(writing, text.substr(comma + 1));
   }
-  if (const auto packing = Packings.find(text); packing != Packings.end())
+  if (const auto packing = Compressions().find(text); packing != Compressions().end())
     writing.Packing = packing->second;
   else if (text.size() == 1 && text[0] >= '0' && text[0] <= '9')
     writing.Level = text[0] - '0';
@@ -144,11 +140,15 @@ OpenedImage::OpenedImage(Session& session, const std::filesystem::path& file)
   for (const std::string& note : Upright.Notes) session.Note(file, note);
 }
 
-std::unique_ptr<flow::Rows> OpenedImage::Rows(Session& session, const flow::Chain& chain) {
-  std::function<std::unique_ptr<ImageReader>()> again;
+flow::OpenFile OpenedImage::Take(const Session& session) {
+  flow::OpenFile file{std::move(Reader), {}};
   // Standard input comes once.
-  if (File != "-") again = [&session, file = File] { return OpenFor(session, file); };
-  return flow::Through({std::move(Reader), again}, chain, {session.Stores, session.Threads}, session.Bar);
+  if (File != "-") file.Again = [&session, name = File] { return OpenFor(session, name); };
+  return file;
+}
+
+std::unique_ptr<flow::Rows> OpenedImage::Rows(Session& session, const flow::Chain& chain) {
+  return flow::Through(Take(session), chain, {session.Stores, session.Threads}, session.Bar);
 }
 
 Target::Target(Session& session, const std::filesystem::path& file)
@@ -204,9 +204,7 @@ void Target::Carry(Session& session, OpenedImage& source, flow::Chain chain, For
   info.Density = result.Density;
   Start(result.Width, result.Height);
   const auto writer = Writer(session, format, std::move(info), threads);
-  flow::OpenFile file{std::move(source.Reader), {}};
-  // Standard input comes once.
-  if (source.File != "-") file.Again = [&session, name = source.File] { return OpenFor(session, name); };
+  flow::OpenFile file = source.Take(session);
   flow::LetReaderBegin(file, chain);
   flow::Run(std::move(file), chain, format, *writer, {session.Stores, threads}, progress);
 }

@@ -74,6 +74,8 @@ struct OpenedImage {
   OpenedImage(Session& session, const std::filesystem::path& file);
   PictureSize Size() const { return {Upright.Width, Upright.Height, Upright.Pixels}; }
   flow::Shape Shape() const { return {Upright.Width, Upright.Height, Upright.Pixels, Upright.Density}; }
+  /// The file, to work on once; as often as wanted where it can be opened again.
+  flow::OpenFile Take(const Session& session);
   /// All of its rows, upright, after some operations, once.
   std::unique_ptr<flow::Rows> Rows(Session& session, const flow::Chain& chain = {});
 };

@@ -18,6 +18,13 @@ bool StartsWith(std::span<const std::uint8_t> bytes, std::string_view magic) {
   return bytes.size() >= magic.size() && std::memcmp(bytes.data(), magic.data(), magic.size()) == 0;
 }
 
+const std::map<std::string, Compression>& Compressions() {
+  static const std::map<std::string, Compression> all{
+      {"none", Compression::None}, {"lzw", Compression::LZW},   {"deflate", Compression::Deflate},
+      {"zstd", Compression::Zstd}, {"jpeg", Compression::JPEG}, {"webp", Compression::WebP}};
+  return all;
+}
+
 void ImageReader::SetBits(int bits) {
   About.Bits = bits;
   if (bits > 8) About.Notes.push_back(std::to_string(bits) + " bits a sample reduced to 8");

@@ -1,6 +1,7 @@
 #pragma once
 #include <cstdint>
 #include <filesystem>
+#include <map>
 #include <memory>
 #include <optional>
 #include <span>
@@ -107,6 +108,8 @@ struct ReadOptions {
 };
 
 enum class Compression { Usual, None, LZW, Deflate, Zstd, JPEG, WebP };
+/// All but Usual, by their names.
+const std::map<std::string, Compression>& Compressions();
 
 struct WriteOptions {
   /// 1 to 100, for JPEG and the types after it. From 90 on colours are kept at full resolution where a type

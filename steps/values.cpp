@@ -69,16 +69,6 @@ Integers NumbersOrFile(const Option& option, const std::string& text) {
   return numbers;
 }
 
-Color ParseColour(const Option& option, const std::string& text) {
-  const std::string digits = text.starts_with('#') ? text.substr(1) : text;
-  std::uint32_t colour = 0;
-  const char* end = digits.data() + digits.size();
-  const auto [rest, failed] = std::from_chars(digits.data(), end, colour, 16);
-  if (failed != std::errc() || rest != end || digits.size() != 6)
-    Refuse(option, text + " isn't a colour like ff8000");
-  return {std::uint8_t(colour >> 16), std::uint8_t(colour >> 8), std::uint8_t(colour)};
-}
-
 std::string Shortest(double number) {
   char text[32];
   const bool near = std::fabs(number) < 1e10;
@@ -155,6 +145,15 @@ std::string Option::Explained() const {
   return text;
 }
 
+std::optional<Color> ColourOf(const std::string& text) {
+  const std::string digits = text.starts_with('#') ? text.substr(1) : text;
+  std::uint32_t colour = 0;
+  const char* end = digits.data() + digits.size();
+  const auto [rest, failed] = std::from_chars(digits.data(), end, colour, 16);
+  if (failed != std::errc() || rest != end || digits.size() != 6) return std::nullopt;
+  return Color{std::uint8_t(colour >> 16), std::uint8_t(colour >> 8), std::uint8_t(colour)};
+}
+
 Value ParseValue(const Option& option, const std::string& text) {
   switch (option.Of) {
     case Kind::Flag:
@@ -171,7 +170,11 @@ Value ParseValue(const Option& option, const std::string& text) {
     case Kind::Size: return WholeNumbers(option, text, 'x', 2);
     case Kind::Rectangle: return WholeNumbers(option, text, ',', 4);
     case Kind::Point: return WholeNumbers(option, text, ',', 2);
-    case Kind::Colour: return ParseColour(option, text);
+    case Kind::Colour: {
+      const std::optional<Color> colour = ColourOf(text);
+      if (!colour) Refuse(option, text + " isn't a colour like ff8000");
+      return *colour;
+    }
     case Kind::Numbers: {
       Numbers numbers;
       for (const std::string_view part : Split(text, ',')) numbers.push_back(ParseNumber(option, part));

@@ -2,6 +2,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <map>
+#include <optional>
 #include <string>
 #include <variant>
 #include <vector>
@@ -63,6 +64,8 @@ struct Option {
   std::string Explained() const;
 };
 
+/// The colour of six hexadecimal digits, with or without a # before them; nothing where there are no such.
+std::optional<Color> ColourOf(const std::string& text);
 /// What a text says. Throws files::UsageFailure naming the option, or files::Failure for a file that can't be
 /// read.
 Value ParseValue(const Option& option, const std::string& text);

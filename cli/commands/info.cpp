@@ -16,12 +16,11 @@ std::string ProfileText(const Bytes& profile) {
 }
 
 int Info(Session& session, const std::filesystem::path& file) {
-  const auto reader = OpenNamed(
-      file, {.MemoryLimit = session.Stores.MemoryLimit, .TempDirectory = session.Stores.TempDirectory});
+  const auto reader = OpenFor(session, file);
   const ImageInfo& stored = reader->Info();
   const ImageInfo upright = Upright(stored);
   std::printf("file:        %s\n", file.c_str());
-  std::printf("type:        %s\n", reader->Info().Type->Name);
+  std::printf("type:        %s\n", stored.Type->Name);
   std::printf("size:        %d x %d\n", upright.Width, upright.Height);
   std::printf("pixels:      %s\n", Describe(stored.Pixels).c_str());
   std::printf("bits:        %d a sample\n", stored.Bits);

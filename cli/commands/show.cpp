@@ -19,7 +19,7 @@ struct ShowOptions {
 
 /// The size in pixels of the terminal's window, which shows two in each place; without a window 80 columns of
 /// any length. A line is left for the prompt.
-PictureSize SizeInWindow(const PictureSize& image, std::int32_t width) {
+Extent SizeInWindow(const ImageInfo& image, std::int32_t width) {
   constexpr double anyHeight = 1e9;
   winsize window{};
   const bool known = ioctl(STDOUT_FILENO, TIOCGWINSZ, &window) == 0 && window.ws_col > 0 && window.ws_row > 1;
@@ -68,10 +68,14 @@ void Print(const HostPicture& picture) {
 
 int Show(Session& session, const ShowOptions& options) {
   OpenedImage image(session, options.File);
-  const PictureSize size = SizeInWindow(image.Size(), options.Width);
+  const Extent size = SizeInWindow(image.Upright, options.Width);
   constexpr std::int32_t mostRows = 32767;
   if (size.Height > mostRows) throw Failure(options.File, "it is too tall to be shown at this width");
-  const HostPicture picture = SmallPicture(session, image, size.Width, size.Height);
+  const flow::Chain chain = ScaleTo(session, image, size, false);
+  const auto rows = image.Rows(session, chain);
+  // With a mask where it has alpha, and gray or inks turned into light.
+  const HostPicture picture = flow::Gather(*rows, session.Stores, session.Bar).CopyPictureWithMask();
+  if (!picture) throw Failure(options.File, "no picture can be made from it");
   session.Bar.Clear();
   Print(picture);
   return Done;

@@ -28,7 +28,7 @@ struct ThumbnailOptions {
 /// What is to become of an image.
 struct Thumbnail {
   path In, Out;
-  files::Extent Size;
+  Extent Size;
   /// Why it can't be.
   std::string Failed;
 };
@@ -51,14 +51,13 @@ class InLight final : public flow::Operation {
   }
 };
 
-files::Extent SizeOf(const ImageInfo& upright, std::int32_t side) {
+Extent SizeOf(const ImageInfo& upright, std::int32_t side) {
   const double most = std::min(side, std::max(upright.Width, upright.Height));
-  const PictureSize size = SizeWithin({upright.Width, upright.Height, upright.Pixels}, most, most);
-  return {size.Width, size.Height};
+  return SizeWithin(upright, most, most);
 }
 
 /// A name like '{stem}-{width}.jpg' with everything filled in. Throws UsageFailure.
-std::string NameOf(const std::string& pattern, const path& in, const files::Extent& size) {
+std::string NameOf(const std::string& pattern, const path& in, const Extent& size) {
   const std::map<std::string, std::string> words{
       {"name", in.filename().string()},
       {"stem", in.stem().string()},
@@ -121,9 +120,7 @@ std::vector<Thumbnail> Planned(Session& session, const ThumbnailOptions& options
 void Make(Session& session, const Thumbnail& one, int threads) {
   OpenedImage image(session, one.In);
   Target target(session, one.Out);
-  flow::Chain chain;
-  if (one.Size.Width != image.Upright.Width || one.Size.Height != image.Upright.Height)
-    chain.push_back(ScaleTo(session, one.Size, true));
+  flow::Chain chain = ScaleTo(session, image, one.Size, true);
   if (WithoutAlpha(image.Upright.Pixels) == Format::CMYK) chain.push_back(std::make_unique<InLight>());
   Silence silent;
   const Format colours = HasAlpha(image.Upright.Pixels) ? Format::RGBA : Format::RGB;

@@ -42,11 +42,7 @@ int Tiles(Session& session, Options options) {
   }
   making.Writing = session.Writing;
   making.Running = {session.Stores, session.Threads};
-  OpenedImage source(session, options.In);
-  std::function<std::unique_ptr<ImageReader>()> again;
-  // Standard input comes once.
-  if (options.In != "-") again = [&] { return OpenedImage(session, options.In).Reader; };
-  MakeTiles({std::move(source.Reader), again}, options.In, options.Out, making, session.Bar);
+  MakeTiles(OpenedImage(session, options.In).Take(session), options.In, options.Out, making, session.Bar);
   return Done;
 }
 
@@ -77,7 +73,7 @@ void AddTiles(CLI::App& app, Session& session) {
           "--layout", [options](const std::string& name) { options->Making.How = Layouts.at(name); },
           "deepzoom (NAME.dzi and NAME_files; the default), iiif (level 0 of version 3) or xyz (for maps)")
       ->type_name("KIND")
-      ->check(CLI::IsMember({"deepzoom", "iiif", "xyz"}));
+      ->check(CLI::IsMember(Layouts));
   command->add_option("--tile", options->Making.Tile, "Width and height of a tile in pixels, 256 by default")
       ->type_name("N")
       ->check(CLI::Range(16, 8192));

@@ -2,13 +2,13 @@
 #include <pybind11/pybind11.h>
 
 #include <algorithm>
-#include <charconv>
 #include <string>
 #include <string_view>
 #include <utility>
 #include <vector>
 
 #include "picturezor/picture.h"
+#include "values.h"
 
 // What is given in Python in several ways: enumerations by their names, colours, rectangles.
 
@@ -67,17 +67,6 @@ Enum FromName(const std::string& text) {
   throw py::value_error(text + " is no " + EnumNames<Enum>::Name + "; there are " + known);
 }
 
-/// Six digits of hexadecimal, with or without a # before them.
-inline Color ColourFromText(const std::string& text) {
-  const std::string digits = text.starts_with('#') ? text.substr(1) : text;
-  std::uint32_t value = 0;
-  const char* end = digits.data() + digits.size();
-  const auto [rest, failed] = std::from_chars(digits.data(), end, value, 16);
-  if (digits.size() != 6 || failed != std::errc() || rest != end)
-    throw py::value_error(text + " isn't a colour like #ff8000");
-  return {std::uint8_t(value >> 16), std::uint8_t(value >> 8), std::uint8_t(value)};
-}
-
 }
 
 namespace pybind11::detail {
@@ -108,7 +97,10 @@ struct type_caster<picturezor::Color> {
 
   bool load(handle source, bool) {
     if (isinstance<str>(source)) {
-      value = picturezor::python::ColourFromText(source.cast<std::string>());
+      const auto text = source.cast<std::string>();
+      const auto colour = picturezor::steps::ColourOf(text);
+      if (!colour) throw value_error(text + " isn't a colour like #ff8000");
+      value = *colour;
       return true;
     }
     if (!isinstance<sequence>(source) || len(source) != 3) return false;

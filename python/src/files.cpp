@@ -118,11 +118,6 @@ Handle Open(const py::object& source, const std::string& name, std::optional<std
   });
 }
 
-const std::vector<std::pair<std::string, files::Compression>> Packings{
-    {"none", files::Compression::None},       {"lzw", files::Compression::LZW},
-    {"deflate", files::Compression::Deflate}, {"zstd", files::Compression::Zstd},
-    {"jpeg", files::Compression::JPEG},       {"webp", files::Compression::WebP}};
-
 files::WriteOptions WritingOf(int quality, const std::optional<std::string>& compression,
                               std::optional<int> level, bool lossless, std::int32_t tile, bool big,
                               bool pyramid) {
@@ -132,12 +127,11 @@ files::WriteOptions WritingOf(int quality, const std::optional<std::string>& com
   files::WriteOptions options{
       .Quality = quality, .Lossless = lossless, .Level = level, .Tile = tile, .Big = big, .Pyramid = pyramid};
   if (!compression) return options;
-  for (const auto& [name, packing] : Packings)
-    if (name == *compression) {
-      options.Packing = packing;
-      return options;
-    }
-  throw std::invalid_argument("no compression is called " + *compression);
+  const auto packing = files::Compressions().find(*compression);
+  if (packing == files::Compressions().end())
+    throw std::invalid_argument("no compression is called " + *compression);
+  options.Packing = packing->second;
+  return options;
 }
 
 /// Writes a file, or gives its bytes.
@@ -178,7 +172,7 @@ std::optional<py::bytes> Save(const Handle& self, const std::optional<std::files
   });
   if (opaque) Warn("alpha is left out, since such a file has none");
   if (target) return {};
-  return py::bytes(reinterpret_cast<const char*>(bytes.data()), bytes.size());
+  return AsBytes(bytes);
 }
 
 /// What a command calls --mask-colour is mask_colour here.
@@ -342,15 +336,12 @@ py::list Descriptions() {
 py::dict InfoOf(const Handle& self) {
   if (!self.From || !self.From->Info) return {};
   const files::ImageInfo& info = *self.From->Info;
-  const auto bytes = [](const Bytes& all) {
-    return py::bytes(reinterpret_cast<const char*>(all.data()), all.size());
-  };
   py::dict known;
   if (info.Density) known["density"] = py::make_tuple(info.Density->X, info.Density->Y);
-  if (!info.Profile.empty()) known["profile"] = bytes(info.Profile);
-  if (!info.Exif.empty()) known["exif"] = bytes(info.Exif);
-  if (!info.Xmp.empty()) known["xmp"] = bytes(info.Xmp);
-  if (!info.Iptc.empty()) known["iptc"] = bytes(info.Iptc);
+  if (!info.Profile.empty()) known["profile"] = AsBytes(info.Profile);
+  if (!info.Exif.empty()) known["exif"] = AsBytes(info.Exif);
+  if (!info.Xmp.empty()) known["xmp"] = AsBytes(info.Xmp);
+  if (!info.Iptc.empty()) known["iptc"] = AsBytes(info.Iptc);
   if (info.Pages > 1) known["pages"] = info.Pages;
   if (!info.Notes.empty()) known["notes"] = info.Notes;
   return known;

@@ -104,6 +104,9 @@ class Reference {
   std::shared_ptr<py::object> Of;
 };
 
+inline py::bytes AsBytes(const Bytes& bytes) {
+  return py::bytes(reinterpret_cast<const char*>(bytes.data()), bytes.size());
+}
 /// Anything with the buffer protocol, its bytes one after the other.
 struct GivenBytes {
   explicit GivenBytes(const py::object& object) {

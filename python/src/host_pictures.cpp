@@ -53,7 +53,7 @@ void AddHostPicture(py::module_& module) {
           const AtWork working({&self.At});
           all = self.Of.RGB();
         }
-        return py::bytes(reinterpret_cast<const char*>(all.data()), all.size());
+        return AsBytes(all);
       },
       "All pixels, row by row, as red, green and blue: 3 x width x height bytes.");
   pictures.def(
@@ -99,12 +99,7 @@ void AddGWorld(py::module_& module) {
       .def_property_readonly("depth", &GWorld::Depth, "Bits of a pixel: 8, 24 or 32.")
       .def_property_readonly("pixel_bytes", &GWorld::PixelBytes, "Bytes from pixel to pixel.")
       .def(
-          "row",
-          [](const GWorld& self, std::int32_t y) {
-            const Bytes row = self.Row(y);
-            return py::bytes(reinterpret_cast<const char*>(row.data()), row.size());
-          },
-          arg("index"),
+          "row", [](const GWorld& self, std::int32_t y) { return AsBytes(self.Row(y)); }, arg("index"),
           "The bytes of a row's pixels, width x pixel_bytes. IndexError outside of the GWorld.");
 }
 

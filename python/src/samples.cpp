@@ -264,10 +264,6 @@ int GetBuffer(PyObject* object, Py_buffer* buffer, int flags) {
   return -1;
 }
 
-py::bytes AsBytes(const Bytes& bytes) {
-  return py::bytes(reinterpret_cast<const char*>(bytes.data()), bytes.size());
-}
-
 /// Bytes that a method gives; none where there is no way to a format.
 template <class Get>
 py::bytes Taken(const Handle& self, const char* name, Get&& get) {
@@ -389,8 +385,7 @@ void AddSamples(PictureClass& pictures) {
   pictures.def(
       "to_array", [](const Handle& self) { return ReadRows(self, 0, Opened(self).Height()); },
       "A copy of the samples: rows x columns, and x channels where there is more than one, in the order of "
-      "the "
-      "format's name.");
+      "the format's name.");
   pictures.def("_read_rows", ReadRows, arg("first"), arg("count"));
   pictures.def("_write_rows", WriteRows, arg("first"), arg("rows"));
   pictures.def("raw_row", RawRow, arg("index"),
