@@ -1,7 +1,6 @@
 """The work of a batch: groups of pictures on the workers of the engine, results in the journal."""
 
 import os
-import shutil
 import time
 from dataclasses import dataclass, field
 
@@ -10,7 +9,7 @@ from .failures import BatchFailure
 from .journal import Journal
 from .names import Pattern, absolute, inputs as files_of
 from .recipe import Recipe
-from .work import Stopped, Work, workers_of
+from .work import Stopped, Work, job_of, located, make_directory, workers_of
 
 # Bytes that a picture weighs beside those of its file: what it costs however small it is.
 _EVERY_PICTURE = 1 << 16
@@ -113,14 +112,9 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
     """
     start = time.monotonic()
     recipe, pattern = Recipe(recipe, writing), Pattern(output)
-    where = shutil.which(command or "picturezor")
-    if not where:
-        raise BatchFailure(f"{command or 'picturezor'}: there is no such command")
+    where = located(command)
     recipe.check(where, absolute(pattern.of(b"/picture.png")))
-    try:
-        os.makedirs(pattern.directory, exist_ok=True)
-    except OSError as error:
-        raise BatchFailure(f"{os.fsdecode(pattern.directory)}: {error.strerror}") from None
+    make_directory(pattern.directory)
     book = Journal(journal or os.path.join(os.fsdecode(pattern.directory), "picturezor-batch.sqlite"))
     try:
         book.plan(_planned(inputs, pattern))
@@ -150,10 +144,8 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
                 raise Stopped("an input failed")
             if count:
                 workers = workers or len(os.sched_getaffinity(0))
-                job = {"steps": recipe.text, "writing": recipe.writing, "directory": os.getcwd(),
-                       "temp_dir": temp_dir, "memory_limit": memory_limit,
-                       "command": "picturezor" if client and not command else where,
-                       "threads": None if client else min(32, max(1, len(os.sched_getaffinity(0)) // workers))}
+                job = job_of(client, command, workers, memory_limit, steps=recipe.text, writing=recipe.writing,
+                             temp_dir=temp_dir)
                 groups = _Groups(book.to_do(), book.weight() + count * _EVERY_PICTURE, task_seconds)
                 with workers_of(client, min(workers, count)) as (engine, own):
                     Work(engine, groups, worker.make_group, job, lambda row: row[:2], answered, stop, own).do()

@@ -140,14 +140,12 @@ class Journal:
         self._written = time.monotonic()
 
     def sample(self, number):
-        """Up to `number` results of the plan that stand, (input, target), evenly out of all."""
-        standing = self._base.execute(
-            "SELECT p.input, p.target FROM plan p JOIN results r USING (target) "
-            "WHERE r.result = 'done' ORDER BY p.number")
-        total = self._base.execute(
-            "SELECT count(*) FROM plan p JOIN results r USING (target) WHERE r.result = 'done'").fetchone()[0]
+        """The targets of up to `number` results of the plan that stand, evenly out of all."""
+        done = "FROM plan p JOIN results r USING (target) WHERE r.result = 'done'"
+        total = self._base.execute(f"SELECT count(*) {done}").fetchone()[0]
         step = max(1, -(-total // number))
-        return [(_bytes(source), _bytes(target)) for at, (source, target) in enumerate(standing) if at % step == 0]
+        standing = self._base.execute(f"SELECT target {done} ORDER BY p.number")
+        return [_bytes(target) for at, (target,) in enumerate(standing) if at % step == 0]
 
     def close(self):
         try:

@@ -51,7 +51,7 @@ def _small_pictures(command, targets):
                   "--quiet"]
         subprocess.run(listed, stdin=subprocess.DEVNULL, stderr=subprocess.DEVNULL, check=False)
         for number in range(len(targets)):
-            file = os.path.join(place, "made", f"{number}.jpg")
+            file = os.path.join(made, f"{number}.jpg")
             if os.path.exists(file):
                 with open(file, "rb") as image:
                     yield number, image.read()
@@ -71,8 +71,8 @@ def write_page(file, report, recipe, journal, command):
     sample = journal.sample(_MOST_PICTURES)
     figures = "".join(
         f'<figure><img alt="" src="data:image/jpeg;base64,{base64.b64encode(image).decode()}">'
-        f"<figcaption>{_text(os.path.basename(sample[number][1]))}</figcaption></figure>"
-        for number, image in _small_pictures(command, [target for _, target in sample]))
+        f"<figcaption>{_text(os.path.basename(sample[number]))}</figcaption></figure>"
+        for number, image in _small_pictures(command, sample))
     page = _PAGE.format(
         title="Batch of pictures", figures="".join(f"<tr><th>{name}<td>{value}" for name, value in rows),
         recipe=_text(recipe.text + b"\n" + " ".join(recipe.writing).encode()), failures=failures,

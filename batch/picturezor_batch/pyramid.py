@@ -3,7 +3,6 @@
 import math
 import os
 import re
-import shutil
 import subprocess
 import time
 
@@ -11,7 +10,7 @@ from . import worker
 from .batch import Report
 from .failures import BatchFailure, UsageFailure
 from .names import absolute
-from .work import Stopped, Work, workers_of
+from .work import Stopped, Work, job_of, located, make_directory, workers_of
 
 # Behind what the command says of its options.
 _USAGE = " (see picturezor tiles --help)"
@@ -68,23 +67,15 @@ def tiles(source, output, client=None, *, options=(), tile=256, parts=None, memo
     BatchFailure where a part can't be made.
     """
     start = time.monotonic()
-    where = shutil.which(command or "picturezor")
-    if not where:
-        raise BatchFailure(f"{command or 'picturezor'}: there is no such command")
     source, target = absolute(os.fsencode(source)), absolute(os.fsencode(output).rstrip(b"/"))
-    width, height = _size_of(source, where)
-    try:
-        os.makedirs(os.path.dirname(target), exist_ok=True)
-    except OSError as error:
-        raise BatchFailure(f"{os.fsdecode(os.path.dirname(target))}: {error.strerror}") from None
+    width, height = _size_of(source, located(command))
+    make_directory(os.path.dirname(target))
     parts = parts or usual_parts(-(-height // tile))
     workers = min(workers or len(os.sched_getaffinity(0)), parts)
-    job = {"source": source, "target": target, "directory": os.getcwd(), "parts": parts,
-           "options": ["--tile", str(tile), *(one for one in options if one != "--page"),
-                       *(["--temp-dir", temp_dir] if temp_dir else [])],
-           "at the end": [one for one in options if one == "--page"], "memory_limit": memory_limit,
-           "command": "picturezor" if client and not command else where,
-           "threads": None if client else min(32, max(1, len(os.sched_getaffinity(0)) // workers))}
+    job = job_of(client, command, workers, memory_limit, source=source, target=target, parts=parts,
+                 options=["--tile", str(tile), *(one for one in options if one != "--page"),
+                          *(["--temp-dir", temp_dir] if temp_dir else [])],
+                 at_the_end=[one for one in options if one == "--page"])
     report = Report()
 
     def answered(number, _result, message, _seconds, _pixels, _machine):

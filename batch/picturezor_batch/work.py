@@ -4,6 +4,7 @@ import collections
 import contextlib
 import itertools
 import os
+import shutil
 import time
 import uuid
 
@@ -18,6 +19,29 @@ _AHEAD = 2
 
 class Stopped(Exception):
     """The work ends before all is done."""
+
+
+def located(command):
+    """Where the command stands on this machine. Throws BatchFailure where it doesn't."""
+    where = shutil.which(command or "picturezor")
+    if not where:
+        raise BatchFailure(f"{command or 'picturezor'}: there is no such command")
+    return where
+
+
+def make_directory(directory):
+    """Throws BatchFailure."""
+    try:
+        os.makedirs(directory, exist_ok=True)
+    except OSError as error:
+        raise BatchFailure(f"{os.fsdecode(directory)}: {error.strerror}") from None
+
+
+def job_of(client, command, workers, memory_limit, **more):
+    """What tasks are told beside their rows."""
+    return {"directory": os.getcwd(), "memory_limit": memory_limit,
+            "command": "picturezor" if client and not command else located(command),
+            "threads": None if client else worker.threads_of(workers), **more}
 
 
 class Work:

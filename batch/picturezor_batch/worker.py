@@ -16,7 +16,7 @@ MACHINE_FAULTS = ("No space left on device", "Disk quota exceeded", "Read-only f
 SOURCE_FAULTS = ("No such file or directory", "Stale file handle", "Input/output error")
 
 
-def _threads(hands):
+def threads_of(hands):
     """For each of so many commands at a time; no command takes more than 32."""
     return min(32, max(1, len(os.sched_getaffinity(0)) // hands))
 
@@ -130,7 +130,7 @@ def make_group(job, pairs):
     worker = get_worker()
     hands = worker.state.nthreads
     limit = job["memory_limit"] or worker.memory_manager.memory_limit
-    threads = job["threads"] or _threads(hands)
+    threads = job["threads"] or threads_of(hands)
     answers, fault, command, sent = [], "", None, 0
     try:
         for number, (source, target) in enumerate(pairs):
@@ -187,9 +187,9 @@ def make_parts(job, numbers):
         if number:
             share = ["--part", f"{number}/{job['parts']}"]
         else:
-            share = ["--join", str(job["parts"]), *job["at the end"]]
+            share = ["--join", str(job["parts"]), *job["at_the_end"]]
         # Nobody else is at work when all is put together.
-        threads = (job["threads"] or _threads(hands)) if number else _threads(1)
+        threads = (job["threads"] or threads_of(hands)) if number else threads_of(1)
         try:
             done = subprocess.run(
                 _guarded([job["command"], "tiles", job["source"], "-o", job["target"], "--quiet", "--threads",
