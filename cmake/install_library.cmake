@@ -1,6 +1,3 @@
-include(CMakePackageConfigHelpers)
-include(GNUInstallDirs)
-
 # The programs and tests of this tree link static libraries; others get both kinds. `target` is the static one,
 # installed as picturezor::<name>_static, and its objects make a shared one as well, picturezor::<name>.
 function(install_library target name)

@@ -1,4 +1,5 @@
 # What CMake and pkg-config need to know of the installed libraries, and Debian packages of it all (cpack -G DEB).
+include(CMakePackageConfigHelpers)
 set(cmake_dir ${CMAKE_INSTALL_LIBDIR}/cmake/picturezor)
 configure_package_config_file(cmake/picturezorConfig.cmake.in picturezorConfig.cmake INSTALL_DESTINATION ${cmake_dir})
 write_basic_package_version_file(picturezorConfigVersion.cmake COMPATIBILITY SameMajorVersion)

@@ -5,7 +5,7 @@ import re
 import sys
 
 import picturezor
-from picturezor import _core, _steps
+from picturezor import _steps
 
 HEADER = '''"""{}"""
 

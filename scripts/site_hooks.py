@@ -28,7 +28,7 @@ def shown_place(target):
     return f"project/{target.relative_to(ROOT)}" + ("" if target.suffix in {".jpg", ".png", ".svg"} else ".txt")
 
 
-def moved_links(text, folder, depth):
+def moved_links(text, folder):
     """Links of a page that stands in `folder`, as they are in the site."""
 
     def moved(match):
@@ -88,7 +88,7 @@ def with_bars(line):
 
 def on_page_markdown(markdown, page, **_):
     folder = ROOT if page.file.src_path in {"index.md", "contributing.md"} else (ROOT / "docs" / page.file.src_path).parent
-    text = moved_links(markdown, folder, 0)
+    text = moved_links(markdown, folder)
     if page.file.src_path == "performance.md":
         text = "\n".join(with_bars(line) if line.startswith("|") else line for line in text.split("\n"))
     return text
