@@ -93,6 +93,15 @@ bool LockPicture(HostPictureLock& lock, HostPicture* picture, bool mayConvert, b
   return !GWorldPathSeen && LockRowTable(lock, picture);
 }
 
+void ReleasePictureLock(HostPictureLock& lock) {
+  if (lock.PixMap) UnlockPixels(std::exchange(lock.PixMap, nullptr));
+  HostPicture* picture = std::exchange(lock.Picture, nullptr);
+  if (!picture) return;
+  unlockPictureDescription(picture);
+  if (lock.ClearCacheOnRelease) REALPictureClearCache(picture);
+  REALUnlockObject(picture);
+}
+
 }
 
 HostPictureLock::~HostPictureLock() { ReleasePictureLock(*this); }
@@ -117,15 +126,6 @@ void AdvanceLockRow(HostPictureLock& lock) {
   else
     lock.CurrentRow =
         lock.RowTable ? lock.RowTable[lock.Y] : lock.FirstRow + std::ptrdiff_t{lock.Y} * lock.RowBytes;
-}
-
-void ReleasePictureLock(HostPictureLock& lock) {
-  if (lock.PixMap) UnlockPixels(std::exchange(lock.PixMap, nullptr));
-  HostPicture* picture = std::exchange(lock.Picture, nullptr);
-  if (!picture) return;
-  unlockPictureDescription(picture);
-  if (lock.ClearCacheOnRelease) REALPictureClearCache(picture);
-  REALUnlockObject(picture);
 }
 
 HostPicture* FinishPictureLock(HostPictureLock& lock) {

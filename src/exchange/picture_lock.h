@@ -50,7 +50,6 @@ bool LockPictureForReading(HostPictureLock& lock, HostPicture* picture);
 bool LockNewPicture(HostPictureLock& lock, std::int32_t width, std::int32_t height);
 /// To the next row. Behind the last one the cursor stands on row 0 again.
 void AdvanceLockRow(HostPictureLock& lock);
-void ReleasePictureLock(HostPictureLock& lock);
 /// Ends the lock and gives its picture, with a reference for the caller.
 HostPicture* FinishPictureLock(HostPictureLock& lock);
 

@@ -189,6 +189,9 @@ struct PixelRuns {
   }
 };
 
+Sample* PlainRow(PictureData* data, std::int32_t row) {
+  return data->PixelBase + std::ptrdiff_t(StoreRow(*data, row)) * data->RowSize;
+}
 Sample* PlainRowMirrored(PictureData* data, std::int32_t row) {
   return data->PixelBase + std::ptrdiff_t(MirroredStoreRow(*data, row)) * data->RowSize;
 }
@@ -197,10 +200,6 @@ Sample* MappedRowMirrored(PictureData* data, std::int32_t row) {
   return WindowRow(*data, MirroredStoreRow(*data, row));
 }
 
-}
-
-Sample* PlainRow(PictureData* data, std::int32_t row) {
-  return data->PixelBase + std::ptrdiff_t(StoreRow(*data, row)) * data->RowSize;
 }
 
 PictureData::RowFunction Mirrored(PictureData::RowFunction getter) {

@@ -74,9 +74,6 @@ std::int32_t MostRowsTogether(const PictureData& data);
 /// row is asked for. Null where they can't be, and on a closed picture.
 Sample* RowsTogether(PictureData& data, std::int32_t first, std::int32_t last);
 
-/// The getter of every memory store.
-Sample* PlainRow(PictureData* data, std::int32_t row);
-
 /// Whether a byte from the first to the last pixel of a row of one picture is one of such a row of the other,
 /// so that a write to one can show in the other.
 bool SharePixels(const PictureData& a, const PictureData& b);
