@@ -15,7 +15,6 @@ class ProgressBar final : public files::Progress {
 
   /// Shows bars from now on, if standard error is a terminal.
   void Enable();
-  bool Shown() const { return Enabled; }
   void Begin(const std::string& stage, std::int64_t steps = 0) override;
   void Step(std::int64_t steps = 1) override {
     Steps += steps;

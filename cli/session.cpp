@@ -187,14 +187,6 @@ std::unique_ptr<ImageWriter> Target::Writer(const Session& session, Format forma
   return Type.Create(Output->Descriptor(), File, info, options);
 }
 
-void Target::Write(Session& session, const Picture& picture, Format format, ImageInfo info) {
-  info.Width = picture.Width();
-  info.Height = picture.Height();
-  const auto writer = Writer(session, format, std::move(info), session.Threads);
-  WriteFrom(picture, *writer, format, session.Bar);
-  writer->Finish();
-}
-
 void Target::Carry(Session& session, OpenedImage& source, flow::Chain chain, Format format, int threads,
                    Progress& progress) {
   ImageInfo info = source.Upright;

@@ -93,8 +93,6 @@ class Target {
   /// goes along only where its colours fit.
   void Carry(Session& session, OpenedImage& source, flow::Chain chain, Format format, int threads,
              Progress& progress);
-  /// Writes and completes the file. `info` tells what else goes into it.
-  void Write(Session& session, const Picture& picture, Format format, ImageInfo info);
   /// For the rows, as pixels of `format`. `info` tells what else goes into the file.
   std::unique_ptr<ImageWriter> Writer(const Session& session, Format format, ImageInfo info, int threads);
   /// The file stands under its name from now on.

@@ -57,7 +57,29 @@ void DieOfFullDisk(int) {
   _exit(CodeOfFullDisk);
 }
 
+/// A signal takes such a file along from now on, or no longer.
+void RemoveOnDeath(const std::filesystem::path& file, bool directory = false) {
+  const std::string path = std::filesystem::absolute(file).string();
+  if (path.size() >= PATH_MAX) return;
+  const std::lock_guard lock(Taking);
+  for (Doomed& entry : TheDoomed)
+    if (!entry.Used) {
+      std::strcpy(entry.Path, path.c_str());
+      entry.Directory = directory;
+      entry.Used = true;
+      return;
+    }
+}
+
+void KeepOnDeath(const std::filesystem::path& file) {
+  const std::string path = std::filesystem::absolute(file).string();
+  const std::lock_guard lock(Taking);
+  for (Doomed& entry : TheDoomed)
+    if (entry.Used && path == entry.Path) entry.Used = false;
+}
+
 constexpr char OpenFiles[] = "/proc/self/fd/";
+
 }
 
 void CatchSignals(int exitCode) {
@@ -76,26 +98,6 @@ void CatchSignals(int exitCode) {
   // They come as errors of the write instead.
   std::signal(SIGXFSZ, SIG_IGN);
   std::signal(SIGPIPE, SIG_IGN);
-}
-
-void RemoveOnDeath(const std::filesystem::path& file, bool directory) {
-  const std::string path = std::filesystem::absolute(file).string();
-  if (path.size() >= PATH_MAX) return;
-  const std::lock_guard lock(Taking);
-  for (Doomed& entry : TheDoomed)
-    if (!entry.Used) {
-      std::strcpy(entry.Path, path.c_str());
-      entry.Directory = directory;
-      entry.Used = true;
-      return;
-    }
-}
-
-void KeepOnDeath(const std::filesystem::path& file) {
-  const std::string path = std::filesystem::absolute(file).string();
-  const std::lock_guard lock(Taking);
-  for (Doomed& entry : TheDoomed)
-    if (entry.Used && path == entry.Path) entry.Used = false;
 }
 
 std::filesystem::path DefaultTempDirectory() {

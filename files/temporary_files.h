@@ -9,12 +9,10 @@
 
 namespace picturezor::files {
 
-/// From now on a signal that ends the program takes along the files named to RemoveOnDeath; the program then
-/// dies by that signal. A full disk under a mapped file, which comes as a signal too, ends it with `exitCode`
+/// From now on a signal that ends the program takes its unfinished files along; the program then dies by that
+/// signal. A full disk under a mapped file, which comes as a signal too, ends it with `exitCode`
 /// and a line on stderr.
 void CatchSignals(int exitCode);
-void RemoveOnDeath(const std::filesystem::path& file, bool directory = false);
-void KeepOnDeath(const std::filesystem::path& file);
 
 /// No signal ends the program while there is one.
 class SignalsHeldBack {

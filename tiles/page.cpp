@@ -45,15 +45,7 @@ void ReplaceAll(std::string& text, const std::string& what, const std::string& w
     text.replace(at, what.size(), with);
 }
 
-}
-
-std::string PerMetre(const std::optional<files::Resolution>& density) {
-  constexpr double inchesOfMetre = 1 / 0.0254;
-  char text[32];
-  std::snprintf(text, sizeof text, "%.9g", density ? density->X * inchesOfMetre : 0);
-  return text;
-}
-
+/// What pyramid.js wants to know of a pyramid, as JSON.
 std::string PyramidForPage(const Grid& grid, const std::string& base, const std::string& ending,
                            const std::optional<files::Resolution>& density) {
   constexpr const char* names[] = {"deepzoom", "iiif", "xyz"};
@@ -63,6 +55,15 @@ std::string PyramidForPage(const Grid& grid, const std::string& base, const std:
          ", \"tile\": " + std::to_string(grid.Tile()) + ", \"overlap\": " + std::to_string(grid.Overlap()) +
          ", \"levels\": " + std::to_string(grid.LevelCount()) + ", \"format\": \"" + ending.substr(1) +
          "\", \"base\": \"" + QuotedForJSON(base) + "\", \"perMetre\": " + PerMetre(density) + "}";
+}
+
+}
+
+std::string PerMetre(const std::optional<files::Resolution>& density) {
+  constexpr double inchesOfMetre = 1 / 0.0254;
+  char text[32];
+  std::snprintf(text, sizeof text, "%.9g", density ? density->X * inchesOfMetre : 0);
+  return text;
 }
 
 path OpenSeadragonFolder() {

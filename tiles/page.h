@@ -18,9 +18,6 @@ std::map<std::string, std::string> OpenSeadragonFiles();
 
 /// The pixels of a metre as pages read it; 0 where nobody knows.
 std::string PerMetre(const std::optional<files::Resolution>& density);
-/// What pyramid.js wants to know of a pyramid, as JSON.
-std::string PyramidForPage(const Grid& grid, const std::string& base, const std::string& ending,
-                           const std::optional<files::Resolution>& density);
 
 /// Writes a page that shows a pyramid, with OpenSeadragon beside it: NAME.html for DeepZoom, else
 /// NAME/index.html.

@@ -332,6 +332,5 @@ std::string ViewServer::Address() const {
 }
 
 void ViewServer::Run() { Of->Server.listen_after_bind(); }
-void ViewServer::Stop() { Of->Server.stop(); }
 
 }

@@ -25,9 +25,8 @@ class ViewServer {
   ~ViewServer();
   /// The page's address.
   std::string Address() const;
-  /// Serves until Stop is called, on another thread.
+  /// Serves as long as the process lives.
   void Run();
-  void Stop();
 
  private:
   struct Implementation;

@@ -23,7 +23,6 @@ struct TIFFShape {
   std::int64_t PieceWidth() const { return Tile ? Tile : Width; }
   std::int64_t PieceHeight() const { return Tile ? Tile : RowsPerStrip; }
   std::int64_t PiecesAcross() const { return (Width + PieceWidth() - 1) / PieceWidth(); }
-  std::int64_t PiecesDown() const { return (Height + PieceHeight() - 1) / PieceHeight(); }
 };
 
 /// The tags that say how the samples are stored.
