@@ -1,6 +1,5 @@
 #include <utility>
 
-#include "filters/byte_tables.h"
 #include "filters/oil_modes.h"
 #include "filters/oil_rows.h"
 #include "filters/packed_rows.h"

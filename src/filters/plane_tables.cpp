@@ -2,6 +2,7 @@
 
 #include <optional>
 
+#include "filters/byte_tables.h"
 #include "image/walk.h"
 
 namespace zor {

@@ -1,5 +1,4 @@
 #pragma once
-#include "filters/byte_tables.h"
 #include "image/clip.h"
 #include "image/filter.h"
 

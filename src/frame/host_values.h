@@ -1,6 +1,4 @@
 #pragma once
-#include <cstddef>
-
 #include "frame/types.h"
 
 namespace zor {

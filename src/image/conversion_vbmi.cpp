@@ -2,7 +2,6 @@
 
 #include "image/byte_blocks.h"
 #include "image/conversion.h"
-#include "image/targets.h"
 
 #if defined(__x86_64__) || defined(__i386__)
 #include <immintrin.h>

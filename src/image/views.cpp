@@ -3,7 +3,6 @@
 #include <utility>
 
 #include "image/formats.h"
-#include "image/groups.h"
 #include "image/image.h"
 #include "image/lifecycle.h"
 #include "image/plane_fields.h"
