@@ -42,8 +42,7 @@ std::string MethodsPage() {
   std::ostringstream out;
   out << "# Methods, properties and constants\n\n"
          "The module registers these declarations with a host, in this order. `scripts/methods` generates "
-         "the "
-         "page from the\nmodule's tables, and a test checks that it is up to date.\n\n"
+         "the page from the\nmodule's tables, and a test checks that it is up to date.\n\n"
          "- Assignment: the method can also stand on the left of an assignment, which stores a value.\n"
          "- Read, Written: a host accesses the property in the object's record, or through a function of the "
          "module.\n"
