@@ -9,14 +9,14 @@ namespace zor {
 namespace {
 
 void PrintMethods(std::ostream& out, const char* title, const MethodRecord* rows, Word count) {
-  out << "\n## " << title << "\n\n| Row | Declaration | Flags | Assignment |\n|---|---|---|---|\n";
+  out << "\n## " << title << "\n\n| No. | Declaration | Flags | Assignment |\n|---|---|---|---|\n";
   for (Word i = 0; i < count; ++i)
     out << "| " << i + 1 << " | `" << rows[i].Declaration << "` | " << std::hex << "0x" << rows[i].Flags
         << std::dec << " | " << (rows[i].Setter ? "yes" : "") << " |\n";
 }
 
 void PrintProperties(std::ostream& out, const ClassRecord& record) {
-  out << "\n## Properties\n\n| Row | Name | Type | Read | Written | Flags |\n|---|---|---|---|---|---|\n";
+  out << "\n## Properties\n\n| No. | Name | Type | Read | Written | Flags |\n|---|---|---|---|---|---|\n";
   const auto access = [](Word function) {
     return function == 0 ? "" : function == DirectField ? "in the record" : "by a function";
   };
