@@ -241,6 +241,27 @@ TEST_F(Formats, ProfileAndResolutionGoAlong) {
   EXPECT_THAT(Run({"info", "ink.jpg"}).Out, HasSubstr("150 x 150"));
 }
 
+// Catches inks that are inverted, black points left alone, and an embedded profile that isn't used.
+TEST_F(Formats, CMYKBecomesTheColoursOfItsProfile) {
+  const Raster ink = Waves(60, 40, 4);
+  Raster inverted = ink;
+  for (auto& sample : inverted.Samples) sample = std::uint8_t(255 - sample);
+  const Bytes press = ReadBytes("/usr/share/color/icc/ghostscript/default_cmyk.icc");
+  WriteTIFF(At("ink.tif"), ink, {.CMYK = true, .Profile = press});
+  WriteJPEG(At("ink.jpg"), inverted, {.Quality = 100, .Profile = press});
+  for (const auto& [intent, flags] : {std::pair{"perceptual", "-t0"}, {"relative", "-t1 -b"}}) {
+    SCOPED_TRACE(intent);
+    const std::string other = std::string("tificc ") + flags + " '" + At("ink.tif").string() + "' '" +
+                              At("other.tif").string() + "' > /dev/null 2>&1";
+    ASSERT_EQ(std::system(other.c_str()), 0);
+    const Raster expected = ReadTIFF(At("other.tif"));
+    for (const auto& [in, off] : {std::pair{"ink.tif", 1}, {"ink.jpg", 6}}) {
+      Do({"convert", in, "--profile", "srgb", "--intent", intent, "-o", "out.png"});
+      EXPECT_LE(Difference(ReadPNG(At("out.png")), expected), off) << in;
+    }
+  }
+}
+
 TEST_F(Formats, ArePackedAsAskedFor) {
   const Raster picture = Waves(200, 150, 3);
   WritePNG(At("a.png"), picture);
