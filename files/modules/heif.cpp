@@ -40,7 +40,7 @@ class HEIFReader : public WholeReader {
     About.Height = heif_image_handle_get_height(image);
     About.Pixels = heif_image_handle_has_alpha_channel(image) ? Format::RGBA : Format::RGB;
     About.Bits = std::max(1, heif_image_handle_get_luma_bits_per_pixel(image));
-    if (About.Bits > 8) About.Notes.push_back(std::to_string(About.Bits) + " bits a sample reduced to 8");
+    if (About.Bits > 8) About.Notes.push_back(std::to_string(About.Bits) + " bits per sample reduced to 8");
     ReadExtras();
     // Planes as they are packed, and as they are given.
     Needs = 4 * std::max(1, (About.Bits + 7) / 8);

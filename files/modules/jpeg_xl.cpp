@@ -121,7 +121,7 @@ class JPEGXLReader : public WholeReader {
     About.Width = std::int32_t(info.xsize);
     About.Height = std::int32_t(info.ysize);
     About.Bits = int(info.bits_per_sample);
-    if (About.Bits > 8) About.Notes.push_back(std::to_string(About.Bits) + " bits a sample reduced to 8");
+    if (About.Bits > 8) About.Notes.push_back(std::to_string(About.Bits) + " bits per sample reduced to 8");
     About.Pixels = info.num_color_channels == 1 ? Format::G : Format::RGB;
     if (info.alpha_bits) About.Pixels = WithAlpha(About.Pixels);
     // What it works on besides has four bytes a sample.

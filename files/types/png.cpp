@@ -113,7 +113,7 @@ class PNGReader : public ImageReader, PNGFile {
     RequirePlausible(Path, width, height, FileSize, MostInflation * 8 / bits);
     About.Width = std::int32_t(width);
     About.Height = std::int32_t(height);
-    if (About.Bits == 16) About.Notes.push_back("16 bits a sample reduced to 8");
+    if (About.Bits == 16) About.Notes.push_back("16 bits per sample reduced to 8");
 
     int passes = 1;
     Try([&] {

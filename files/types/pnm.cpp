@@ -33,7 +33,7 @@ class PNMReader : public ImageReader {
     About.Width = std::int32_t(Of.Width);
     About.Height = std::int32_t(Of.Height);
     About.Bits = Of.Bits() ? 1 : Of.Most > 255 ? 16 : 8;
-    if (Of.Most > 255) About.Notes.push_back("16 bits a sample reduced to 8");
+    if (Of.Most > 255) About.Notes.push_back("16 bits per sample reduced to 8");
     ChoosePixels();
     if (!Of.Text()) Line.resize(std::size_t(Of.RowBytes()));
   }

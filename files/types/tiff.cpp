@@ -39,7 +39,7 @@ class TIFFReader : public ImageReader {
     About.Width = std::int32_t(Of.Width);
     About.Height = std::int32_t(Of.Height);
     About.Bits = Of.Bits;
-    if (Of.Bits == 16) About.Notes.push_back("16 bits a sample reduced to 8");
+    if (Of.Bits == 16) About.Notes.push_back("16 bits per sample reduced to 8");
     ReadExtras();
     for (int plane = 0; plane < Of.Planes(); ++plane) {
       // Samples that nobody asks for need no rows.
@@ -168,7 +168,7 @@ class TIFFReader : public ImageReader {
         break;
       default: refuse("TIFF files with colours of kind " + std::to_string(Of.Photometric));
     }
-    if (Of.Samples < Of.Colours) throw Failure(Path, "corrupt TIFF: too few samples a pixel");
+    if (Of.Samples < Of.Colours) throw Failure(Path, "corrupt TIFF: too few samples per pixel");
     std::uint16_t count = 0, *kinds = nullptr;
     if (TIFFGetFieldDefaulted(*File, TIFFTAG_EXTRASAMPLES, &count, &kinds) && count > 0 &&
         Of.Samples > Of.Colours && Of.Photometric != PHOTOMETRIC_PALETTE &&
@@ -178,7 +178,7 @@ class TIFFReader : public ImageReader {
       About.Pixels = WithAlpha(About.Pixels);
     }
     const int left = Of.Samples - Of.Colours - (Of.AlphaAt >= 0);
-    if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples a pixel left out");
+    if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples per pixel left out");
     File->Check();
   }
 
