@@ -59,7 +59,7 @@ Format PixelsBehind(Session& session, const OpenedImage& source, const flow::Cha
   for (const auto& work : chain) {
     const flow::Shape result = work->Result(shape);
     if (WithoutAlpha(shape.Of) == Format::CMYK && WithoutAlpha(result.Of) == Format::G)
-      session.Note(source.File, "gray is made from the black ink alone");
+      session.Note(source.File, "gray is made from the black channel alone");
     shape = result;
   }
   return shape.Of;

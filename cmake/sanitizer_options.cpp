@@ -14,3 +14,14 @@ extern "C" [[gnu::visibility("default")]] const char* __asan_default_options() {
 extern "C" [[gnu::visibility("default")]] const char* __lsan_default_suppressions() {
   return "leak:libheif\nleak:libdav1d\nleak:libde265\nleak:libaom\nleak:libx265\n";
 }
+
+/// A test forks while workers are parked; and what is suppressed is known by the older of two stacks.
+extern "C" [[gnu::visibility("default")]] const char* __tsan_default_options() {
+  return "die_after_fork=0:history_size=7";
+}
+
+/// A picture that arrives is mapped chunk by chunk by whoever touches it first. The others read it as soon as
+/// the processor lets them, and no lock tells the sanitizer of that.
+extern "C" [[gnu::visibility("default")]] const char* __tsan_default_suppressions() {
+  return "race:picturezor::flow::ArrivingPicture::Show\nrace:picturezor::flow::ArrivingPicture::Hide\n";
+}

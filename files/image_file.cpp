@@ -27,7 +27,7 @@ const std::map<std::string, Compression>& Compressions() {
 
 void ImageReader::SetBits(int bits) {
   About.Bits = bits;
-  if (bits > 8) About.Notes.push_back(std::to_string(bits) + " bits a sample reduced to 8");
+  if (bits > 8) About.Notes.push_back(std::to_string(bits) + " bits per sample reduced to 8");
 }
 
 void ImageReader::ReadRows(std::uint8_t* rows, std::ptrdiff_t stride, std::int32_t count) {

@@ -22,7 +22,7 @@ namespace picturezor::flow {
 namespace {
 
 /// A cursor is so far ahead of its reader, and keeps so much behind it.
-constexpr std::int64_t BytesAhead = 4 << 20, BytesBehind = 8 << 20;
+constexpr std::int64_t BytesAhead = 4 << 20, BytesBehind = 4 << 20;
 /// Smaller pictures are gone through several times, in stripes that fit a cache, and so are kept whole.
 constexpr std::int64_t BytesKeptWhole = 16 << 20;
 constexpr std::int64_t MostChunkBytes = 1 << 20;

@@ -12,8 +12,10 @@ namespace picturezor::flow {
 
 namespace {
 
-/// Bytes of the strips of the source that are turned at the same time, and of a band of the result.
+/// Bytes of the strips of the source that are turned at the same time, and of a band of the result, if the
+/// picture isn't smaller than a multiple of that.
 constexpr std::int64_t StripsBytes = 96 << 20, BandBytes = 24 << 20;
+constexpr std::int64_t StripsPart = 2, BandPart = 8;
 /// Runs of so many pixels stand together in the result, at least.
 constexpr std::int64_t FewestRows = 16;
 /// What is given back goes by blocks.
@@ -79,7 +81,9 @@ TurnedRows::TurnedRows(const RowSource& source, int orientation, const files::St
   }
   strips.PixelBytes = BytesPerPixel(source.Of.Of);
   const std::int64_t rowBytes = source.Of.Width * strips.PixelBytes;
-  const std::int64_t most = std::min(StripsBytes, stores.MemoryLimit / 2) / (2 * (threads + 2));
+  const std::int64_t most =
+      std::min({StripsBytes, stores.MemoryLimit / 2, rowBytes * source.Of.Height / StripsPart}) /
+      (2 * (threads + 2));
   strips.RowsOfStrip = std::min<std::int64_t>(std::max(most / rowBytes, FewestRows), source.Of.Height);
   strips.Kept =
       std::make_unique<Spool>(files::PictureSize{source.Of.Width, source.Of.Height, source.Of.Of}, stores);
@@ -117,7 +121,8 @@ class TurnedRows::Reading final : public Rows {
   Reading(std::shared_ptr<Strips> strips, std::int64_t first)
       : Rows(strips->Upright), Of(std::move(strips)), Upcoming(first) {
     const auto rowBytes = std::int64_t(RowBytes());
-    Longest = std::clamp<std::int64_t>(BandBytes / rowBytes, 1, About().Height);
+    Longest = std::clamp<std::int64_t>(std::min(BandBytes / rowBytes, About().Height / BandPart), 1,
+                                       About().Height);
     Band.resize(std::size_t(Longest * rowBytes));
     At = {first, first};
   }

@@ -1,4 +1,4 @@
-"""Writes picturezor/__init__.pyi: what type checkers know of the package, as the built package tells it of itself."""
+"""Writes picturezor/__init__.pyi, the types that type checkers see, from the built package."""
 
 import inspect
 import re
@@ -26,7 +26,7 @@ Progress: TypeAlias = Callable[[str, int, int], object]
 Rect: TypeAlias = tuple[int, int, int, int]
 Samples: TypeAlias = NDArray[np.uint8]
 '''
-# What pybind11 calls types, and what they are called here.
+# Types as pybind11 writes them, and as they are written in the stubs.
 TYPES = [(r"picturezor\._core\.", ""), (r"numpy\.ndarray\[numpy\.uint8\]", "Samples"),
          (r"numpy\.ndarray", "NDArray[Any]"),
          (r"os\.PathLike\b(?!\[)", "str | PathLike[str]"), (r"\bos\.PathLike\[str\]", "PathLike[str]"),
@@ -43,7 +43,7 @@ def typed(text):
 
 
 def parts(text):
-    """A list of parameters, cut at the commas between them."""
+    """Splits a list of parameters at the commas between them."""
     found, depth, start = [], 0, 0
     for at, letter in enumerate(text):
         depth += (letter in "[(<") - (letter in "])>")
@@ -67,7 +67,7 @@ def parameter(text):
 
 
 def parameters(text):
-    """Those behind a default that have none are given by their names."""
+    """Parameters without a default that follow one with a default become keyword-only."""
     listed = [parameter(part) for part in parts(text)]
     for at, one in enumerate(listed):
         if at and not one.startswith("*") and "=" not in one and "=" in listed[at - 1] and "*" not in listed[:at]:
@@ -76,7 +76,7 @@ def parameters(text):
 
 
 def signatures(doc):
-    """What pybind11 writes above the help: one signature, or several with their numbers."""
+    """The signatures that pybind11 writes above the docstring: one, or several with numbers."""
     return re.findall(r"^(?:\d+\. )?\w*\((.*)\) -> (.*)$", doc, re.MULTILINE)
 
 
@@ -92,7 +92,7 @@ def pybind_function(name, function, indent, static=False):
         listed = ", ".join(parameters(arguments))
         if indent and not static:
             listed = re.sub(r"^(self|arg0)(: [^,]*)?", "self", listed)
-        # A result that may be what was given for it.
+        # A result that may be the very object that was given as dest.
         result = "Picture" if result == "object" else typed(result)
         yield f"{indent}def {name}({listed}) -> {result}: ..."
 
@@ -103,7 +103,7 @@ def python_function(name, function, indent):
                  for one in signature.parameters.values()]
     text = str(signature.replace(parameters=shortened)).replace("Ellipsis", "...")
     result = typed(text.replace("'", "").replace("(self, /", "(self"))
-    # What contextlib makes of it.
+    # What contextlib turns the generator into.
     result = result.replace("-> Iterator[", "-> AbstractContextManager[")
     return f"{indent}def {name}{result}: ..."
 

@@ -43,7 +43,7 @@ const Step Convert{
     .Help = "Change the file type or the pixel format",
     .More =
         "Gray converts to and from every format; RGB and CMYK don't convert to each other. Gray becomes\n"
-        "black ink, and only the black ink of CMYK becomes gray.",
+        "the black channel of CMYK, and CMYK becomes gray from its black channel alone.",
     .Examples = {"convert scan.tif -o scan.png", "convert photo.jpg --format gray -o gray.tif"},
     .Options = {{.Name = "format",
                  .Of = Kind::Choice,

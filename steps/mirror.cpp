@@ -31,8 +31,8 @@ const Step Mirror{
     .Help = "Swap left and right, or top and bottom",
     .More = "Both together rotate the image by half a turn.",
     .Examples = {"mirror photo.jpg --horizontal -o mirrored.jpg"},
-    .Options = {{.Name = "horizontal", .Of = Kind::Flag, .Help = "Left for right"},
-                {.Name = "vertical", .Of = Kind::Flag, .Help = "Top for bottom"}},
+    .Options = {{.Name = "horizontal", .Of = Kind::Flag, .Help = "Swap left and right"},
+                {.Name = "vertical", .Of = Kind::Flag, .Help = "Swap top and bottom"}},
     .Make = [](const Values& values, const Surroundings&) -> std::unique_ptr<const flow::Operation> {
       if (!values.Flag("horizontal") && !values.Flag("vertical"))
         throw files::UsageFailure("give --horizontal, --vertical or both");

@@ -97,12 +97,12 @@ const Step Scale{
                  "scale map.tif --percent 12.5 --memory-limit 256M -o overview.tif"},
     .Options = {{.Name = "width",
                  .Of = Kind::Integer,
-                 .Help = "Width in pixels; if --height isn't given, it follows from this",
+                 .Help = "Width in pixels; without --height, the height keeps the aspect ratio",
                  .Least = 1,
                  .Most = MostSide},
                 {.Name = "height",
                  .Of = Kind::Integer,
-                 .Help = "Height in pixels; if --width isn't given, it follows from this",
+                 .Help = "Height in pixels; without --width, the width keeps the aspect ratio",
                  .Least = 1,
                  .Most = MostSide},
                 {.Name = "fit",
@@ -128,8 +128,9 @@ const Step Scale{
                 {.Name = "draft",
                  .Of = Kind::Flag,
                  .Help =
-                     "Let the decoder shrink the image first, where it can (JPEG), to no less than twice\n"
-                     "the size of the result: faster, but not bit-exact"}},
+                     "Start from a reduced image at least twice as large as the result, where the type has\n"
+                     "one: JPEG and JPEG 2000 are decoded at a reduced size, TIFF files and slides may\n"
+                     "hold smaller copies. Faster, but not bit-exact"}},
     .Make = [](const Values& values, const Surroundings&) -> std::unique_ptr<const flow::Operation> {
       if (!values.Has("width") && !values.Has("height") && !values.Has("fit") && !values.Has("percent"))
         throw files::UsageFailure("give --width, --height, --fit or --percent");

@@ -39,6 +39,12 @@ class NamedOperation final : public flow::Operation {
     if (draft) draft->Rest = std::make_unique<NamedOperation>(Name, std::move(draft->Rest));
     return draft;
   }
+  std::optional<int> Turns() const override { return Work->Turns(); }
+  std::vector<std::unique_ptr<const Operation>> Parts(const flow::Shape& source) const override {
+    auto parts = Work->Parts(source);
+    for (auto& part : parts) part = std::make_unique<NamedOperation>(Name, std::move(part));
+    return parts;
+  }
   Picture Apply(Picture source, const flow::Workplace& at) const override {
     return Naming(Name, [&] { return Work->Apply(std::move(source), at); });
   }

@@ -1,4 +1,4 @@
-"""The work of a batch: groups of pictures on the workers of the engine, results in the journal."""
+"""Runs a batch: sends groups of images to Dask's workers, and records the results in the journal."""
 
 import os
 import time
@@ -11,13 +11,13 @@ from .names import Pattern, absolute, inputs as files_of
 from .recipe import Recipe
 from .work import Stopped, Work, job_of, located, make_directory, workers_of
 
-# Bytes that a picture weighs beside those of its file: what it costs however small it is.
+# Bytes that are added to the size of each file when work is estimated: the cost of an image, however small.
 _EVERY_PICTURE = 1 << 16
 
 
 @dataclass
 class Failed:
-    """An input without a result, and why. `aside`: it was given up since workers died of it."""
+    """An input that has no result. `message` says why; `aside` is set if it was given up because its workers died."""
 
     input: bytes
     message: str
@@ -27,8 +27,9 @@ class Failed:
 
 @dataclass
 class Report:
-    """What became of a batch. `pixels` are those of the inputs that are done, `seconds` those of the whole batch,
-    `unfinished` the inputs left for the next run, and `stopped` says why where there are some."""
+    """The outcome of a batch. `done` counts the results that were made, `skipped` those that existed before, and
+    `failed` is a list of Failed. `pixels` counts the pixels of the inputs that are done, `seconds` is the time that
+    the whole batch took. `unfinished` counts the inputs left for the next run; `stopped` says why there are any."""
 
     done: int = 0
     skipped: int = 0
@@ -52,9 +53,9 @@ def _planned(names, pattern):
 
 
 class _Groups:
-    """Makes groups of the pictures that are left: as many as take a worker `seconds` by what was measured so far,
-    and fewer towards the end, so that all workers end together, but none for less than a tenth of that: a group costs
-    something, too."""
+    """Divides the remaining images into groups. A group should take a worker thread about `seconds`, estimated from the
+    images measured so far. Towards the end groups become smaller, so that all workers finish together, but not
+    shorter than a tenth of `seconds`, since each group has a cost of its own."""
 
     def __init__(self, rows, weight, seconds):
         self._rows, self._left, self._seconds = iter(rows), weight, seconds
@@ -68,12 +69,13 @@ class _Groups:
         self._spent += seconds
         self._made += self.weight(row)
 
-    def next(self, hands):
-        """Rows of the journal's plan; none at the end. `hands` are pictures that may be in work at a time."""
-        most = 0.0  # One picture, as long as nothing is known.
+    def next(self, threads):
+        """Returns the next rows of the journal's plan, or an empty list at the end. `threads` is the number of worker
+        threads, each of which processes one group at a time."""
+        most = 0.0  # One image, as long as nothing was measured.
         if self._spent > 0:
             usual = self._made / self._spent * self._seconds
-            most = min(usual, max(self._left / (2 * hands), min(usual / 10, self._left / hands)))
+            most = min(usual, max(self._left / (2 * threads), min(usual / 10, self._left / threads)))
         group, weight = [], 0
         for row in self._rows:
             group.append(row)
@@ -87,28 +89,32 @@ class _Groups:
 def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_fast=False, memory_limit=None,
         temp_dir=None, writing=(), command=None, workers=None, task_seconds=2.0, progress=None, stop=None,
         report=None):
-    """Makes a picture of each input, and gives a Report.
+    """Applies the recipe to each input. Returns a Report.
 
-    recipe: the steps of `picturezor run` as text, or an os.PathLike of the file that holds them.
-    inputs: names and patterns of files; names in bytes stand for themselves.
-    output: the results' names, like 'out/{stem}.jpg'; see Pattern for what stands in braces.
-    client: of the engine, whose workers see the same files under the same names; without one, `workers` processes
-      of this machine work, by default one a processor.
-    journal: the file that holds what is done, picturezor-batch.sqlite beside the results by default. What stands
-      there with the same input, time, size and recipe isn't made again.
-    redo: makes results of another recipe again, which is refused otherwise.
-    fail_fast: stops at the first input that fails.
-    memory_limit: bytes that a worker's pictures may take together, by default what the worker was started with.
-    temp_dir: a directory on each machine for pictures that pass the limit.
-    writing: options of `picturezor run` that say how files are written.
-    command: name of the command picturezor on all machines.
-    task_seconds: how long a worker takes for a group of pictures, about.
-    progress: called with the number of pictures that came to an end, and that of all.
-    stop: a threading.Event that ends the batch early.
-    report: a name for a page with small pictures of results and all failures.
+    recipe: the steps, as text in the form that `picturezor run` takes, or an os.PathLike of a file that holds them.
+    inputs: names and glob patterns of files, as str or os.PathLike; names given as bytes are taken literally.
+    output: the pattern of the results' names, such as 'out/{stem}.jpg'; the placeholders are {stem}, {name}, {ext}
+      and {dir}.
+    client: a Dask client whose workers see the same files under the same paths. Without one, `workers` processes are
+      started on this machine, by default one per processor.
+    journal: the file that records what is done, by default picturezor-batch.sqlite next to the results. A result that
+      it lists with the same recipe, and with an input of the same name, time and size, isn't made again.
+    redo: make results of another recipe again; without it, any such result is an error.
+    fail_fast: stop at the first input that fails.
+    memory_limit: memory in bytes that one worker may use for its images; by default the limit that the worker was
+      started with. It is divided among the images that the worker processes at once.
+    temp_dir: the directory on each machine for images that exceed their share of the limit.
+    writing: options of `picturezor run` for the results, such as ["--quality", "80"].
+    command: name or path of the command picturezor on all machines.
+    task_seconds: about how long a worker takes for one group of images.
+    progress: called as progress(1, total) when an image is done or has failed; total is the number of images to do.
+    stop: a threading.Event that stops the batch when it is set.
+    report: the name of an HTML page to write, with thumbnails of results and all failures.
 
-    Throws UsageFailure for what makes no sense, and BatchFailure for what can't be begun, before any work.
-    Interrupted or without a scheduler it ends with a Report that says so; the next run does the rest.
+    Raises UsageFailure for an invalid recipe, pattern or option, and BatchFailure if the command is missing, the
+    journal or the output directory can't be used, or results conflict; both before any work. BatchFailure is also
+    raised if the workers can't run the tasks, or the report can't be written. If the batch is interrupted or loses its
+    scheduler, it returns a Report that says so, and the next run makes the rest.
     """
     start = time.monotonic()
     recipe, pattern = Recipe(recipe, writing), Pattern(output)
@@ -147,8 +153,8 @@ def run(recipe, inputs, output, client=None, *, journal=None, redo=False, fail_f
                 job = job_of(client, command, workers, memory_limit, steps=recipe.text, writing=recipe.writing,
                              temp_dir=temp_dir)
                 groups = _Groups(book.to_do(), book.weight() + count * _EVERY_PICTURE, task_seconds)
-                with workers_of(client, min(workers, count)) as (engine, own):
-                    Work(engine, groups, worker.make_group, job, lambda row: row[:2], answered, stop, own).do()
+                with workers_of(client, min(workers, count)) as (connected, own):
+                    Work(connected, groups, worker.make_group, job, lambda row: row[:2], answered, stop, own).do()
         except Stopped as stopped:
             outcome.stopped = str(stopped)
         outcome.unfinished = book.count("to do") + book.count("failed") - outcome.done - len(outcome.failed)

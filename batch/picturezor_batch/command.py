@@ -13,23 +13,24 @@ from .failures import BatchFailure, UsageFailure
 from .names import listed
 from .pyramid import tiles
 
-_ABOUT = """Does the same steps to many images, on the processors of this machine or on a cluster.
+_ABOUT = """Applies the same steps to many images, on the processors of this machine or on a cluster.
 
-RECIPE is a file with the steps of `picturezor run`, or their text: 'scale --fit 1280x800 : filter unsharp'.
-An INPUT is a file, or a pattern in quotes that is looked for here: 'scans/**/*.tif'.
+RECIPE is the steps as for `picturezor run`, such as 'scale --fit 1280x800 : filter unsharp', or a file that holds
+them. An INPUT is a file, or a pattern in quotes, such as 'scans/**/*.tif'; this program expands it.
 
-Run again, it makes what is missing or whose input has changed, and nothing else.
+A second run makes only what is missing, failed or changed.
 
-`picturezor-batch tiles IN -o NAME` makes one image pyramid of a large image by parts; see its --help."""
+`picturezor-batch tiles IN -o NAME` makes one image pyramid of a large image in parts; see its --help."""
 
-_ABOUT_TILES = """Makes an image pyramid by parts, on the processors of this machine or on a cluster, with the bytes that
-`picturezor tiles` makes alone. IN should be a TIFF in tiles or strips, whose rows can be read anywhere.
+_ABOUT_TILES = """Makes an image pyramid in parts, on the processors of this machine or on a cluster. The bytes are
+those of a single run of `picturezor tiles`. IN should be a TIFF in tiles or strips, so that each machine reads only
+its rows.
 
-Run again, it goes on where it was interrupted."""
+After an interruption, the same command continues the work."""
 
 _END = """exit codes:
   0 done; 2 something failed or is left for the next run (the reason is on standard error); 3 the command line or
-  the recipe is wrong; 130 interrupted
+  the recipe is invalid; 130 interrupted
 
 examples:
   picturezor-batch 'scale --fit 1280x800' photos/*.jpg -o 'web/{stem}.jpg' --quality 80
@@ -48,7 +49,7 @@ class _Parser(argparse.ArgumentParser):
 def _size(text):
     match = re.fullmatch(r"(\d+(?:\.\d+)?)([KMGT]?)(?:i?B)?", text, re.IGNORECASE)
     if not match or float(match[1]) == 0:
-        raise argparse.ArgumentTypeError(f"{text} isn't a size like 256M or 2G")
+        raise argparse.ArgumentTypeError(f"{text} isn't a size such as 256M or 2G")
     return int(float(match[1]) * 1024 ** " KMGT".index(match[2].upper() or " "))
 
 
@@ -63,29 +64,29 @@ def _positive(kind):
     return parse
 
 
-def _add_engine(parser):
+def _add_worker_options(parser):
     parser.add_argument("--scheduler", metavar="ADDRESS",
-                        help="work on the cluster of this scheduler, like tcp://10.0.0.1:8786, whose machines see the "
-                        "same files under the same names")
+                        help="use the workers of this Dask scheduler, such as tcp://10.0.0.1:8786; their machines must "
+                        "see the same files under the same paths")
     parser.add_argument("--workers", metavar="N", type=_positive(int),
-                        help="processes on this machine, by default one a processor")
+                        help="number of processes on this machine, without --scheduler; one per processor by default")
     parser.add_argument("--memory-limit", metavar="SIZE", type=_size,
-                        help="memory of a worker, divided among its pictures at work, as 256M or 2G; by default what "
-                        "the worker was started with")
-    parser.add_argument("--temp-dir", metavar="DIR", help="directory of temporary files on each machine")
-    parser.add_argument("--command", metavar="NAME", help="the command picturezor on all machines")
-    parser.add_argument("-q", "--quiet", action="store_true", help="no progress bar and no summary")
+                        help="memory of one worker, such as 256M or 2G, divided among the images that it processes at "
+                        "once; the limit that the worker was started with by default")
+    parser.add_argument("--temp-dir", metavar="DIR", help="directory for temporary files on each machine")
+    parser.add_argument("--command", metavar="NAME", help="name or path of the command picturezor on all machines")
+    parser.add_argument("-q", "--quiet", action="store_true", help="print no progress bar and no summary")
 
 
 def _tiles_parser():
     parser = _Parser("picturezor-batch tiles", description=_ABOUT_TILES,
                      formatter_class=argparse.RawDescriptionHelpFormatter)
     parser.add_argument("source", metavar="IN")
-    parser.add_argument("-o", "--output", metavar="NAME", required=True, help="name of the pyramid, a folder")
+    parser.add_argument("-o", "--output", metavar="NAME", required=True, help="name of the pyramid, which is a folder")
     parser.add_argument("--parts", metavar="N", type=_positive(int),
-                        help="parts to divide it into, by default so many that the work is even")
-    _add_engine(parser)
-    making = parser.add_argument_group("how the pyramid is made, as in picturezor tiles")
+                        help="number of parts; by default as many as share the work evenly")
+    _add_worker_options(parser)
+    making = parser.add_argument_group("options of picturezor tiles")
     making.add_argument("--tile", metavar="N", type=_positive(int), default=256)
     for name in _TILES_VALUES:
         making.add_argument(f"--{name}", metavar=name.upper())
@@ -100,21 +101,22 @@ def _parser():
     parser.add_argument("recipe", metavar="RECIPE")
     parser.add_argument("inputs", metavar="INPUT", nargs="*")
     parser.add_argument("-o", "--output", metavar="PATTERN", required=True,
-                        help="name of the results: {stem}, {name} and {ext} are the input's name without and with its "
-                        "ending, and the ending; {dir} is its directory")
+                        help="names of the results: {stem} and {name} stand for the input's name without and with its "
+                        "extension, {ext} for the extension, {dir} for the directory")
     parser.add_argument("--inputs", metavar="FILE", dest="list",
-                        help="a file with more inputs, one a line; - is standard input")
+                        help="file that lists more inputs, one per line; - is standard input")
     parser.add_argument("-0", "--null", action="store_true",
-                        help="a zero byte stands behind each name of that file, and no line's end")
-    _add_engine(parser)
+                        help="names in the file of --inputs end with a zero byte instead of a newline")
+    _add_worker_options(parser)
     parser.add_argument("--journal", metavar="FILE",
-                        help="what is done, by default picturezor-batch.sqlite beside the results")
+                        help="file that records what is done; picturezor-batch.sqlite next to the results by "
+                        "default")
     parser.add_argument("--redo", action="store_true", help="make results of another recipe again")
     parser.add_argument("--fail-fast", action="store_true", help="stop at the first input that fails")
-    parser.add_argument("--report", metavar="FILE", help="write a page with small pictures and the failures")
+    parser.add_argument("--report", metavar="FILE", help="write an HTML page with thumbnails and all failures")
     parser.add_argument("--task-seconds", metavar="S", type=_positive(float), default=2.0,
-                        help="how long a worker takes for a group of pictures, about; 2 by default")
-    writing = parser.add_argument_group("how images are written, as in picturezor run")
+                        help="about how long a worker takes for one group of images; 2 by default")
+    writing = parser.add_argument_group("options of picturezor run for the results")
     for name in _WRITING_VALUES:
         writing.add_argument(f"--{name}", metavar=name.upper())
     for name in _WRITING_FLAGS:
@@ -123,7 +125,7 @@ def _parser():
 
 
 def _words(options, *names):
-    """Options as they are given to the command."""
+    """Returns the options as arguments of the command picturezor."""
     words = []
     for name in names:
         value = getattr(options, name.replace("-", "_"))
@@ -146,7 +148,8 @@ def _all_inputs(options):
 
 
 def _stop_at_signals():
-    """Set from the first Ctrl-C on. Workers are started with it held back, so it is for this process alone."""
+    """Returns an event that is set by Ctrl-C or SIGTERM. Workers are started with Ctrl-C blocked, so that only this
+    process receives it."""
     stop = threading.Event()
     signal.pthread_sigmask(signal.SIG_BLOCK, [signal.SIGINT])
 
@@ -177,15 +180,16 @@ def _summary(report):
     text = f"{report.done} done, {report.skipped} done before, {len(report.failed)} failed"
     if report.unfinished:
         text += f", {report.unfinished} left for the next run"
-    return (f"{text}; {report.seconds:.1f} s, {report.done / seconds:.1f} pictures and "
-            f"{report.pixels / seconds / 1e6:.1f} megapixels a second")
+    return (f"{text}; {report.seconds:.1f} s, {report.done / seconds:.1f} images and "
+            f"{report.pixels / seconds / 1e6:.1f} megapixels per second")
 
 
 def _tiles_summary(report):
     text = f"{report.done} parts done"
     if report.unfinished:
         text += f", {report.unfinished} left for the next run"
-    return f"{text}; {report.seconds:.1f} s, {report.pixels / max(report.seconds, 1e-9) / 1e6:.1f} megapixels a second"
+    speed = report.pixels / max(report.seconds, 1e-9) / 1e6
+    return f"{text}; {report.seconds:.1f} s, {speed:.1f} megapixels per second"
 
 
 def _make_tiles(options, client, progress, stop):
@@ -205,16 +209,16 @@ def _make_batch(options, client, progress, stop):
 
 
 def main(arguments=None):
-    """Gives the exit code."""
+    """Runs the command. Returns its exit code."""
     from tqdm import tqdm
 
-    # What the engine has to tell of its workers is told here in the batch's own words. Workers read these too.
+    # Dask's messages about its workers are replaced by the batch's own. Workers read these variables too.
     os.environ.setdefault("DASK_LOGGING__DISTRIBUTED", "critical")
     os.environ.setdefault("DASK_LOGGING__ASYNCIO", "critical")
 
     arguments = sys.argv[1:] if arguments is None else arguments
     one = arguments[:1] == ["tiles"]
-    make, summary, unit = (_make_tiles, _tiles_summary, " parts") if one else (_make_batch, _summary, " pictures")
+    make, summary, unit = (_make_tiles, _tiles_summary, " parts") if one else (_make_batch, _summary, " images")
     client = None
     try:
         if one:
@@ -245,7 +249,7 @@ def main(arguments=None):
     for one in report.failed:
         _tell(f"{os.fsdecode(one.input)}: {one.message.removeprefix(os.fsdecode(one.input) + ': ')}")
     if report.stopped:
-        _tell(f"{report.stopped}; the next run goes on from here")
+        _tell(f"{report.stopped}; the next run continues from here")
     if not options.quiet:
         print(summary(report))
     if stop.is_set():

@@ -1,9 +1,9 @@
-"""What is told to a person."""
+"""Exceptions whose messages are meant for users."""
 
 
 class BatchFailure(Exception):
-    """The batch can't be done, or not any further."""
+    """The batch can't be started, or can't continue."""
 
 
 class UsageFailure(BatchFailure):
-    """What was asked for makes no sense."""
+    """The arguments are invalid or contradict each other."""

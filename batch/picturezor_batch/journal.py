@@ -1,4 +1,4 @@
-"""What a batch has done and has to do, in one SQLite file."""
+"""Records what a batch has done and has to do, in one SQLite file."""
 
 import os
 import sqlite3
@@ -19,7 +19,7 @@ CREATE TEMP TABLE plan (
 
 
 def _stored(name):
-    """A name of a file as text where it is text, for who reads the journal; as bytes otherwise."""
+    """A file name as text if it is valid UTF-8, so that the journal can be read; otherwise as bytes."""
     try:
         return name.decode()
     except UnicodeDecodeError:
@@ -31,11 +31,13 @@ def _bytes(stored):
 
 
 class Journal:
-    """Holds the file to itself until it is closed. Results are written at least every half second and at the end.
+    """The journal file, locked for other processes until it is closed. Results are written when more than half a second
+    has passed since the last write, and at the end.
 
-    Results stand under their targets: `input` and `target` are absolute names, `size` and `time` (nanoseconds)
-    those of the input, `recipe` the hash of the steps and of how files are written, `result` done, failed or aside
-    (given up, since its workers died), `seconds` the time that a worker took, `pixels` those of the input."""
+    The table `results` has one row for each target. `input` and `target` are absolute names, `size` and `time` are the
+    input's size in bytes and its modification time in nanoseconds, `recipe` is the hash of the steps and of the
+    options for writing, `result` is done, failed or aside (given up because its workers died), `seconds` is the time
+    that a worker took, and `pixels` is the number of pixels of the input."""
 
     def __init__(self, file):
         self.file = os.fspath(file)
@@ -58,15 +60,15 @@ class Journal:
             yield
         except sqlite3.OperationalError as error:
             if "locked" in str(error):
-                raise BatchFailure(f"{self.file}: another batch is at work with it") from None
+                raise BatchFailure(f"{self.file}: another batch is using it") from None
             raise BatchFailure(f"{self.file}: {error}") from None
         except sqlite3.DatabaseError as error:
             raise BatchFailure(f"{self.file}: {error}") from None
 
     def plan(self, pairs):
-        """Takes what is to be made: (input, target, size, time, message), names in bytes and absolute, message what
-        keeps an input from being made. An input that comes twice counts once. Throws BatchFailure for two inputs
-        with one target, and for a target that is an input."""
+        """Stores the plan: (input, target, size, time, message) for each image. Names are absolute, as bytes; message
+        says why an input can't be processed, or is empty. An input that is given twice counts once. Raises
+        BatchFailure for two inputs with the same target, and for a target that is an input."""
         with self._failures():
             self._base.execute("BEGIN")
             for source, target, size, changed, message in pairs:
@@ -84,8 +86,9 @@ class Journal:
             raise BatchFailure(f"{os.fsdecode(_bytes(taken[0]))}: it would be overwritten by a result")
 
     def settle(self, recipe, redo):
-        """Tells what is done already from what isn't. Gives the number of results that another recipe made, which
-        are made again with `redo` and left alone without."""
+        """Marks the images of the plan that are done already as skipped. Without `redo`, returns the number of results
+        that were made by another recipe, and if there are any, marks nothing; with `redo`, these are made again, and
+        0 is returned."""
         same = ("FROM results r WHERE r.target = plan.target AND r.input = plan.input AND r.result = 'done' "
                 "AND r.size = plan.size AND r.time = plan.time AND stands(plan.target)")
         with self._failures():
@@ -102,20 +105,20 @@ class Journal:
         return 0
 
     def count(self, state):
-        """Inputs of the plan that are 'to do', 'skipped' or 'failed' (before any work)."""
+        """Counts the inputs of the plan in a state: 'to do', 'skipped', or 'failed' (before any work)."""
         return self._base.execute("SELECT count(*) FROM plan WHERE state = ?", (state,)).fetchone()[0]
 
     def weight(self):
-        """Bytes of all inputs that are to do."""
+        """The total size in bytes of the inputs that are to do."""
         return self._base.execute("SELECT total(size) FROM plan WHERE state = 'to do'").fetchone()[0]
 
     def failed_before(self):
-        """(input, message) of the inputs that can't even be begun."""
+        """Yields (input, message) of the inputs that failed before any work."""
         for source, message in self._base.execute("SELECT input, message FROM plan WHERE state = 'failed'"):
             yield _bytes(source), message
 
     def to_do(self):
-        """(input, target, size, time) one after another. Results may be written in between."""
+        """Yields (input, target, size, time) of the images that are to do. Results may be written in the meantime."""
         last, rows = 0, True
         while rows:
             rows = self._base.execute("SELECT number, input, target, size, time FROM plan WHERE number > ? "
@@ -124,7 +127,7 @@ class Journal:
                 yield _bytes(source), _bytes(target), size, changed
 
     def write(self, row, recipe, result, message, seconds, pixels, machine):
-        """Writes the result of a row of to_do."""
+        """Records the result of a row of to_do."""
         source, target, size, changed = row
         self._waiting.append((_stored(target), _stored(source), size, changed, recipe, result,
                               message.encode(errors="backslashreplace").decode(), seconds, pixels, machine))
@@ -140,7 +143,7 @@ class Journal:
         self._written = time.monotonic()
 
     def sample(self, number):
-        """The targets of up to `number` results of the plan that stand, evenly out of all."""
+        """Returns the targets of up to `number` results of the plan, evenly chosen among all that are done."""
         done = "FROM plan p JOIN results r USING (target) WHERE r.result = 'done'"
         total = self._base.execute(f"SELECT count(*) {done}").fetchone()[0]
         step = max(1, -(-total // number))

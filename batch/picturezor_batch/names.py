@@ -16,24 +16,25 @@ def _real(directory):
 
 
 def absolute(name):
-    """One name for a file, however its directory is reached."""
+    """Returns the absolute name of a file, with symbolic links in its directory resolved: one name for each file."""
     directory, last = os.path.split(name)
     return os.path.join(_real(directory or b"."), last)
 
 
 def inputs(names):
-    """The files that names and patterns (`*`, `?`, `[...]`, `**` for any depth) mean, in bytes. Names in bytes stand
-    for themselves. Throws UsageFailure for a pattern that fits nothing, and for a directory."""
+    """Yields the names of the files, as bytes, that names and patterns (`*`, `?`, `[...]`, `**` for any depth) match.
+    Names given as bytes are taken literally. Raises UsageFailure for a pattern that matches nothing, and for a
+    directory."""
     for given in names:
         name = os.fsencode(given)
         if isinstance(given, bytes):
             yield name
         elif glob.has_magic(name) and not os.path.lexists(name):
-            # Where results lie among inputs, the journal does too.
+            # If results are in the directory of the inputs, so is the journal.
             found = sorted(one for one in glob.iglob(name, recursive=True) if not os.path.isdir(one)
                            and not os.path.basename(one).startswith(b"picturezor-batch.sqlite"))
             if not found:
-                raise UsageFailure(f"{os.fsdecode(name)}: no file has such a name")
+                raise UsageFailure(f"{os.fsdecode(name)}: no file matches")
             yield from found
         elif os.path.isdir(name):
             raise UsageFailure(f"{os.fsdecode(name)}: a directory; "
@@ -43,7 +44,7 @@ def inputs(names):
 
 
 def listed(stream, end):
-    """The names that a binary stream holds, each ended by the byte `end`."""
+    """Yields the names in a binary stream, each ended by the byte `end`. Empty ones are skipped."""
     rest = b""
     while part := stream.read(1 << 16):
         *names, rest = (rest + part).split(end)
@@ -53,26 +54,26 @@ def listed(stream, end):
 
 
 class Pattern:
-    """The name of a result, like 'out/{stem}.jpg'. {stem}, {name} and {ext} are the input's name without and with its
-    ending, and the ending; {dir} is the input's directory, as seen from the current one where it lies below it, and
-    from the root otherwise. Throws UsageFailure for other words in braces."""
+    """The pattern of the results' names, such as 'out/{stem}.jpg'. {stem} and {name} are the input's name without and
+    with its extension, {ext} is the extension without the dot. {dir} is the input's directory, relative to the current
+    one if it is below it, and otherwise to the root. Raises UsageFailure for other placeholders."""
 
     def __init__(self, text):
         self._parts = re.split(rb"(\{[^{}]*\})", os.fsencode(text))
         for part in self._parts[1::2]:
             if part[1:-1].decode(errors="replace") not in _WORDS:
-                raise UsageFailure(f"{os.fsdecode(part)}: {{stem}}, {{name}}, {{ext}} and {{dir}} are filled in, "
-                                   "and nothing else")
+                raise UsageFailure(f"{os.fsdecode(part)}: {{stem}}, {{name}}, {{ext}} and {{dir}} are the only "
+                                   "placeholders")
         if not os.fsencode(text) or self._parts[-1].endswith(b"/"):
             raise UsageFailure(f"{text}: the name of a directory, not of results")
 
     @property
     def directory(self):
-        """Where all results lie, at one depth or another."""
+        """The directory that holds all results, some of them perhaps in directories below it."""
         return os.path.dirname(self._parts[0]) or (b"/" if self._parts[0].startswith(b"/") else b".")
 
     def of(self, source):
-        """The name for an absolute one."""
+        """Returns the name of the result for the absolute name of an input."""
         directory, name = os.path.split(source)
         stem, ext = os.path.splitext(name)
         here = os.getcwdb()

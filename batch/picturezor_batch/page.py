@@ -1,4 +1,4 @@
-"""A page about a batch: its figures, small pictures of results, and what failed."""
+"""Writes a page about a batch: figures, thumbnails of results, and failures."""
 
 import base64
 import html
@@ -33,17 +33,17 @@ pre {{ white-space: pre-wrap }}
 
 
 def _text(value):
-    """A file's name, or another text, that may hold bytes of any kind."""
+    """Escapes a text, or a file name that may hold any bytes, for HTML."""
     name = value if isinstance(value, str) else os.fsdecode(value)
     return html.escape(name.encode(errors="backslashreplace").decode())
 
 
 def _small_pictures(command, targets):
-    """Of those that can be read, JPEGs of 160 pixels at most: their numbers and bytes."""
+    """Yields (number, bytes) of JPEG thumbnails of at most 160 pixels, for the targets that can be read."""
     with tempfile.TemporaryDirectory() as place:
         links = []
         for number, target in enumerate(targets):
-            # Numbers, since names in several directories may be alike.
+            # Numbers, since files in different directories may have the same name.
             links.append(os.path.join(place, f"{number}{os.path.splitext(os.fsdecode(target))[1]}"))
             os.symlink(target, links[-1])
         made = os.path.join(place, "made")
@@ -58,10 +58,10 @@ def _small_pictures(command, targets):
 
 
 def write_page(file, report, recipe, journal, command):
-    """Writes one file that holds all it shows. Throws BatchFailure where it can't be written."""
+    """Writes a page that contains its images. Raises BatchFailure if it can't be written."""
     rows = [("done", report.done), ("done before", report.skipped), ("failed", len(report.failed)),
             ("left for the next run", report.unfinished), ("seconds", f"{report.seconds:.1f}"),
-            ("megapixels a second", f"{report.pixels / max(report.seconds, 1e-9) / 1e6:.1f}"),
+            ("megapixels per second", f"{report.pixels / max(report.seconds, 1e-9) / 1e6:.1f}"),
             ("stopped", report.stopped or "no"), ("journal", _text(journal.file))]
     failures = ""
     if report.failed:
@@ -74,7 +74,7 @@ def write_page(file, report, recipe, journal, command):
         f"<figcaption>{_text(os.path.basename(sample[number]))}</figcaption></figure>"
         for number, image in _small_pictures(command, sample))
     page = _PAGE.format(
-        title="Batch of pictures", figures="".join(f"<tr><th>{name}<td>{value}" for name, value in rows),
+        title="Batch of images", figures="".join(f"<tr><th>{name}<td>{value}" for name, value in rows),
         recipe=_text(recipe.text + b"\n" + " ".join(recipe.writing).encode()), failures=failures,
         pictures=f"<h2>Results</h2>{figures}" if figures else "")
     try:

@@ -1,4 +1,4 @@
-"""One image pyramid on many machines, by parts that workers take."""
+"""Makes one image pyramid on many machines, in parts that are distributed to the workers."""
 
 import math
 import os
@@ -12,17 +12,17 @@ from .failures import BatchFailure, UsageFailure
 from .names import absolute
 from .work import Stopped, Work, job_of, located, make_directory, workers_of
 
-# Behind what the command says of its options.
+# What the command appends to messages about its options.
 _USAGE = " (see picturezor tiles --help)"
 
 
 class _OneByOne:
-    """Parts are large enough to be groups of their own."""
+    """Makes each part a group of its own, since parts are large enough."""
 
     def __init__(self, numbers):
         self._numbers = iter(numbers)
 
-    def next(self, _hands):
+    def next(self, _threads):
         return [number] if (number := next(self._numbers, None)) is not None else []
 
     def learn(self, _number, _seconds):
@@ -43,28 +43,31 @@ def _size_of(source, command):
 
 
 def usual_parts(rows):
-    """How many parts a picture with so many rows of tiles is divided into. Levels that the parts share are made by all
-    workers, the others by the one that completes the pyramid. With m levels halved among the parts, a part weighs
-    2^m / rows of all, and what is left 4^-m / 3; the sum is least where 2^m is the cube root of 2 rows / 3."""
+    """Returns the default number of parts for an image with so many rows of tiles. The larger levels are made in parts
+    by all workers, the smaller ones by the worker that completes the pyramid. If m levels are halved within the parts,
+    a part is 2^m / rows of the work, and what is left for the end is 4^-m / 3; the sum is least where 2^m is the cube
+    root of 2 rows / 3."""
     halved = max(0, round(math.log2(2 * rows / 3) / 3))
     return -(-rows // 2 ** halved)
 
 
 def tiles(source, output, client=None, *, options=(), tile=256, parts=None, memory_limit=None, temp_dir=None,
           command=None, workers=None, progress=None, stop=None):
-    """Makes an image pyramid by parts, with the bytes that `picturezor tiles` makes alone. Gives a Report, whose `done`
-    counts parts.
+    """Makes an image pyramid in parts. The bytes are those of a single run of `picturezor tiles`. Returns a Report
+    whose `done` counts parts.
 
-    source: a picture from which rows can be read anywhere, a TIFF in tiles or strips as a rule.
-    output: the pyramid's name, as for `picturezor tiles -o`.
-    client: of the engine, whose workers see the same files under the same names; without one, `workers` processes of
-      this machine work, by default one a processor.
-    options: of `picturezor tiles`, like ["--layout", "iiif", "--page"]; `tile` is the edge of a tile.
-    parts: how many, 1 to the number of rows of tiles; by default so many that the work is even.
-    memory_limit, temp_dir, command, progress, stop: as for run.
+    source: the image. It should be a TIFF in tiles or strips, so that each worker reads only the rows it needs.
+    output: the name of the pyramid, which is a folder, as for `picturezor tiles -o`.
+    client: a Dask client whose workers see the same files under the same paths. Without one, `workers` processes are
+      started on this machine, by default one per processor.
+    options: further options of `picturezor tiles`, such as ["--layout", "iiif", "--page"].
+    tile: the width and height of a tile in pixels.
+    parts: the number of parts, 1 to the number of rows of tiles; by default as many as share the work evenly.
+    progress: called as progress(1, parts) when a part is done, and as progress(0, parts) when the pyramid is complete.
+    memory_limit, temp_dir, command, stop: as for run.
 
-    A run that was stopped is gone on with by the same call. Throws UsageFailure for options that make no sense, and
-    BatchFailure where a part can't be made.
+    After an interruption, the same call continues the work. Raises UsageFailure for invalid options, and BatchFailure
+    if a part can't be made.
     """
     start = time.monotonic()
     source, target = absolute(os.fsencode(source)), absolute(os.fsencode(output).rstrip(b"/"))
@@ -88,13 +91,14 @@ def tiles(source, output, client=None, *, options=(), tile=256, parts=None, memo
             progress(number > 0, parts)
 
     try:
-        with workers_of(client, workers) as (engine, own):
+        with workers_of(client, workers) as (connected, own):
             for numbers in (range(1, parts + 1), [0]):
-                Work(engine, _OneByOne(numbers), worker.make_parts, job, lambda number: number, answered, stop, own).do()
+                Work(connected, _OneByOne(numbers), worker.make_parts, job, lambda number: number, answered, stop,
+                     own).do()
         report.pixels = width * height
     except Stopped as stopped:
         report.stopped = str(stopped)
-        # What joins them is left, if nothing else.
+        # At least the last task, which joins the parts, is left.
         report.unfinished = max(1, parts - report.done)
     report.seconds = time.monotonic() - start
     return report

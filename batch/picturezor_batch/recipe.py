@@ -8,8 +8,9 @@ from .failures import BatchFailure, UsageFailure
 
 
 class Recipe:
-    """Steps as `picturezor run` takes them from a file, and how results are written. `steps` is their text, or an
-    os.PathLike of a file that holds it; `writing` are options of `picturezor run` like ["--quality", "80"]."""
+    """The steps, in the form that `picturezor run --steps` takes, and how results are written. `steps` is their text,
+    or an os.PathLike of a file that holds it; `writing` has options of `picturezor run`, such as ["--quality", "80"].
+    Raises UsageFailure if the file can't be read."""
 
     def __init__(self, steps, writing=()):
         self.name = os.fspath(steps) if isinstance(steps, os.PathLike) else "recipe"
@@ -25,15 +26,15 @@ class Recipe:
 
     @property
     def hash(self):
-        """The same for texts that differ in comments of whole lines and in blank lines only."""
+        """A hash of the steps and options. Blank lines, and lines that hold only a comment, don't count."""
         lines = [line.strip() for line in self.text.splitlines()]
         whole = [line for line in lines if line and not line.startswith(b"#")] + [os.fsencode(w) for w in self.writing]
         return hashlib.sha256(b"\0".join(whole)).hexdigest()
 
     def check(self, command, target):
-        """Throws UsageFailure for a mistake in the steps or the options, or in a name of a result, and BatchFailure
-        where the command or something that the steps need isn't there."""
-        # The command tells mistakes before it looks at the image, which is none.
+        """Raises UsageFailure for a mistake in the steps, the options or the name of the results, and BatchFailure if
+        the command or a file that the steps need is missing."""
+        # The command reports mistakes before it looks at the image, so none is needed.
         steps = os.memfd_create("steps")
         try:
             os.write(steps, self.text)

@@ -1,4 +1,4 @@
-"""Tasks on the workers of the engine: which are at work, what they answer, and what becomes of those that die."""
+"""Distributes tasks to Dask's workers, collects their answers, and deals with workers that die."""
 
 import collections
 import contextlib
@@ -11,18 +11,18 @@ import uuid
 from . import worker
 from .failures import BatchFailure
 
-# Seconds after which workers of this machine are given up. Those of a cluster may come at any time.
+# Seconds after which the workers of this machine are given up. Those of a cluster may appear at any time.
 _WITHOUT_WORKERS = 180
-# Groups for each hand of a worker: one in work, one that waits beside it.
+# Groups per worker thread: one in progress, one waiting.
 _AHEAD = 2
 
 
 class Stopped(Exception):
-    """The work ends before all is done."""
+    """The work ends before everything is done. The message says why."""
 
 
 def located(command):
-    """Where the command stands on this machine. Throws BatchFailure where it doesn't."""
+    """Returns the path of the command on this machine. Raises BatchFailure if it isn't there."""
     where = shutil.which(command or "picturezor")
     if not where:
         raise BatchFailure(f"{command or 'picturezor'}: there is no such command")
@@ -30,7 +30,7 @@ def located(command):
 
 
 def make_directory(directory):
-    """Throws BatchFailure."""
+    """Raises BatchFailure if it can't be made."""
     try:
         os.makedirs(directory, exist_ok=True)
     except OSError as error:
@@ -38,17 +38,19 @@ def make_directory(directory):
 
 
 def job_of(client, command, workers, memory_limit, **more):
-    """What tasks are told beside their rows."""
+    """Returns what is sent to the workers beside the rows; `more` is for the task alone."""
     return {"directory": os.getcwd(), "memory_limit": memory_limit,
             "command": "picturezor" if client and not command else located(command),
             "threads": None if client else worker.threads_of(workers), **more}
 
 
 class Work:
-    """Rows, as the groups give them, each done once. `task` is the function of worker.py that does them: it gets `job`
-    and for each row what `told` makes of it. `answered(row, result, message, seconds, pixels, machine)` hears of each
-    in any order; result is done, failed or aside (given up, since workers died of it), message empty where it is done.
-    `own` is the cluster where it was started for this."""
+    """Processes rows in groups, each row once. `groups` has next(threads), which returns the rows of the next group,
+    and learn(row, seconds). `task` is the function of worker.py that processes a group: it is called with `job` and a
+    list that holds told(row) for each row. `answered(row, result, message, seconds, pixels, machine)` is called for
+    each row, in any order; result is "done", "failed" or "aside" (given up because its workers died), and message is
+    empty for "done". `stop` is a threading.Event or None. `own` is the local cluster if it was started for this work,
+    or None."""
 
     def __init__(self, client, groups, task, job, told, answered, stop, own):
         from distributed import as_completed
@@ -58,9 +60,9 @@ class Work:
         self._run = uuid.uuid4().hex[:8]
         self._numbers = itertools.count()
         self._in_work = {}  # Future: its rows
-        self._bound = {}  # Future: the addresses of workers to which it is bound, if it is
+        self._bound = {}  # Future: the addresses of the workers to which it is bound, if any
         self._again = collections.deque()  # Groups that a machine couldn't do
-        self._suspects = collections.deque()  # Pictures whose group's workers died
+        self._suspects = collections.deque()  # Rows whose group's workers died
         self._unfit = {}  # Address of a worker: what keeps it from working
         self._alone = False
         self._own, self._seen, self._called = own, time.monotonic(), time.monotonic()
@@ -68,7 +70,7 @@ class Work:
         self._results = as_completed(with_results=True, loop=client.loop, raise_errors=False)
 
     def do(self):
-        """Until all is done. Throws Stopped, and BatchFailure where no worker can do it."""
+        """Returns when everything is done. Raises Stopped, or BatchFailure if no worker can do the work."""
         try:
             while True:
                 self._fill()
@@ -91,34 +93,34 @@ class Work:
                 future.release()
 
     def _workers(self):
-        # The scheduler is asked, so not too often.
+        # This asks the scheduler, so not too often.
         if time.monotonic() - self._asked > 1:
             self._known, self._asked = self._client.scheduler_info()["workers"], time.monotonic()
         return self._known
 
     def _fill(self):
-        """Keeps the workers busy, and the engine's list of tasks short however many pictures there are."""
+        """Keeps the workers busy, and Dask's list of tasks short however many rows there are."""
         workers = self._workers()
         if workers:
             self._seen = time.monotonic()
         elif self._own and time.monotonic() - self._seen > _WITHOUT_WORKERS:
             raise Stopped("the workers died and don't come back")
         if self._own and time.monotonic() - self._called > 20:
-            # The engine doesn't start a worker again that died while it was starting, unless it is asked.
+            # Dask doesn't restart a worker that died while it was starting, unless it is asked to.
             self._own.scale(len(self._own.worker_spec))
             self._called = time.monotonic()
         fit = {address: about for address, about in workers.items() if address not in self._unfit}
         if workers and not fit:
             raise Stopped("no machine is left to work on: " + next(iter(self._unfit.values())))
         self._take_back(workers)
-        hands = sum(about["nthreads"] for about in fit.values()) or 1
-        # A suspect that is one indeed takes its worker along, and nothing else should be there then.
-        most = max(1, len(fit) // 2) if self._alone else _AHEAD * hands
+        threads = sum(about["nthreads"] for about in fit.values()) or 1
+        # A row that does kill its worker should have no other row beside it.
+        most = max(1, len(fit) // 2) if self._alone else _AHEAD * threads
         while len(self._in_work) < most:
             if self._alone:
                 group = [self._suspects.popleft()] if self._suspects else []
             else:
-                group = self._again.popleft() if self._again else self._groups.next(hands)
+                group = self._again.popleft() if self._again else self._groups.next(threads)
             if not group:
                 return
             where = {"workers": list(fit), "allow_other_workers": False} if len(fit) < len(workers) else {}
@@ -131,7 +133,7 @@ class Work:
             self._results.add(future)
 
     def _take_back(self, workers):
-        """Groups whose workers have all gone. Those that came back have other addresses, so the engine would wait."""
+        """Takes back groups whose workers have all gone. Restarted workers have other addresses, so Dask would wait."""
         for future in [one for one, bound in self._bound.items() if not bound & workers.keys()]:
             del self._bound[future]
             group = self._in_work.pop(future, None)
@@ -170,8 +172,8 @@ class Work:
 
 @contextlib.contextmanager
 def workers_of(client, count):
-    """The client, and the cluster behind it where it is started here, with `count` workers on this machine."""
-    # Workers get the functions themselves, so that this package needn't be there.
+    """Yields (client, None) or, without a client, the client and the cluster of `count` new workers on this machine."""
+    # Workers are sent the functions themselves, so that this package needn't be installed there.
     import cloudpickle
 
     cloudpickle.register_pickle_by_value(worker)
@@ -181,17 +183,17 @@ def workers_of(client, count):
     import dask
     from distributed import Client, LocalCluster
 
-    # A task that takes two workers along is given up. Nobody looks at profiles of what only waits for a command.
+    # A task that kills two workers is given up. Profiles are useless for tasks that only wait for a command.
     dask.config.set({"distributed.scheduler.allowed-failures": 1, "distributed.worker.profile.interval": "1s",
                      "distributed.worker.profile.cycle": "10s",
-                     # A machine that is very busy may take long to bring a worker back.
+                     # A very busy machine may take long to restart a worker.
                      "distributed.comm.timeouts.connect": "120s"})
     cluster = LocalCluster(n_workers=count, threads_per_worker=1, dashboard_address="127.0.0.1:0",
                            silence_logs="CRITICAL")
     own = Client(cluster)
     try:
         yield own, cluster
-        # One that is just coming back would complain of a scheduler that is gone.
+        # A worker that is just restarting would complain that the scheduler is gone.
         with contextlib.suppress(TimeoutError):
             own.wait_for_workers(count, timeout=20)
     finally:

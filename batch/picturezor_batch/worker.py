@@ -1,5 +1,5 @@
-"""What a worker does with a group of pictures. Sent along with the work, so that a worker needs nothing but the
-engine and the command; so it uses the standard library and the engine alone."""
+"""What a worker does with a group of images. This module is sent to the workers along with the work, so that they need
+nothing but Dask and the command picturezor; it therefore uses only the standard library and Dask."""
 
 import errno
 import os
@@ -9,25 +9,25 @@ import socket
 import subprocess
 import time
 
-# The machine's fault and not the picture's: another machine may do it.
+# Faults of the machine, not of the image: another machine may succeed.
 MACHINE_FAULTS = ("No space left on device", "Disk quota exceeded", "Read-only file system", "no space left for",
                   "setpriv: failed to execute")
-# A source that the batch has seen itself isn't there, or can't be read.
+# The source, which the batch itself could see, is missing here or can't be read.
 SOURCE_FAULTS = ("No such file or directory", "Stale file handle", "Input/output error")
 
 
-def threads_of(hands):
-    """For each of so many commands at a time; no command takes more than 32."""
-    return min(32, max(1, len(os.sched_getaffinity(0)) // hands))
+def threads_of(commands):
+    """The number of threads for each of so many commands that run at once, 1 to 32."""
+    return min(32, max(1, len(os.sched_getaffinity(0)) // commands))
 
 
 def _guarded(command):
-    """The words of a process that ends with its worker, also when that is killed."""
+    """The command line of a process that ends with its worker, even if the worker is killed."""
     return (["setpriv", "--pdeathsig", "TERM"] if shutil.which("setpriv") else []) + command
 
 
 def last_words(said, code):
-    """Why a command ended, out of what it wrote on standard error and its exit code."""
+    """Returns why a command ended, from its standard error and its exit code."""
     lines = said.decode(errors="replace").strip().splitlines()
     if lines:
         return lines[-1].removeprefix("picturezor: ")
@@ -37,11 +37,11 @@ def last_words(said, code):
 
 
 class _Command:
-    """A process of the command that takes pair after pair of names. A picture that crashes takes it along, and
-    nothing else."""
+    """A process of the command picturezor, which is given one pair of names after another. An image that crashes it
+    affects no other process."""
 
     def __init__(self, job, memory, threads):
-        # A file without a name, which the child opens as its steps.
+        # An unnamed file, which the child process opens as its file of steps.
         steps = os.memfd_create("steps")
         self._errors = os.memfd_create("errors")
         self._told = b""
@@ -53,7 +53,7 @@ class _Command:
                 arguments += ["--memory-limit", str(memory)]
             if job["temp_dir"]:
                 arguments += ["--temp-dir", job["temp_dir"]]
-            # In a session of its own, so that Ctrl-C reaches the batch alone.
+            # In a session of its own, so that Ctrl-C reaches only the batch.
             self._process = subprocess.Popen(
                 arguments, stdin=subprocess.PIPE, stdout=subprocess.PIPE, stderr=self._errors, pass_fds=[steps],
                 cwd=job["directory"], start_new_session=True, env={**os.environ, "LC_ALL": "C"})
@@ -64,8 +64,8 @@ class _Command:
             os.close(steps)
 
     def send(self, source, target):
-        """Tells the next picture; the command may still be at others. Throws EOFError with the reason where the
-        process has ended."""
+        """Sends the names of the next image, while earlier ones may still be in progress. Raises EOFError with the
+        reason if the process has ended."""
         try:
             self._process.stdin.write(source + b"\0" + target + b"\0")
             self._process.stdin.flush()
@@ -73,8 +73,8 @@ class _Command:
             raise EOFError(self._last_words()) from None
 
     def answer(self):
-        """Waits for the first picture that isn't answered yet. Gives its pixels and an empty text, or 0 and what went
-        wrong. Throws EOFError with the reason where the process has ended at it."""
+        """Waits for the first image that isn't answered yet. Returns (its number of pixels, ""), or (0, the error
+        message). Raises EOFError with the reason if the process ended while it worked on that image."""
         while b"\0" not in self._told:
             part = os.read(self._process.stdout.fileno(), 1 << 16)
             if not part:
@@ -111,7 +111,8 @@ def _machine_fault(message, source, target):
 
 
 def _directory_faults(target):
-    """Makes a result's directory. Gives what stands in the way of this one, and what does on this machine."""
+    """Makes a result's directory. Returns the error message for this result, and that for this machine; both are empty
+    on success."""
     try:
         os.makedirs(os.path.dirname(target), exist_ok=True)
     except OSError as error:
@@ -122,15 +123,16 @@ def _directory_faults(target):
 
 
 def make_group(job, pairs):
-    """Makes the pictures of `pairs`, (source, target) in bytes, one after another. Gives the machine, the worker's
-    address, for each picture (message, seconds, pixels), its message empty where it is done, and what keeps this
-    machine from working: the pictures without an answer then aren't begun or are to be made elsewhere."""
+    """Processes the images of `pairs`, (source, target) as bytes, one after another. Returns a dict: "machine" is the
+    host name, "worker" the worker's address, "answers" has (message, seconds, pixels) for each image, the message
+    empty on success, and "fault" says why this machine can't continue, or is empty. After a fault, the images without
+    an answer must be made elsewhere."""
     from distributed import get_worker
 
     worker = get_worker()
-    hands = worker.state.nthreads
+    worker_threads = worker.state.nthreads
     limit = job["memory_limit"] or worker.memory_manager.memory_limit
-    threads = job["threads"] or threads_of(hands)
+    threads = job["threads"] or threads_of(worker_threads)
     answers, fault, command, sent = [], "", None, 0
     try:
         for number, (source, target) in enumerate(pairs):
@@ -147,11 +149,11 @@ def make_group(job, pairs):
                     sent += 1
                     continue
             try:
-                command = command or _Command(job, limit and limit // hands, threads)
+                command = command or _Command(job, limit and limit // worker_threads, threads)
                 if sent == number:
                     command.send(source, target)
                     sent += 1
-                # It goes on with the next one while its answer to this one is dealt with.
+                # It works on the next image while its answer for this one is processed.
                 if sent == number + 1 < len(pairs) and not any(_directory_faults(pairs[sent][1])):
                     command.send(*pairs[sent])
                     sent += 1
@@ -174,13 +176,13 @@ def make_group(job, pairs):
 
 
 def make_parts(job, numbers):
-    """Makes parts of an image pyramid, or for the number 0 what completes it. Gives the same as make_group."""
+    """Makes parts of an image pyramid; the number 0 completes the pyramid. Returns the same as make_group."""
     from distributed import get_worker
 
     worker = get_worker()
-    hands = worker.state.nthreads
+    worker_threads = worker.state.nthreads
     memory = job["memory_limit"] or worker.memory_manager.memory_limit
-    memory = ["--memory-limit", str(memory // hands)] if memory else []
+    memory = ["--memory-limit", str(memory // worker_threads)] if memory else []
     answers, fault = [], ""
     for number in numbers:
         start = time.perf_counter()
@@ -188,8 +190,8 @@ def make_parts(job, numbers):
             share = ["--part", f"{number}/{job['parts']}"]
         else:
             share = ["--join", str(job["parts"]), *job["at_the_end"]]
-        # Nobody else is at work when all is put together.
-        threads = (job["threads"] or threads_of(hands)) if number else threads_of(1)
+        # No other part is in progress when the pyramid is completed.
+        threads = (job["threads"] or threads_of(worker_threads)) if number else threads_of(1)
         try:
             done = subprocess.run(
                 _guarded([job["command"], "tiles", job["source"], "-o", job["target"], "--quiet", "--threads",

@@ -23,18 +23,18 @@ int Info(Session& session, const std::filesystem::path& file) {
   std::printf("type:        %s\n", stored.Type->Name);
   std::printf("size:        %d x %d\n", upright.Width, upright.Height);
   std::printf("pixels:      %s\n", Describe(stored.Pixels).c_str());
-  std::printf("bits:        %d a sample\n", stored.Bits);
+  std::printf("bits:        %d per sample\n", stored.Bits);
   std::printf("orientation: %d\n", stored.Orientation);
   if (upright.Density)
     std::printf("resolution:  %.6g x %.6g pixels per inch\n", upright.Density->X, upright.Density->Y);
   else
     std::printf("resolution:  none\n");
   std::printf("profile:     %s\n", ProfileText(stored.Profile).c_str());
-  std::string notes;
+  std::string metadata;
   for (const auto& [name, block] :
        {std::pair{"EXIF", &stored.Exif}, {"XMP", &stored.Xmp}, {"IPTC", &stored.Iptc}})
-    if (!block->empty()) notes += (notes.empty() ? "" : ", ") + std::string(name);
-  std::printf("notes:       %s\n", notes.empty() ? "none" : notes.c_str());
+    if (!block->empty()) metadata += (metadata.empty() ? "" : ", ") + std::string(name);
+  std::printf("metadata:    %s\n", metadata.empty() ? "none" : metadata.c_str());
   std::printf("pages:       %d\n", stored.Pages);
   for (const Extent& level : stored.Levels) std::printf("level:       %d x %d\n", level.Width, level.Height);
   for (const std::string& note : stored.Notes) std::printf("note:        %s\n", note.c_str());

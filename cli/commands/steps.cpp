@@ -50,7 +50,7 @@ void AddGroup(CLI::App& app, Session& session, const steps::Group& group) {
              group.Examples));
   command->require_subcommand(0, 1);
   auto list = std::make_shared<bool>(false);
-  command->add_flag("--list", *list, "List them all");
+  command->add_flag("--list", *list, "List all " + name + "s");
   for (const steps::Step* step : steps::Steps())
     if (const std::string own = NameIn(group, *step); !own.empty()) AddStep(*command, session, *step, own);
   command->allow_extras();

@@ -189,8 +189,9 @@ void AddThumbnail(CLI::App& app, Session& session) {
   CLI::App* command = app.add_subcommand("thumbnail", "Make thumbnails of many images");
   command->footer(Footer(
       "Aspect ratios are kept, and images that are small already keep their size. Colours become RGB;\n"
-      "alpha is kept where the type has it. JPEGs are downscaled while they are decoded. Images that can't\n"
-      "be read are listed at the end; the others are made all the same.",
+      "alpha is kept where the type has it. Images are read at a reduced size where their type has one, as\n"
+      "by `scale --draft`. Those that can't be read are listed at the end; the others are made all the\n"
+      "same.",
       {"thumbnail photos/*.jpg --size 160 -o contacts",
        "thumbnail photos/* --size 1024 --name '{stem}-{width}.jpg' --quality 80 -o web"}));
   auto options = std::make_shared<ThumbnailOptions>();

@@ -51,9 +51,9 @@ int Tiles(Session& session, Options options) {
 void AddTiles(CLI::App& app, Session& session) {
   CLI::App* command = app.add_subcommand("tiles", "Make an image pyramid for web viewers");
   command->footer(
-      "Each level is half the size of the one before, and is scaled from the full image, as by `scale`.\n"
-      "The pyramid gets its name when it is complete; until then it is NAME.unfinished, which --resume\n"
-      "continues.\n\n"
+      "Each level is half as wide and half as high as the next larger one, but is scaled from the full\n"
+      "image, as by `scale`, unless --use-levels is given. The pyramid gets its name when it is complete;\n"
+      "until then it is NAME.unfinished, which --resume continues.\n\n"
       "Examples:\n"
       "  picturezor tiles scan.tif -o scan --page\n"
       "  picturezor tiles scan.tif --layout iiif --address https://example.org/iiif -o scan\n"

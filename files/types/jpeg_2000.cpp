@@ -190,7 +190,7 @@ class JPEG2000Reader : public WholeReader {
     Luma = Space == SYCC;
     if (ChannelsOf(About.Pixels) > samples || (Luma && About.Pixels != Format::RGB)) Check(false);
     const int left = colours - ChannelsOf(About.Pixels);
-    if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples a pixel left out");
+    if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples per pixel left out");
     if (WithAlphaChannel) About.Pixels = WithAlpha(About.Pixels);
     SetBits(PaletteChannels ? 8 : int(Header->comps[0].prec));
   }

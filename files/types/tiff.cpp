@@ -167,7 +167,7 @@ class TIFFReader : public ImageReader {
         break;
       default: refuse("TIFF files with colours of kind " + std::to_string(Of.Photometric));
     }
-    if (Of.Samples < Of.Colours) throw Failure(Path, "corrupt TIFF: too few samples a pixel");
+    if (Of.Samples < Of.Colours) throw Failure(Path, "corrupt TIFF: too few samples per pixel");
     std::uint16_t count = 0, *kinds = nullptr;
     if (TIFFGetFieldDefaulted(*File, TIFFTAG_EXTRASAMPLES, &count, &kinds) && count > 0 &&
         Of.Samples > Of.Colours && Of.Photometric != PHOTOMETRIC_PALETTE &&
@@ -177,7 +177,7 @@ class TIFFReader : public ImageReader {
       About.Pixels = WithAlpha(About.Pixels);
     }
     const int left = Of.Samples - Of.Colours - (Of.AlphaAt >= 0);
-    if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples a pixel left out");
+    if (left > 0) About.Notes.push_back(std::to_string(left) + " extra samples per pixel left out");
     File->Check();
   }
 

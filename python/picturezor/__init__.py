@@ -1,4 +1,4 @@
-"""Images that may be larger than memory, with the same bytes on every machine."""
+"""Scale, filter, rotate and convert images of any size, with the same bytes on every machine."""
 
 import atexit as _atexit
 
@@ -10,5 +10,5 @@ from ._rows import rows
 __all__ = ["DitherMatrix", "Error", "Factory", "Format", "GWorld", "HostPicture", "Kernel", "Picture", "PictureForm",
            "alive", "from_array", "from_pil", "make_pictures_as", "open", "rows", "set_factory"]
 
-# A factory is Python's, and the interpreter goes before the module does.
+# A factory is a Python object, and the interpreter ends before the module is unloaded.
 _atexit.register(set_factory, None)

@@ -1,4 +1,4 @@
-"""What Picture has beside the rows of its class: files, slices, other libraries' pictures."""
+"""What Picture offers beside the methods of its class: files, slices, conversion to and from other libraries."""
 
 from __future__ import annotations
 
@@ -10,7 +10,7 @@ from typing import TYPE_CHECKING, Any
 
 import numpy as np
 
-from . import _core, _steps  # noqa: F401, which gives Picture its steps
+from . import _core, _steps  # noqa: F401, which adds the steps to Picture
 from ._core import Picture
 
 if TYPE_CHECKING:
@@ -19,7 +19,7 @@ if TYPE_CHECKING:
 
     from . import Buffer, Format, Index, Progress, Samples
 
-# Bytes of a mapped picture that are in an array at a time.
+# The most bytes of a mapped picture that are in an array at a time.
 _BLOCK_BYTES = 1 << 24
 
 
@@ -28,7 +28,7 @@ def _limit(memory_limit):
 
 
 def _descriptor(file):
-    """The descriptor of a file on a disk, at the place that the file object is at; None for other objects."""
+    """The descriptor of a file on disk, moved to the position of the file object; None for other objects."""
     try:
         descriptor = file.fileno()
         os.lseek(descriptor, file.tell(), os.SEEK_SET)
@@ -39,14 +39,14 @@ def _descriptor(file):
 
 def open(source: str | os.PathLike[str] | Buffer | BinaryIO, *, memory_limit: int | str | None = None,
          temp_dir: str | os.PathLike[str] | None = None, page: int = 0, progress: Progress | None = None) -> Picture:
-    """Read an image: from a path, the bytes of a file, or a file object.
+    """Read an image from a path, the bytes of a file, or a file object.
 
-    It comes upright, as gray, RGB or CMYK, with alpha where the file has it. A picture that is larger than
-    memory_limit (bytes, or a text like "256M"; half of the free memory without it) lives in a nameless file in
-    temp_dir, and so do those that are made from it. page is the picture of a file with several, from 0 on. progress
-    is called now and then with what is being done, how much of it is done, and how much there is, 0 where nobody can
-    tell; what it raises ends the work. ValueError for a wrong limit or page; Error for a file that can't be read,
-    or of which only the first picture can.
+    The picture is gray, RGB or CMYK, with alpha if the file has it, and upright. A picture that exceeds memory_limit
+    (bytes, or a text such as "256M"; half of the free memory by default) is kept in an unnamed file in temp_dir, and
+    so are the pictures made from it. page selects one of several images in a file, counted from 0. progress is called
+    from time to time as progress(stage, done, total), where total is 0 if it isn't known; an exception that it raises
+    ends the work. Raises ValueError for an invalid limit, or a page that the file doesn't have; Error for a file that
+    can't be read, and for a page above 0 of a type that holds only one image.
 
     >>> import picturezor as pz
     >>> pz.open(pz.Picture(4, 3, "GA").encode("png"))
@@ -65,7 +65,7 @@ def open(source: str | os.PathLike[str] | Buffer | BinaryIO, *, memory_limit: in
 
 
 def from_array(array: Samples, format: Format | str | None = None) -> Picture:
-    """A picture on the memory of an array; see Picture.from_array.
+    """Return a picture that shares the memory of an array; see Picture.from_array.
 
     >>> import numpy
     >>> from_array(numpy.zeros((3, 4), "uint8"))
@@ -75,7 +75,7 @@ def from_array(array: Samples, format: Format | str | None = None) -> Picture:
 
 
 def from_pil(image: Any) -> Picture:
-    """A copy of a picture of Pillow's: gray, RGB or CMYK, with alpha where it has it. Palettes are resolved.
+    """Return a copy of a Pillow image as gray, RGB or CMYK, with alpha if it has any. Palettes are expanded.
 
     >>> import PIL.Image
     >>> from_pil(PIL.Image.new("RGB", (4, 3)))
@@ -97,13 +97,16 @@ def _adds(function):
 def save(self, target: str | os.PathLike[str] | BinaryIO, *, type: str | None = None, quality: int = 90,
          compression: str | None = None, level: int | None = None, lossless: bool = False, tile: int = 0,
          big: bool = False, pyramid: bool = False, progress: Progress | None = None) -> None:
-    """Write an image file, to a path or a file object. The path's ending says its type, or type does ("png").
+    """Write an image file to a path or a file object. type ("png") sets the file type; by default it is taken from the
+    path's extension.
 
-    quality is 1 to 100, for types that lose some of it; lossless loses nothing where a type can. level is the effort of
-    packing, 0 to 9. TIFF can be packed with compression "none", "lzw", "deflate", "zstd", "jpeg" or "webp"; stand in
-    tiles with edges of a multiple of 16; have 64-bit offsets (big), and smaller copies of itself (pyramid). The file
-    stands under its name when it is complete, and not before. ValueError for an unknown type and a wrong option; Error
-    where the file can't be written or pixels have no colours. Alpha that a type lacks is left out, with a warning.
+    quality, 1 to 100, applies to lossy types; lossless keeps every sample exactly (not available for JPEG). level is
+    the compression effort, 0 to 9. The other options are for TIFF: compression is "none", "lzw", "deflate", "zstd",
+    "jpeg" or "webp"; tile is the width and height of its tiles, a multiple of 16, or 0 for strips; big writes 64-bit
+    offsets (BigTIFF); pyramid adds smaller copies of the image, in tiles of 256 unless tile says otherwise. progress
+    is as in open. The file appears under its name only when it is complete. Raises ValueError for an unknown type or an invalid option, and Error if the file
+    can't be written or the pixel format has no colour model (Buffer, Scaling1 to Scaling8). Alpha that the type can't
+    store is dropped, with a warning.
 
     >>> import io, picturezor as pz
     >>> file = io.BytesIO()
@@ -113,7 +116,7 @@ def save(self, target: str | os.PathLike[str] | BinaryIO, *, type: str | None = 
     """
     stream = hasattr(target, "write")
     if stream and type is None:
-        raise ValueError("a file object has no ending that says the type: give type")
+        raise ValueError("a file object has no extension that sets the type: give type")
     data = _core._save(self, None if stream else target, type or "", quality, compression, level, lossless, tile,
                        big, pyramid, progress)
     if stream:
@@ -122,7 +125,7 @@ def save(self, target: str | os.PathLike[str] | BinaryIO, *, type: str | None = 
 
 @_adds
 def encode(self, type: str, **options: Any) -> bytes:
-    """The bytes of an image file of a type ("png"), with the options of save.
+    """Return the bytes of an image file of a type ("png"). The options are those of save.
 
     >>> import picturezor as pz
     >>> pz.Picture(4, 3).encode("png")[:4]
@@ -135,8 +138,8 @@ def encode(self, type: str, **options: Any) -> bytes:
 
 @_adds
 def run(self, steps: str, *, progress: Progress | None = None) -> Picture:
-    """Do steps as they are written for the command, with a colon between two or a line for each. ValueError for
-    what is written wrong, Error for what this picture doesn't allow.
+    """Apply steps, written as for the command: separated by colons, or one per line. Returns a new picture. Raises
+    ValueError for a mistake in the steps, and Error if this picture doesn't support one of them.
 
     >>> import picturezor as pz
     >>> pz.Picture(40, 30).run("scale --fit 10x10 : rotate --angle 90")
@@ -147,7 +150,7 @@ def run(self, steps: str, *, progress: Progress | None = None) -> Picture:
 
 @_adds
 def copy(self) -> Picture:
-    """A picture of the same format and samples, where this one's results live.
+    """Return a copy with the same format and samples. Like other results, it is in memory or in a temporary file.
 
     >>> import picturezor as pz
     >>> first = pz.Picture(4, 3)
@@ -165,10 +168,10 @@ def copy(self) -> Picture:
 @_adds
 @contextlib.contextmanager
 def rows(self, first: int, count: int) -> Iterator[Samples]:
-    """A block of rows as an array that is valid inside a with: rows x columns (x channels), as to_array() gives it.
+    """Access a block of rows as an array, inside a with statement: rows x columns (x channels), as from to_array().
 
-    What is written to it stands in the picture at the end. Of a picture in memory it is a view; of a mapped one a copy,
-    which is stored at the end. IndexError outside of the picture.
+    What is written to the array is in the picture at the end of the with. For a picture in memory, the array is a
+    view; for a mapped picture, it is a copy that is stored at the end. Raises IndexError for rows outside the picture.
 
     >>> import picturezor as pz
     >>> picture = pz.Picture(4, 3, "G")
@@ -188,17 +191,17 @@ def rows(self, first: int, count: int) -> Iterator[Samples]:
 
 
 def _blocks(picture):
-    """First rows and numbers of rows, a few megabytes together."""
+    """Yields the first row and the number of rows of blocks of a few megabytes."""
     together = max(1, _BLOCK_BYTES // max(1, picture.width * picture.channel_count))
     return ((first, min(together, picture.height - first)) for first in range(0, picture.height, together))
 
 
 def _span(index, size):
-    """First line, number of lines, and whether they run backwards, of a slice or a number."""
+    """First row or column, number of them, and whether they run backwards, for a slice or a number."""
     if not isinstance(index, slice):
         at = operator.index(index)
         if not -size <= at < size:
-            raise IndexError(f"{at} is outside of {size}")
+            raise IndexError(f"index {at} is out of range for size {size}")
         return at % size, 1, False
     first, end, step = index.indices(size)
     if step not in (1, -1):
@@ -209,7 +212,7 @@ def _span(index, size):
 
 
 def _view(picture, where):
-    """The view that a slice means; None where nothing is in it."""
+    """The view that an index selects; None if it is empty."""
     down, across = where if isinstance(where, tuple) else (where, slice(None))
     y, height, upwards = _span(down, picture.height)
     x, width, backwards = _span(across, picture.width)
@@ -222,8 +225,9 @@ def _view(picture, where):
 
 @_adds
 def __getitem__(self, where: Index) -> Any:
-    """picture[rows, columns]: a view of a rectangle, from the last row up where rows has the step -1. Of two numbers
-    the pixel's samples. IndexError outside of the picture; ValueError for another step, and where nothing is left.
+    """picture[rows, columns] is a view of a rectangle; with the step -1, its rows are in reverse order. picture[y, x]
+    gives the samples of a pixel. Raises IndexError for a row or column outside the picture, and ValueError for another
+    step and for an empty selection.
 
     >>> import picturezor as pz
     >>> picture = pz.Picture(8, 6)
@@ -244,8 +248,9 @@ def __getitem__(self, where: Index) -> Any:
 
 @_adds
 def __setitem__(self, where: Index, value: Any) -> None:
-    """Store a sample, the samples of a pixel, an array, or a picture of any format, in a view as above. ValueError for
-    an array or a picture of another size, Error for a picture whose format has no way to this one."""
+    """Store a sample, the samples of a pixel, an array or a picture in the pixels that the index selects, as for
+    reading; an empty selection stores nothing. A picture is converted to this picture's format. Raises ValueError for an array or a picture of another
+    size, and Error for a picture whose format can't be converted, such as RGB to CMYK."""
     view = _view(self, where)
     if view is None:
         return
@@ -262,7 +267,7 @@ def __setitem__(self, where: Index, value: Any) -> None:
         view._write_rows(first, samples[first:first + count])
 
 
-# A picture isn't a sequence, though it has indices.
+# A picture isn't a sequence, although it can be indexed.
 Picture.__iter__ = None
 
 
@@ -275,7 +280,8 @@ def _plane(name):
     def store(self, value):
         view(self)[:, :] = value
 
-    return property(view, store, doc=f"A view of the {name} samples, as gray. AttributeError where there are none.")
+    return property(view, store,
+                    doc=f"A view of the {name} channel, as a gray picture. Raises AttributeError if there is none.")
 
 
 for _name in ("red", "green", "blue", "gray", "alpha", "cyan", "magenta", "yellow", "black"):
@@ -284,7 +290,8 @@ for _name in ("red", "green", "blue", "gray", "alpha", "cyan", "magenta", "yello
 
 @_adds
 def to_pil(self) -> Any:
-    """A copy as a picture of Pillow's: L, LA, RGB, RGBA or CMYK. Error for inks with alpha, and pixels without colours.
+    """Return a copy as a Pillow image of mode L, LA, RGB, RGBA or CMYK. Raises Error for CMYK with alpha, and for
+    formats without a colour model (Buffer, Scaling1 to Scaling8).
 
     >>> import picturezor as pz
     >>> pz.Picture(4, 3, "BGR").to_pil().mode
@@ -302,7 +309,7 @@ def to_pil(self) -> Any:
 
 @_adds
 def _repr_png_(self) -> bytes | None:
-    """For notebooks, which show at most 2000 pixels across and down. None for ink and pixels without colours."""
+    """The PNG that notebooks display, at most 2000 x 2000 pixels. None unless the picture is gray or RGB."""
     if not (self.is_gray or self.is_rgb):
         return None
     shown = self if max(self.width, self.height) <= 2000 else self.scale(fit=(2000, 2000), kernel="box")
@@ -321,8 +328,8 @@ def _reopen(path, page):
 
 @_adds
 def __reduce__(self) -> tuple[Any, ...]:
-    """Pictures in memory are pickled with their samples, mapped ones by the path that they were opened from: they come
-    back as the file is then."""
+    """Pickle a picture in memory with its samples, and a mapped picture as the path that it was opened from: it is then
+    read from that file again. Raises TypeError for a mapped picture that wasn't opened from a path."""
     if not self.is_mapping:
         return _restore, (self.width, self.height, self.image_format.name, self.to_array().tobytes())
     path, page = self._file

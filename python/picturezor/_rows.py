@@ -1,11 +1,11 @@
-"""What the rows of the class are called in Python."""
+"""The Python names of the methods of the class."""
 
 import re
 from typing import NamedTuple
 
 from . import _core
 
-# Names that steps have, and rows that Python says in another way.
+# Methods whose names are those of steps, or wouldn't follow from the rule below.
 _OTHER_NAMES = {
     "Combine": "combine_with", "CreatePictureZOR": "create_picture", "Rotate": "rotate_by", "Scale": "scale_from",
     "ScaleFast": "scale_fast_from", "ScaleMT": "scale_mt_from",
@@ -16,8 +16,8 @@ _CONSTRUCTORS = {"FilePath": "mapped", "pic": "from_host", "Buf": "from_array", 
 
 
 class Row(NamedTuple):
-    """A method of the class: its declaration, and the name of what reaches it in Python. A row that can be assigned to
-    has a second name, of what stores the value."""
+    """A method of the class: its declaration, its name in Python and, if the declaration can be assigned to, the name
+    of the Python method that stores a value, otherwise None."""
 
     declaration: str
     name: str
@@ -36,7 +36,7 @@ def _name(declaration: str) -> str:
 
 
 def rows() -> "list[Row]":
-    """All methods of the class, in the order of its table.
+    """Return all methods of the class, in the order in which it declares them.
 
     >>> rows()[28]
     Row(declaration='GammaFilter(dest as PictureZOR, gamma as double) as PictureZOR', name='gamma_filter', setter=None)

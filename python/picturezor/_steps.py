@@ -1,4 +1,4 @@
-"""The methods that are made from the descriptions of steps: scale, crop, filter.blur and so on."""
+"""The methods that are generated from the descriptions of the steps: scale, crop, filter.blur and so on."""
 
 from __future__ import annotations
 
@@ -25,7 +25,7 @@ def _default(option):
 
 def _signature(step):
     parameters = [Parameter("self", Parameter.POSITIONAL_ONLY)]
-    # First what has to be given, which may be given by its place.
+    # First the required ones, which may be positional.
     for option in sorted(step["options"], key=lambda option: not option["required"]):
         kind = _TYPES[option["kind"]]
         if option["required"]:
@@ -71,7 +71,7 @@ def _method(step, picture_of):
 
 
 class Filters:
-    """The filters of a picture. Alpha stays as it is."""
+    """The filters of a picture. They don't change alpha."""
 
     def __init__(self, picture: Picture) -> None:
         self._picture = picture

@@ -1,5 +1,5 @@
-"""The same steps for many images (run), and one image pyramid by parts (tiles), on this machine's processors or on a
-cluster."""
+"""Applies the same steps to many images (run), and makes one image pyramid in parts (tiles), on the processors of this
+machine or on a cluster."""
 
 from picturezor_batch import BatchFailure, Failed, Report, UsageFailure, run, tiles
 

@@ -21,27 +21,29 @@ struct EnumNames;
 template <>
 struct EnumNames<Format> {
   static constexpr auto Shown = py::detail::const_name("Format | str");
-  static constexpr const char *Name = "Format",
-                              *Help = "How the samples of a pixel lie in memory, a byte each.";
+  static constexpr const char
+      *Name = "Format",
+      *Help = "The pixel format: the order of the samples of a pixel in memory, one byte each.";
   static const std::vector<std::pair<const char*, Format>> Members;
 };
 template <>
 struct EnumNames<Kernel> {
   static constexpr auto Shown = py::detail::const_name("Kernel | str");
   static constexpr const char *Name = "Kernel",
-                              *Help = "How samples are weighted when a picture is resampled.";
+                              *Help =
+                                  "The resampling kernel: how samples are weighted when a picture is scaled.";
   static const std::vector<std::pair<const char*, Kernel>> Members;
 };
 template <>
 struct EnumNames<DitherMatrix> {
   static constexpr auto Shown = py::detail::const_name("DitherMatrix | str");
-  static constexpr const char *Name = "DitherMatrix", *Help = "The pattern of thresholds of a dither.";
+  static constexpr const char *Name = "DitherMatrix", *Help = "The threshold matrix of dither_filter.";
   static const std::vector<std::pair<const char*, DitherMatrix>> Members;
 };
 template <>
 struct EnumNames<PictureForm> {
   static constexpr auto Shown = py::detail::const_name("PictureForm | str");
-  static constexpr const char *Name = "PictureForm", *Help = "How a picture of the host holds its pixels.";
+  static constexpr const char *Name = "PictureForm", *Help = "How a host picture stores its pixels.";
   static const std::vector<std::pair<const char*, PictureForm>> Members;
 };
 

@@ -170,7 +170,7 @@ std::optional<py::bytes> Save(const Handle& self, const std::optional<std::files
     }
     return info.Pixels != pixels;
   });
-  if (opaque) Warn("alpha is left out, since such a file has none");
+  if (opaque) Warn("alpha is dropped, since this file type has none");
   if (target) return {};
   return AsBytes(bytes);
 }
@@ -364,13 +364,13 @@ void AddFiles(py::module_& module, PictureClass& pictures) {
         const files::PictureSize size{picture.Width(), picture.Height(), picture.ImageFormat()};
         return Handle(files::MakePictures(StoresOf(self), {size})[0], self.From);
       },
-      "A picture of the same size and format, where this one's results live.");
+      "Return a picture of the same size and format, stored where results of this picture are.");
   module.def("_parse_bytes", files::ParseBytes);
   pictures.def_property_readonly(
       "info", InfoOf,
-      "What stood in the file beside the pixels, and goes into files that are saved: density (pixels per "
-      "inch across and "
-      "down), profile, exif, xmp, iptc; how many pages the file has; notes of what was changed in reading.");
+      "A dict with the metadata of the file, which is carried over to files that are saved: density (pixels "
+      "per inch, horizontally and vertically), profile, exif, xmp and iptc. pages is the number of images in "
+      "the file, if there are several; notes lists what was changed when it was read.");
   pictures.def_property_readonly("_file", [](const Handle& self) { return std::pair(self.File, self.Page); });
 }
 

@@ -11,40 +11,42 @@ using HostClass = py::class_<HostHandle>;
 
 void RequireSize(std::int32_t width, std::int32_t height) {
   if (width < 1 || height < 1 || width > 32767 || height > 32767)
-    throw std::invalid_argument("a picture of the host has 1 to 32767 rows and columns");
+    throw std::invalid_argument("a host picture has 1 to 32767 rows and columns");
 }
 
 void AddHostPicture(py::module_& module) {
-  HostClass pictures(
-      module, "HostPicture",
-      "A picture of the host: red, green and blue, 1 to 32767 pixels on a side, and maybe a mask, "
-      "which is another one of the same size.");
-  pictures.def(py::init([](std::int32_t width, std::int32_t height, std::optional<Named<PictureForm>> form) {
-                 RequireSize(width, height);
-                 return HostHandle(form ? HostPicture(width, height, *form) : HostPicture(width, height));
-               }),
-               arg("width"), arg("height"), arg("form") = py::none(),
-               "A white picture. ValueError for a side that isn't 1 to 32767, and an unknown form.");
+  HostClass pictures(module, "HostPicture",
+                     "A host picture: RGB, 1 to 32767 pixels on a side, with an optional mask, which is "
+                     "another host picture of the same size.");
+  pictures.def(
+      py::init([](std::int32_t width, std::int32_t height, std::optional<Named<PictureForm>> form) {
+        RequireSize(width, height);
+        return HostHandle(form ? HostPicture(width, height, *form) : HostPicture(width, height));
+      }),
+      arg("width"), arg("height"), arg("form") = py::none(),
+      "Make a white picture. Raises ValueError for a side outside 1 to 32767, and for an unknown form.");
   pictures.def_property_readonly(
-      "width", [](const HostHandle& self) { return self.Of.Width(); }, "Columns.");
+      "width", [](const HostHandle& self) { return self.Of.Width(); }, "Width in pixels.");
   pictures.def_property_readonly(
-      "height", [](const HostHandle& self) { return self.Of.Height(); }, "Rows.");
+      "height", [](const HostHandle& self) { return self.Of.Height(); }, "Height in pixels.");
   pictures.def_property_readonly(
-      "form", [](const HostHandle& self) { return self.Of.Form(); }, "How it holds its pixels.");
+      "form", [](const HostHandle& self) { return self.Of.Form(); }, "How the picture stores its pixels.");
   pictures.def(
       "pixel",
       [](const HostHandle& self, std::int32_t x, std::int32_t y) {
         const AtWork working({&self.At});
         return self.Of.Pixel(x, y);
       },
-      arg("x"), arg("y"), "Red, green and blue, 0 to 255. IndexError outside of the picture.");
+      arg("x"), arg("y"),
+      "Return red, green and blue of a pixel, 0 to 255. Raises IndexError outside the picture.");
   pictures.def(
       "set_pixel",
       [](const HostHandle& self, std::int32_t x, std::int32_t y, Color colour) {
         const AtWork working({&self.At});
         self.Of.SetPixel(x, y, colour);
       },
-      arg("x"), arg("y"), arg("colour"), "Store a colour. IndexError outside of the picture.");
+      arg("x"), arg("y"), arg("colour"),
+      "Store the colour of a pixel. Raises IndexError outside the picture.");
   pictures.def(
       "rgb",
       [](const HostHandle& self) {
@@ -55,7 +57,7 @@ void AddHostPicture(py::module_& module) {
         }
         return AsBytes(all);
       },
-      "All pixels, row by row, as red, green and blue: 3 x width x height bytes.");
+      "Return all pixels, row by row, as red, green and blue: 3 x width x height bytes.");
   pictures.def(
       "set_rgb",
       [](const HostHandle& self, const py::bytes& data) {
@@ -63,7 +65,8 @@ void AddHostPicture(py::module_& module) {
         const AtWork working({&self.At});
         self.Of.SetRGB({reinterpret_cast<const std::uint8_t*>(all.data()), all.size()});
       },
-      arg("data"), "Store all pixels, as rgb() gives them. ValueError for another number of bytes.");
+      arg("data"),
+      "Store all pixels, in the form that rgb() returns. Raises ValueError for another number of bytes.");
   pictures.def_property_readonly(
       "mask",
       [](const HostHandle& self) -> std::optional<HostHandle> {
@@ -79,7 +82,7 @@ void AddHostPicture(py::module_& module) {
         const AtWork working({&self.At});
         return HostHandle(self.Of.MakeMask(), self.At);
       },
-      "The mask, made white where there was none.");
+      "Return the mask; a white one is made if there is none.");
   pictures.def(
       "draw",
       [](const HostHandle& self, const HostHandle& source, const Rect& dest, const Rect& part) {
@@ -88,74 +91,85 @@ void AddHostPicture(py::module_& module) {
                      part.Height);
       },
       arg("source"), arg("dest"), arg("part"),
-      "Draw a block of a picture into a rectangle of this one, by the nearest pixel. What lies outside is "
-      "left out; a size below 1 draws nothing.");
+      "Draw a block of a host picture into a rectangle of this one, scaled to the nearest pixel. Both are "
+      "clipped to their pictures; a width or height below 1 draws nothing.");
 }
 
 void AddGWorld(py::module_& module) {
-  py::class_<GWorld>(module, "GWorld", "Pixels in QuickDraw's way, as copy_gworld makes them.")
-      .def_property_readonly("width", &GWorld::Width, "Columns.")
-      .def_property_readonly("height", &GWorld::Height, "Rows.")
-      .def_property_readonly("depth", &GWorld::Depth, "Bits of a pixel: 8, 24 or 32.")
-      .def_property_readonly("pixel_bytes", &GWorld::PixelBytes, "Bytes from pixel to pixel.")
+  py::class_<GWorld>(module, "GWorld", "An image in QuickDraw's form, as copy_gworld makes it.")
+      .def_property_readonly("width", &GWorld::Width, "Width in pixels.")
+      .def_property_readonly("height", &GWorld::Height, "Height in pixels.")
+      .def_property_readonly("depth", &GWorld::Depth,
+                             "Bits per pixel: 8 for gray, 24 for RGB, 32 for RGB with alpha.")
+      .def_property_readonly("pixel_bytes", &GWorld::PixelBytes, "Bytes per pixel.")
       .def(
           "row", [](const GWorld& self, std::int32_t y) { return AsBytes(self.Row(y)); }, arg("index"),
-          "The bytes of a row's pixels, width x pixel_bytes. IndexError outside of the GWorld.");
+          "Return the bytes of a row, width x pixel_bytes. Raises IndexError outside the GWorld.");
 }
 
 void AddCopies(PictureClass& pictures) {
+  // One help for both forms, with what is returned in each.
   const auto copy = [&](const char* name, HostPicture (Picture::*whole)() const,
-                        HostPicture (Picture::*part)(const Rect&) const, const char* help) {
-    pictures.def(name, Method(name, whole), help);
-    pictures.def(name, Method(name, part), arg("rect"), "Of a rectangle (x, y, width, height).");
+                        HostPicture (Picture::*part)(const Rect&) const, const std::string& what,
+                        const std::string& as) {
+    pictures.def(name, Method(name, whole), ("Return " + what + " as " + as).c_str());
+    pictures.def(name, Method(name, part), arg("rect"),
+                 ("Return " + what + " of a rectangle (x, y, width, height) as " + as).c_str());
   };
-  copy("copy_picture", &Picture::CopyPicture, &Picture::CopyPicture,
-       "A new picture of the host, inks mixed to light. Error for pixels without colours, where nothing of "
-       "the rectangle is left, and beyond 32767 pixels on a side.");
-  copy("copy_mask", &Picture::CopyMask, &Picture::CopyMask,
-       "Alpha as a gray picture of the host, white where it is 255. Error without alpha, and as "
-       "copy_picture.");
-  copy("copy_picture_with_mask", &Picture::CopyPictureWithMask, &Picture::CopyPictureWithMask,
-       "A new picture of the host, its mask made of alpha; none without alpha. Error as copy_picture.");
+  copy("copy_picture", &Picture::CopyPicture, &Picture::CopyPicture, "the colours",
+       "a new host picture. CMYK is converted to RGB. Raises Error for formats without a colour model "
+       "(Buffer, Scaling1 to Scaling8), for a rectangle outside the picture, and for a side of more than "
+       "32767 pixels.");
+  copy("copy_mask", &Picture::CopyMask, &Picture::CopyMask, "alpha",
+       "a new gray host picture, which is white where alpha is 255. Raises Error without alpha, and where "
+       "copy_picture does.");
+  copy("copy_picture_with_mask", &Picture::CopyPictureWithMask, &Picture::CopyPictureWithMask, "the colours",
+       "a new host picture, with alpha, if there is any, as its mask. Raises Error where copy_picture does.");
   pictures.def("copy_gworld", Method("copy_gworld", &Picture::CopyGWorld),
-               "A new GWorld of gray, RGB, or RGB with alpha. Error for other colours.");
+               "Return a new GWorld: 8 bits for gray, 24 for RGB, 32 for RGB with alpha. Raises Error for "
+               "CMYK and for formats without a colour model.");
 }
 
 using Source = const HostPicture&;
 
 void AddGrayDraws(PictureClass& pictures) {
-  const auto draw = [&](const char* name, void (Picture::*whole)(Source, const Rect&) const,
+  const auto draw = [&](const char* name, const std::string& colour,
+                        void (Picture::*whole)(Source, const Rect&) const,
                         void (Picture::*part)(Source, const Rect&, std::int32_t, std::int32_t) const) {
-    pictures.def(
-        name, Method(name, whole), arg("picture"), arg("dest"),
-        "One colour of a picture of the host into the gray samples of a rectangle (x, y, width, height). "
-        "Pictures without gray stay as they are.");
+    const std::string to =
+        " to the gray channel in a rectangle (x, y, width, height) of this picture, without scaling. "
+        "Pictures without a gray channel aren't changed.";
+    pictures.def(name, Method(name, whole), arg("picture"), arg("dest"),
+                 ("Copy " + colour + " of a host picture, from its top left corner on," + to).c_str());
     pictures.def(name, Method(name, part), arg("picture"), arg("dest"), arg("source_x"), arg("source_y"),
-                 "From a place in the source.");
+                 ("Copy " + colour + " of a host picture, from source_x, source_y on," + to).c_str());
   };
-  draw("draw_picture_red_to_gray_channel", &Picture::DrawPictureRedToGrayChannel,
+  draw("draw_picture_red_to_gray_channel", "red", &Picture::DrawPictureRedToGrayChannel,
        &Picture::DrawPictureRedToGrayChannel);
-  draw("draw_picture_green_to_gray_channel", &Picture::DrawPictureGreenToGrayChannel,
+  draw("draw_picture_green_to_gray_channel", "green", &Picture::DrawPictureGreenToGrayChannel,
        &Picture::DrawPictureGreenToGrayChannel);
-  draw("draw_picture_blue_to_gray_channel", &Picture::DrawPictureBlueToGrayChannel,
+  draw("draw_picture_blue_to_gray_channel", "blue", &Picture::DrawPictureBlueToGrayChannel,
        &Picture::DrawPictureBlueToGrayChannel);
 }
 
 /// The four forms of a row: all of it to the corner, to a place, to a rectangle, from a place to a rectangle;
-/// with what comes behind the places in each.
+/// with what comes behind the places in each. `how` ends the help of each.
 template <class... More, class... Extra>
-void AddDraws(PictureClass& pictures, const char* name, const char* help,
+void AddDraws(PictureClass& pictures, const char* name, const std::string& how,
               void (Picture::*whole)(Source, More...) const,
               void (Picture::*at)(Source, std::int32_t, std::int32_t, More...) const,
               void (Picture::*into)(Source, const Rect&, More...) const,
               void (Picture::*part)(Source, const Rect&, std::int32_t, std::int32_t, More...) const,
               const Extra&... extra) {
-  pictures.def(name, Method(name, whole), arg("picture"), extra..., help);
-  pictures.def(name, Method(name, at), arg("picture"), arg("x"), arg("y"), extra..., "To a place.");
+  const auto help = [&](const char* where) { return "Draw a host picture " + std::string(where) + how; };
+  pictures.def(name, Method(name, whole), arg("picture"), extra..., help("at the top left corner").c_str());
+  pictures.def(name, Method(name, at), arg("picture"), arg("x"), arg("y"), extra...,
+               help("with its top left corner at x, y").c_str());
   pictures.def(name, Method(name, into), arg("picture"), arg("dest"), extra...,
-               "Into a rectangle (x, y, width, height).");
-  pictures.def(name, Method(name, part), arg("picture"), arg("dest"), arg("source_x"), arg("source_y"),
-               extra..., "From a place in the source.");
+               help("into a rectangle (x, y, width, height)").c_str());
+  pictures.def(
+      name, Method(name, part), arg("picture"), arg("dest"), arg("source_x"), arg("source_y"), extra...,
+      help("into a rectangle (x, y, width, height), from source_x, source_y of the host picture on").c_str());
 }
 
 }
@@ -165,22 +179,22 @@ void AddHostPictures(py::module_& module, PictureClass& pictures) {
   AddGWorld(module);
   module.def(
       "make_pictures_as", [](Named<PictureForm> form) { Host::MakePicturesAs(form); }, arg("form"),
-      "The form of the host's pictures that are made from now on.");
+      "Set how host pictures that are made from now on store their pixels.");
   AddCopies(pictures);
   AddGrayDraws(pictures);
-  AddDraws<>(pictures, "draw_picture_rgb",
-             "Draw a picture of the host, without its mask, unscaled; alpha stays. Gray and inks stay as "
-             "they are.",
-             &Picture::DrawPictureRGB, &Picture::DrawPictureRGB, &Picture::DrawPictureRGB,
-             &Picture::DrawPictureRGB);
+  AddDraws<>(
+      pictures, "draw_picture_rgb",
+      ", without scaling and without its mask. Alpha isn't changed, and neither are gray and CMYK pictures.",
+      &Picture::DrawPictureRGB, &Picture::DrawPictureRGB, &Picture::DrawPictureRGB, &Picture::DrawPictureRGB);
   AddDraws<bool>(pictures, "draw_masked_picture_rgb",
-                 "Draw a picture of the host, unscaled; red of its mask becomes alpha, or 255 less it with "
-                 "invert_mask. No mask counts as white.",
+                 ", without scaling. Red of its mask becomes alpha, or 255 minus red with invert_mask; a "
+                 "missing mask counts as white. Gray and CMYK pictures aren't changed.",
                  &Picture::DrawMaskedPictureRGB, &Picture::DrawMaskedPictureRGB,
                  &Picture::DrawMaskedPictureRGB, &Picture::DrawMaskedPictureRGB, arg("invert_mask") = false);
   AddDraws<bool>(pictures, "draw_masked_picture_apply_mask_rgb",
-                 "Draw a picture of the host; its mask says how much of this picture stays: all where it is "
-                 "white, or none with invert_mask.",
+                 ", without scaling. Its mask says, channel by channel, how much of this picture is kept: "
+                 "everything where it is white, or nothing there with invert_mask; without a mask, nothing "
+                 "is kept. Alpha isn't changed, and neither are gray and CMYK pictures.",
                  &Picture::DrawMaskedPictureApplyMaskRGB, &Picture::DrawMaskedPictureApplyMaskRGB,
                  &Picture::DrawMaskedPictureApplyMaskRGB, &Picture::DrawMaskedPictureApplyMaskRGB,
                  arg("invert_mask") = false);

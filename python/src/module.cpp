@@ -8,7 +8,7 @@ namespace {
 
 void AddExceptions(py::module_& module) {
   static py::exception<Failed> error(module, "Error", PyExc_RuntimeError);
-  error.doc() = "What can't be done though its arguments are right.";
+  error.doc() = "An operation that can't be performed although its arguments are valid.";
   py::register_exception_translator([](std::exception_ptr pointer) {
     try {
       if (pointer) std::rethrow_exception(pointer);
@@ -50,20 +50,21 @@ PYBIND11_MODULE(_core, module) {
   AddExceptions(module);
   Host::Load();
   AddNames(module);
-  PictureClass pictures(module, "Picture", py::custom_type_setup(SetBuffer),
-                        "An image of 8-bit samples, in memory or in a mapped file, or a view of one. A "
-                        "rectangle is (x, y, width, height) in pixels, cut off at the edges; a negative "
-                        "width or height goes to the left or up. A `dest` is as large as the result at "
-                        "least, and has its channels; it is what comes back. Error is raised for what can't "
-                        "be done with these pictures or this memory, IndexError for a row or place outside, "
-                        "ValueError for a closed picture and a wrong value or name, TypeError for another "
-                        "type.");
+  PictureClass pictures(
+      module, "Picture", py::custom_type_setup(SetBuffer),
+      "An image of 8-bit samples, in memory or in a mapped file, or a view of one. A rectangle is (x, y, "
+      "width, height) in pixels and is clipped to the picture; a negative width or height extends to the "
+      "left or upwards. A `dest` must be at least as large as the result and have its channels; it is "
+      "returned. By default, a new picture is made. Channels that a filter doesn't support are left "
+      "unchanged in `dest`, and are 0 in a new picture. Raises Error for operations that these pictures or "
+      "the free memory don't allow, IndexError for a row or pixel outside the picture, ValueError for a "
+      "closed picture and for invalid values and names, TypeError for a wrong type.");
   AddHostPictures(module, pictures);
   AddPictures(module, pictures);
   AddSamples(pictures);
   AddOperations(pictures);
   AddFiles(module, pictures);
-  module.def("alive", Alive, "How many objects of each kind the module and the host have now.");
+  module.def("alive", Alive, "Return how many objects of each kind the module and the host currently hold.");
   module.def(
       "_declarations",
       [] {
@@ -72,7 +73,7 @@ PYBIND11_MODULE(_core, module) {
           rows.emplace_back(row.Declaration, row.Assignable);
         return rows;
       },
-      "The methods of the class as the module declares them, and whether they can be assigned to.");
+      "Return the methods of the class as the module declares them, and whether each can be assigned to.");
 }
 
 }

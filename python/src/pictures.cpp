@@ -22,8 +22,8 @@ void AddConstructors(PictureClass& pictures) {
                  return Handle(Picture(width, height, format));
                }),
                arg("width"), arg("height"), arg("format") = rgb,
-               "A picture in memory, all samples 0. ValueError for a size below 1 or an unknown format, "
-               "Error from 2 GiB on or without memory.");
+               "Make a picture in memory, all samples 0. Raises ValueError for a size below 1 or an unknown "
+               "format, Error for 2 GiB or more, or without enough memory.");
   pictures.def_static(
       "mapped",
       [](const std::filesystem::path& file, std::int32_t width, std::int32_t height, NamedFormat format,
@@ -33,9 +33,10 @@ void AddConstructors(PictureClass& pictures) {
         return Handle(Picture::Mapped(file, width, height, format, block));
       },
       arg("file"), arg("width"), arg("height"), arg("format") = rgb, arg("block_size") = 0,
-      "A picture in a temporary file, which is created or overwritten and goes away with the picture. About "
-      "block_size bytes of it, at least 16 MiB, are in the address space at a time. ValueError for less than "
-      "5 rows; Error for a file that can't be written, or that another picture is on, and without room.");
+      "Make a picture in a temporary file, which is created or overwritten, and deleted with the picture. "
+      "About block_size bytes of it, at least 16 MiB, are mapped into the address space at a time. Raises "
+      "ValueError for fewer than 5 rows; Error for a file that can't be written or that another picture "
+      "uses, or without enough disk space.");
   pictures.def_static(
       "from_host",
       [](const HostHandle& picture, bool useAlpha) {
@@ -43,8 +44,9 @@ void AddConstructors(PictureClass& pictures) {
         return Handle(Picture(picture.Of, useAlpha));
       },
       arg("picture"), arg("use_alpha") = false,
-      "A picture on the pixels of one of the host: what is written to one shows in the other. With use_alpha "
-      "the byte before the colours of 32 bits is alpha. Error but for GWorlds of 24 or 32 bits.");
+      "Make a picture that shares the pixels of a host picture: what is written to one shows in the other. "
+      "With use_alpha, the byte before the colours of a 32-bit pixel is alpha. Raises Error unless the "
+      "pixels are in a GWorld of 24 or 32 bits.");
   pictures.def_static(
       "create",
       [](std::int32_t width, std::int32_t height, NamedFormat format) {
@@ -53,8 +55,8 @@ void AddConstructors(PictureClass& pictures) {
         return Handle(Picture::Create(width, height, format));
       },
       arg("width"), arg("height"), arg("format") = rgb,
-      "A picture from the global factory, or in memory. ValueError for a size below 1, Error without "
-      "memory.");
+      "Make a picture through the global factory, or in memory. Raises ValueError for a size below 1, Error "
+      "without enough memory.");
   const auto byFormat = [](auto function) {
     return [function](std::int32_t width, std::int32_t height, NamedFormat format) {
       return function(width, height, format);
@@ -62,12 +64,12 @@ void AddConstructors(PictureClass& pictures) {
   };
   pictures.def_static("calculate_memory", byFormat(&Picture::CalculateMemory), arg("width"), arg("height"),
                       arg("format"),
-                      "Bytes that a picture in memory takes; 0 for a size below 1. From 2 GiB on there is "
-                      "none.");
+                      "Return the bytes that a picture in memory takes; 0 for a size below 1. Pictures of 2 "
+                      "GiB or more can't be made in memory.");
   pictures.def_static("can_allocate", byFormat(&Picture::CanAllocate), arg("width"), arg("height"),
                       arg("format"),
-                      "Whether there is memory for such a picture now. False for a size below 1, and from 4 "
-                      "GiB on.");
+                      "Return whether enough memory for such a picture is free now. False for a size below "
+                      "1, and for 4 GiB or more.");
   pictures.def(
       "create_picture",
       [](const Handle& self, std::int32_t width, std::int32_t height, NamedFormat format) {
@@ -76,18 +78,18 @@ void AddConstructors(PictureClass& pictures) {
         return Handle(Opened(self).CreatePicture(width, height, format), self.From);
       },
       arg("width"), arg("height"), arg("format"),
-      "A picture from this picture's factory, the global one, or in memory. ValueError for a size below 1, "
-      "Error without memory.");
+      "Make a picture through this picture's factory, else through the global one, else in memory. Raises "
+      "ValueError for a size below 1, Error without enough memory.");
   pictures.def("clone", Method("clone", &Picture::Clone),
-               "A copy in memory of a picture that is there too, else Error; copy() does with every "
-               "picture.");
+               "Return a copy in memory. Raises Error for a mapped picture; copy() copies any picture.");
   pictures.def(
       "close",
       [](const Handle& self) {
         const AtWork working({&self.At});
         if (!std::exchange(self.Own->Closed, true)) self.Of.Close();
       },
-      "End the picture. Views and arrays of it go on working; anything else raises ValueError from now on.");
+      "Close the picture. Its views and arrays stay valid; every other use of it raises ValueError from now "
+      "on.");
   pictures.def("__enter__", [](py::object self) { return self; });
   pictures.def("__exit__", [](const py::object& self, const py::args&) { self.attr("close")(); });
 }
@@ -100,22 +102,26 @@ void Property(PictureClass& pictures, const char* name, T (Picture::*get)() cons
 
 void AddProperties(PictureClass& pictures) {
   pictures.def_property_readonly(
-      "valid", [](const Handle& self) { return !self.Own->Closed; }, "False once it is closed.");
-  Property(pictures, "width", &Picture::Width, "Columns.");
-  Property(pictures, "height", &Picture::Height, "Rows.");
+      "valid", [](const Handle& self) { return !self.Own->Closed; }, "False once the picture is closed.");
+  Property(pictures, "width", &Picture::Width, "Width in pixels.");
+  Property(pictures, "height", &Picture::Height, "Height in pixels.");
   Property(pictures, "image_format", &Picture::ImageFormat, "The pixel format.");
   Property(pictures, "image_format_string", &Picture::ImageFormatString,
-           "Its name, empty where it has none; RGBA is called RBBA here.");
-  Property(pictures, "pixel_size", &Picture::PixelSize, "Bytes from pixel to pixel.");
-  Property(pictures, "row_size", &Picture::RowSize, "Bytes from row to row.");
-  Property(pictures, "row_offset", &Picture::RowOffset, "Rows of the store above those of a view.");
-  Property(pictures, "total_size", &Picture::TotalSize, "Bytes of all rows.");
+           "The class's own name of the pixel format, empty if it has none. For RGBA it is \"RBBA\", which "
+           "programs compare with; image_format.name is \"RGBA\".");
+  Property(pictures, "pixel_size", &Picture::PixelSize, "Bytes per pixel.");
+  Property(pictures, "row_size", &Picture::RowSize,
+           "The stride: bytes from the start of one row to the start of the next.");
+  Property(pictures, "row_offset", &Picture::RowOffset,
+           "For a view, the number of stored rows above its first row; otherwise 0.");
+  Property(pictures, "total_size", &Picture::TotalSize, "row_size times the number of stored rows.");
   Property(pictures, "channel_count", &Picture::ChannelCount,
-           "Channels, alpha included; 0 on a picture of the host.");
-  Property(pictures, "is_gray", &Picture::IsGray, "Whether its colours are gray.");
-  Property(pictures, "is_rgb", &Picture::IsRGB, "Whether its colours are red, green and blue.");
-  Property(pictures, "is_cmyk", &Picture::IsCMYK, "Whether its colours are cyan, magenta, yellow and black.");
-  Property(pictures, "is_mapping", &Picture::IsMapping, "Whether it lives in a file.");
+           "Number of channels, alpha included; 0 for a picture that shares the pixels of a host picture.");
+  Property(pictures, "is_gray", &Picture::IsGray, "Whether the format is gray, with or without alpha.");
+  Property(pictures, "is_rgb", &Picture::IsRGB,
+           "Whether the format has red, green and blue, with or without alpha.");
+  Property(pictures, "is_cmyk", &Picture::IsCMYK, "Whether the format is CMYK, with or without alpha.");
+  Property(pictures, "is_mapping", &Picture::IsMapping, "Whether the samples are in a mapped file.");
   const std::tuple<const char*, const char*, bool (Picture::*)() const, const char*,
                    std::int32_t (Picture::*)() const>
       planes[] = {{"red", "has_red", &Picture::HasRed, "red_offset", &Picture::RedOffset},
@@ -128,22 +134,24 @@ void AddProperties(PictureClass& pictures) {
                   {"yellow", "has_yellow", &Picture::HasYellow, "yellow_offset", &Picture::YellowOffset},
                   {"black", "has_black", &Picture::HasBlack, "black_offset", &Picture::BlackOffset}};
   for (const auto& [plane, has, hasGet, offset, offsetGet] : planes) {
-    Property(pictures, has, hasGet, (std::string("Whether it has ") + plane + " samples.").c_str());
+    Property(pictures, has, hasGet,
+             (std::string("Whether the picture has a ") + plane + " channel.").c_str());
     Property(pictures, offset, offsetGet,
              (std::string("Bytes from the start of a row to its first ") + plane + " sample.").c_str());
   }
   pictures.def_property(
       "yield_ticks", [](const Handle& self) { return Opened(self).YieldTicks(); },
       [](const Handle& self, std::int32_t ticks) { Opened(self).SetYieldTicks(ticks); },
-      "Least sixtieths of a second between two yields to the host; 0 or less is never.");
+      "The shortest time between two yields to the host, in sixtieths of a second; 0 or less means never.");
   pictures.def_property(
       "mapping_block_size", [](const Handle& self) { return Opened(self).MappingBlockSize(); },
       [](const Handle& self, std::int32_t bytes) {
         const AtWork working({&self.At});
         Opened(self).SetMappingBlockSize(bytes);
       },
-      "Bytes of the file that are in the address space at a time; what is set becomes 16 MiB at least, or "
-      "all of a smaller file, and whole pages. Means nothing for a picture in memory.");
+      "Bytes of the file that are mapped into the address space at a time. A value that is set is raised to "
+      "at least 16 MiB, rounded to whole pages, and limited to the file. Has no meaning for a picture in "
+      "memory.");
   pictures.def_property_readonly(
       "parent",
       [](const Handle& self) -> std::optional<Handle> {
@@ -153,7 +161,7 @@ void AddProperties(PictureClass& pictures) {
         Handle made(std::move(parent), self.From);
         return made.Own->Closed ? std::nullopt : std::optional(std::move(made));
       },
-      "The picture that this view was made from, while it isn't closed, or None.");
+      "The picture that this view was made from; None if it is closed, or if this isn't a view.");
   pictures.def_property_readonly(
       "target",
       [](const Handle& self) -> std::optional<HostHandle> {
@@ -162,11 +170,11 @@ void AddProperties(PictureClass& pictures) {
         if (!target) return {};
         return HostHandle(std::move(target), self.At);
       },
-      "The picture of the host that holds the samples, or None.");
+      "The host picture that holds the samples, or None.");
   pictures.def_property(
       "debug_picture_enabled", [](const Handle& self) { return Opened(self).DebugPictureEnabled(); },
       [](const Handle& self, bool enabled) { Opened(self).SetDebugPictureEnabled(enabled); },
-      "Whether debug_picture shows something.");
+      "Whether debug_picture returns a picture; False at first.");
   pictures.def_property_readonly(
       "debug_picture",
       [](const Handle& self) -> std::optional<HostHandle> {
@@ -175,7 +183,8 @@ void AddProperties(PictureClass& pictures) {
         if (!shown) return {};
         return HostHandle(std::move(shown));
       },
-      "The top left corner as a picture of the host, or None.");
+      "The top left corner, at most 512 x 512 pixels, as a host picture; None unless debug_picture_enabled "
+      "is set.");
   pictures.def("__repr__", [](const Handle& self) {
     if (self.Own->Closed) return std::string("<picturezor.Picture, closed>");
     std::string format;
@@ -190,21 +199,33 @@ void AddViews(PictureClass& pictures) {
   const auto view = [&](const char* name, Picture (Picture::*make)() const, const char* help) {
     pictures.def(name, Method(name, make), help);
   };
-  view("alpha_channel", &Picture::AlphaChannel, "A view of the alpha samples, as gray.");
-  view("red_channel", &Picture::RedChannel, "A view of the red samples, as gray.");
-  view("green_channel", &Picture::GreenChannel, "A view of the green samples, as gray.");
-  view("blue_channel", &Picture::BlueChannel, "A view of the blue samples, as gray.");
-  view("gray_channel", &Picture::GrayChannel, "A view of the gray samples.");
-  view("cyan_channel", &Picture::CyanChannel, "A view of the cyan samples, as gray.");
-  view("magenta_channel", &Picture::MagentaChannel, "A view of the magenta samples, as gray.");
-  view("yellow_channel", &Picture::YellowChannel, "A view of the yellow samples, as gray.");
-  view("black_channel", &Picture::BlackChannel, "A view of the black samples, as gray.");
-  view("rgb_channels", &Picture::RGBChannels, "A view of red, green and blue. Error for other colours.");
-  view("cmyk_channels", &Picture::CMYKChannels, "A view of the four inks. Error for other colours.");
-  view("mirrored_view", &Picture::MirroredView, "A view with top and bottom swapped.");
+  view("alpha_channel", &Picture::AlphaChannel,
+       "Return a view of the alpha channel, as a gray picture. Raises Error if there is none.");
+  view("red_channel", &Picture::RedChannel,
+       "Return a view of the red channel, as a gray picture. Raises Error if there is none.");
+  view("green_channel", &Picture::GreenChannel,
+       "Return a view of the green channel, as a gray picture. Raises Error if there is none.");
+  view("blue_channel", &Picture::BlueChannel,
+       "Return a view of the blue channel, as a gray picture. Raises Error if there is none.");
+  view("gray_channel", &Picture::GrayChannel,
+       "Return a view of the gray channel. Raises Error if there is none.");
+  view("cyan_channel", &Picture::CyanChannel,
+       "Return a view of the cyan channel, as a gray picture. Raises Error if there is none.");
+  view("magenta_channel", &Picture::MagentaChannel,
+       "Return a view of the magenta channel, as a gray picture. Raises Error if there is none.");
+  view("yellow_channel", &Picture::YellowChannel,
+       "Return a view of the yellow channel, as a gray picture. Raises Error if there is none.");
+  view("black_channel", &Picture::BlackChannel,
+       "Return a view of the black channel, as a gray picture. Raises Error if there is none.");
+  view("rgb_channels", &Picture::RGBChannels,
+       "Return a view of red, green and blue without alpha. Raises Error unless is_rgb is true.");
+  view(
+      "cmyk_channels", &Picture::CMYKChannels,
+      "Return a view of cyan, magenta, yellow and black without alpha. Raises Error unless is_cmyk is true.");
+  view("mirrored_view", &Picture::MirroredView, "Return a view with the rows in reverse order.");
   pictures.def("channel", Method("channel", &Picture::Channel), arg("index"),
-               "A view of the samples at a place in the pixel, from 0 on, fillers not counted, as gray. "
-               "IndexError outside of it.");
+               "Return a view of a channel by its position in the pixel, from 0, not counting filler bytes, "
+               "as a gray picture. Raises IndexError for a position that doesn't exist.");
   pictures.def(
       "_view",
       [](const Handle& self, const Rect& rect, bool upwards) {
@@ -218,19 +239,21 @@ void AddViews(PictureClass& pictures) {
           if (second < picture.RawRow(0).Start()) part.Y = height - rect.Y - rect.Height;
         }
         if (picture.ChannelCount() == 0 && rect.Width < picture.Width())
-          throw std::invalid_argument("a view of pixels without colours has all columns");
+          throw std::invalid_argument("a view of a format without a colour model has all columns");
         Picture view = picture.ClipImage(part);
         if (view && upwards) view = view.MirroredView();
         return Handle(std::move(view), self.From);
       },
-      "A view of a rectangle as the picture shows it, from its last row up if asked for.");
+      "Return a view of a rectangle of the picture as it is shown, with its rows in reverse order if "
+      "`upwards`.");
   pictures.def("clip_image", Method("clip_image", py::overload_cast<>(&Picture::ClipImage, py::const_)),
-               "A view of the whole.");
-  pictures.def(
-      "clip_image", Method("clip_image", py::overload_cast<const Rect&>(&Picture::ClipImage, py::const_)),
-      arg("rect"),
-      "A view of a rectangle (x, y, width, height), whose rows are counted as they are stored. Outside of "
-      "the picture it has no rows or columns, and nothing can be done with it.");
+               "Return a view of the whole picture.");
+  pictures.def("clip_image",
+               Method("clip_image", py::overload_cast<const Rect&>(&Picture::ClipImage, py::const_)),
+               arg("rect"),
+               "Return a view of a rectangle (x, y, width, height), whose y counts rows in the order in "
+               "which they are stored. A rectangle outside the picture gives a view without rows or columns, "
+               "which can't be used.");
 }
 
 PictureFactory FactoryOf(const py::object& function) {
@@ -244,11 +267,11 @@ PictureFactory FactoryOf(const py::object& function) {
 }
 
 void AddFactories(py::module_& module, PictureClass& pictures) {
-  py::class_<PictureFactory>(module, "Factory",
-                             "Makes the pictures that operations need: called with width, height and format, "
-                             "it gives a Picture of at least that size, or None to let the next way be "
-                             "tried. What it raises comes out of the call that asked; TypeError for anything "
-                             "else.")
+  py::class_<PictureFactory>(
+      module, "Factory",
+      "Makes the pictures that operations need, by a function that is called with width, height and format. "
+      "It returns a Picture of at least that size, or None to let the next factory or the default be used. "
+      "An exception that it raises is raised by the operation; any other result raises TypeError.")
       .def(py::init(&FactoryOf), arg("function"))
       .def("__eq__", [](const PictureFactory& self, const PictureFactory& other) { return self == other; });
   module.def(
@@ -259,8 +282,8 @@ void AddFactories(py::module_& module, PictureClass& pictures) {
         PictureFactory::SetFactory(factory.value_or(PictureFactory()));
       },
       arg("factory"),
-      "The factory that all pictures are asked from which have none of their own; None for none. Error while "
-      "other threads work on pictures.");
+      "Set the global factory, for all pictures that have none of their own; None removes it. Raises Error "
+      "while other threads work on pictures.");
   pictures.def_property(
       "factory",
       [](const Handle& self) -> std::optional<PictureFactory> {
@@ -272,7 +295,7 @@ void AddFactories(py::module_& module, PictureClass& pictures) {
         const AtWork working({&self.At});
         Opened(self).SetFactory(factory.value_or(PictureFactory()));
       },
-      "This picture's own factory, asked before the global one, or None.");
+      "This picture's own factory, which is asked before the global one, or None.");
 }
 
 }

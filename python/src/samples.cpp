@@ -81,7 +81,7 @@ Array View(const Handle& self) {
       for (std::int32_t y = 2; y < height; ++y)
         if (StartOfRow(view, y) != first + y * apart)
           throw std::invalid_argument(
-              "the rows of this picture of the host lie here and there; to_array() copies it");
+              "the rows of this host picture aren't evenly spaced; to_array() copies it");
     strides = {apart, layout.Step};
   }
   if (layout.Channels > 1) strides.push_back(1);
@@ -166,7 +166,8 @@ Handle FromArray(const py::array& array, const std::optional<Named<Format>>& for
                     channels = array.ndim() == 3 ? array.shape(2) : 1;
   constexpr Format usual[] = {Format::Unknown, Format::G,    Format::GA,
                               Format::RGB,     Format::RGBA, Format::CMYKA};
-  if (channels < 1 || (!format && channels > 5)) throw std::invalid_argument("an array has 1 to 5 channels");
+  if (channels < 1 || (!format && channels > 5))
+    throw std::invalid_argument("an array must have 1 to 5 channels");
   const Format of = format ? Format(*format) : usual[channels];
   if (BytesPerPixel(of) != channels)
     throw std::invalid_argument("the format has pixels of " + std::to_string(BytesPerPixel(of)) +
@@ -181,7 +182,7 @@ Handle FromArray(const py::array& array, const std::optional<Named<Format>>& for
                                                                       : array.strides(0);
   if (!packed || stride < rowBytes || stride > INT32_MAX)
     throw std::invalid_argument(
-        "the pixels of a row must lie side by side; numpy.ascontiguousarray(array) sees to it");
+        "the pixels of a row must be contiguous; numpy.ascontiguousarray(array) makes them so");
   auto* first = const_cast<std::uint8_t*>(static_cast<const std::uint8_t*>(array.data()));
   if (upwards) first -= (height - 1) * stride;
   // The last row's bytes up to the next one belong to the picture. Where they aren't the array's to give,
@@ -216,7 +217,7 @@ Array RawRow(const Handle& self, std::int32_t index) {
     const AtWork working({&self.At});
     if (Opened(self).IsMapping())
       throw std::invalid_argument(
-          "the window of a mapped picture moves on; row() copies, rows() gives a block of rows");
+          "the window of a mapped picture moves; row() copies a row, rows() gives a block of rows");
     RequireRows(self.Of, index, 1);
     view = self.Of.ClipImage();
     row = view ? view.RawRow(index) : MemoryBlock();
@@ -232,7 +233,7 @@ std::optional<Array> Memory(const Handle& self) {
   {
     const AtWork working({&self.At});
     if (Opened(self).IsMapping())
-      throw std::invalid_argument("the window of a mapped picture moves on; rows() gives a block of rows");
+      throw std::invalid_argument("the window of a mapped picture moves; rows() gives a block of rows");
     view = self.Of.ClipImage();
     memory = view ? view.Memory() : MemoryBlock();
     if (!memory) return {};
@@ -272,7 +273,7 @@ py::bytes Taken(const Handle& self, const char* name, Get&& get) {
     const AtWork working({&self.At});
     bytes = get(Opened(self));
   }
-  if (bytes.empty()) throw Failed(std::string(name) + ": there is no way to that format");
+  if (bytes.empty()) throw Failed(std::string(name) + ": it can't be converted to that format");
   return AsBytes(bytes);
 }
 
@@ -292,16 +293,16 @@ void AddRows(PictureClass& pictures) {
         return Taken(self, "row", [=](const Picture& picture) { return picture.Row(index); });
       },
       arg("index"),
-      "The row_size bytes of a stored row, a copy, filler and padding included. IndexError outside of the "
-      "picture.");
+      "Return a copy of a stored row: row_size bytes, filler and padding included. Raises IndexError for a "
+      "row outside the picture.");
   pictures.def(
       "set_row",
       [](const Handle& self, std::int32_t index, const py::buffer& row) {
         Stored(self, row, [=](const Picture& picture, Samples samples) { picture.SetRow(index, samples); });
       },
       arg("index"), arg("row"),
-      "Store the first row_size bytes as a row. IndexError outside of the picture, ValueError for too few "
-      "bytes.");
+      "Store the first row_size bytes as a row, filler and padding included. Raises IndexError for a row "
+      "outside the picture, ValueError for too few bytes.");
   pictures.def(
       "row_in_format",
       [](const Handle& self, std::int32_t index, NamedFormat format, std::optional<bool> invertAlpha) {
@@ -311,9 +312,10 @@ void AddRows(PictureClass& pictures) {
         });
       },
       arg("index"), arg("format"), arg("invert_alpha") = py::none(),
-      "A row as packed pixels of a format, a copy. Gray becomes all four inks; alpha that the picture lacks "
-      "is 0; with invert_alpha it is 255 less alpha. IndexError outside of the picture, Error where there is "
-      "no way to the format, as between RGB and CMYK.");
+      "Return a copy of a row as packed pixels of a format. Gray is copied to all four channels of CMYK. "
+      "Alpha is 0 if the picture has none; with invert_alpha, it is 255 minus the picture's alpha. Raises "
+      "IndexError for a row outside the picture, Error if the row can't be converted to the format, such as "
+      "between RGB and CMYK.");
   pictures.def(
       "set_row_in_format",
       [](const Handle& self, std::int32_t index, NamedFormat format, const py::buffer& row,
@@ -326,15 +328,16 @@ void AddRows(PictureClass& pictures) {
         });
       },
       arg("index"), arg("format"), arg("row"), arg("invert_alpha") = py::none(),
-      "Store a row of packed pixels of a format. IndexError outside of the picture, ValueError for too few "
-      "bytes, Error between RGB and CMYK. A format without colours stores nothing.");
+      "Store a row from packed pixels of a format; with invert_alpha, 255 minus their alpha is stored. "
+      "Raises IndexError for a row outside the picture, ValueError for too few bytes, Error between RGB and "
+      "CMYK. Formats without a colour model (Buffer, Scaling1 to Scaling8) store nothing.");
   pictures.def(
       "row_string_in_format",
       [](const Handle& self, std::int32_t index, NamedFormat format) {
         return Taken(self, "row_string_in_format",
                      [=](const Picture& picture) { return picture.RowStringInFormat(index, format); });
       },
-      arg("index"), arg("format"), "As row_in_format, through a string of the host.");
+      arg("index"), arg("format"), "Return a row as row_in_format does, through a string of the host.");
   pictures.def(
       "set_row_string_in_format",
       [](const Handle& self, std::int32_t index, NamedFormat format, const py::buffer& row) {
@@ -342,7 +345,8 @@ void AddRows(PictureClass& pictures) {
           picture.SetRowStringInFormat(index, format, samples);
         });
       },
-      arg("index"), arg("format"), arg("row"), "As set_row_in_format, through a string of the host.");
+      arg("index"), arg("format"), arg("row"),
+      "Store a row as set_row_in_format does, through a string of the host.");
   pictures.def(
       "data_string_in_format",
       [](const Handle& self, NamedFormat format) {
@@ -350,8 +354,8 @@ void AddRows(PictureClass& pictures) {
                      [=](const Picture& picture) { return picture.DataStringInFormat(format); });
       },
       arg("format"),
-      "All rows as packed pixels of a format, a copy below 2 GiB. Error for more, and where there is no way "
-      "to the format.");
+      "Return a copy of all rows as packed pixels of a format, less than 2 GiB. Raises Error for more, and "
+      "if the picture can't be converted to the format.");
   pictures.def(
       "set_data_string_in_format",
       [](const Handle& self, NamedFormat format, const py::buffer& data) {
@@ -360,8 +364,9 @@ void AddRows(PictureClass& pictures) {
         });
       },
       arg("format"), arg("data"),
-      "Store all rows from packed pixels of a format, below 2 GiB. ValueError for too few bytes, Error "
-      "between RGB and CMYK. A format without colours stores nothing.");
+      "Store all rows from packed pixels of a format, less than 2 GiB. Raises ValueError for too few bytes, "
+      "Error between RGB and CMYK. Formats without a colour model (Buffer, Scaling1 to Scaling8) store "
+      "nothing.");
 }
 
 }
@@ -375,26 +380,29 @@ void AddSamples(PictureClass& pictures) {
   AddRows(pictures);
   pictures.def_property_readonly(
       "__array_interface__", [](const Handle& self) { return View(self).attr("__array_interface__"); },
-      "How numpy finds the samples of a picture in memory; ValueError for a mapped one.");
+      "The array interface, by which numpy accesses the samples of a picture in memory. Raises ValueError "
+      "for a mapped picture.");
   pictures.def_static(
       "from_array", FromArray, arg("array"), arg("format") = py::none(),
-      "A picture on the memory of an array of uint8, rows x columns (x channels): what is written to one "
-      "shows in the other. The pixels of a row must lie side by side; rows may be apart, and upwards. "
-      "Without a format 1 to 5 channels are G, GA, RGB, RGBA and CMYKA. ValueError for other arrays, and for "
-      "read-only ones.");
+      "Make a picture that shares the memory of an array of uint8, rows x columns (x channels): what is "
+      "written to one shows in the other. The pixels of a row must be contiguous; rows may have any stride "
+      "that keeps them apart, and may run upwards. Without a format, 1 to 5 channels are taken as G, GA, "
+      "RGB, RGBA and CMYKA. Raises ValueError for other arrays, and for read-only ones.");
   pictures.def(
       "to_array", [](const Handle& self) { return ReadRows(self, 0, Opened(self).Height()); },
-      "A copy of the samples: rows x columns, and x channels where there is more than one, in the order of "
-      "the format's name.");
+      "Return a copy of the samples: rows x columns and, if there is more than one channel, x channels in "
+      "the order of the format's name.");
   pictures.def("_read_rows", ReadRows, arg("first"), arg("count"));
   pictures.def("_write_rows", WriteRows, arg("first"), arg("rows"));
   pictures.def("raw_row", RawRow, arg("index"),
-               "The stored row itself, filler and padding included, as an array on it. IndexError outside of "
-               "the picture, ValueError for a mapped one.");
+               "Return an array of bytes that shares the memory of a stored row, filler and padding "
+               "included. Raises IndexError for a row outside the picture, ValueError for a mapped picture.");
+  pictures.def_property_readonly("memory", Memory,
+                                 "All stored rows as an array of bytes that shares their memory, or None. "
+                                 "Raises ValueError for a mapped picture.");
   pictures.def_property_readonly(
-      "memory", Memory, "The store as an array on its bytes, or None. ValueError for a mapped picture.");
-  pictures.def_property_readonly("memory_target", MemoryTarget,
-                                 "The memory that the picture was made on, as an array, or None.");
+      "memory_target", MemoryTarget,
+      "The caller's memory that holds the samples, as an array of bytes, or None.");
 }
 
 }

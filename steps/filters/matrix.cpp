@@ -21,7 +21,9 @@ const Step Matrix{
                  .Default = "0"},
                 {.Name = "scale",
                  .Of = Kind::Number,
-                 .Help = "Factor that is applied after it; 1 divided by the sum of the weights by default",
+                 .Help =
+                     "Factor by which the sum with --delta is multiplied; by default 1 divided by the sum\n"
+                     "of the weights, or 1 if they add up to 0",
                  .Least = -1e6,
                  .Most = 1e6}},
     .Make = [](const Values& values, const Surroundings&) {

@@ -18,11 +18,17 @@ const Step Transfer{
     .Help = "Map samples through lookup tables",
     .Options = {{.Name = "table",
                  .Of = Kind::IntegersOrFile,
-                 .Help =
-                     "New values for the samples 0 to 255, in the option or in a file; missing ones are 0"},
-                {.Name = "red", .Of = Kind::IntegersOrFile, .Help = "The same, for red only"},
-                {.Name = "green", .Of = Kind::IntegersOrFile, .Help = "The same, for green only"},
-                {.Name = "blue", .Of = Kind::IntegersOrFile, .Help = "The same, for blue only"}},
+                 .Help = "Lookup table for all colour channels: new values for the samples 0 to 255, in the\n"
+                         "option or in a file; missing ones are 0. Excludes --red, --green and --blue"},
+                {.Name = "red",
+                 .Of = Kind::IntegersOrFile,
+                 .Help = "Lookup table for red, as for --table; needs --green and --blue too"},
+                {.Name = "green",
+                 .Of = Kind::IntegersOrFile,
+                 .Help = "Lookup table for green, as for --table; needs --red and --blue too"},
+                {.Name = "blue",
+                 .Of = Kind::IntegersOrFile,
+                 .Help = "Lookup table for blue, as for --table; needs --red and --green too"}},
     .Make = [](const Values& values, const Surroundings&) {
       const int channels = values.Has("red") + values.Has("green") + values.Has("blue");
       if (values.Has("table") == (channels > 0))

@@ -21,7 +21,7 @@ const Step Unsharp{
                  .Default = "1"},
                 {.Name = "threshold",
                  .Of = Kind::Integer,
-                 .Help = "Samples with a smaller difference aren't changed",
+                 .Help = "Samples that differ by less than this from the blurred copy aren't changed",
                  .Least = 0,
                  .Most = 256,
                  .Default = "0"}},

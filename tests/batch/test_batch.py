@@ -68,7 +68,7 @@ def test_bad_inputs_are_told_and_the_rest_is_made(batch):
     (["steps", "in/*", "-o", "in/{stem}.png"], 2, "it would be overwritten"),
     (["steps", "-o", "out/{stem}.png"], 3, "there are no inputs"),
     (["steps", "in", "-o", "out/{stem}.png"], 3, "a directory"),
-    (["steps", "nothing/*", "-o", "out/{stem}.png"], 3, "no file has such a name"),
+    (["steps", "nothing/*", "-o", "out/{stem}.png"], 3, "no file matches"),
     (["blur", "in/*", "-o", "out/{stem}.png"], 3, "there is no step blur"),
     (["scale --wide 3", "in/*", "-o", "out/{stem}.png"], 3, "recipe:1: step 1 (scale): it has no option --wide"),
     (["combine no.png --at 1,1", "in/*", "-o", "out/{stem}.png"], 2, "no.png: No such file"),

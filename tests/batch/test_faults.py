@@ -124,7 +124,7 @@ def test_without_its_scheduler_it_ends_and_goes_on_with_another(slow):
     slow.wait()
     first.scheduler.kill()
     code, out, error = finished(work)
-    assert code == 2 and "the scheduler has ended; the next run goes on" in error
+    assert code == 2 and "the scheduler has ended; the next run continues" in error
     assert slow.results().items() <= slow.expected.items()
     first.end()
     slow.let_go()

@@ -68,7 +68,7 @@ TEST_F(Formats, AskedForPixelFormats) {
   // White is no ink.
   Do({"convert", "gray.png", "--format", "cmyk", "-o", "ink.tif"});
   EXPECT_EQ(ReadTIFF(At("ink.tif")), (Raster{2, 1, 4, {0, 0, 0, 179, 0, 0, 0, 0}}));
-  EXPECT_THAT(Do({"convert", "ink.tif", "--format", "gray", "-o", "back.png"}), HasSubstr("black ink"));
+  EXPECT_THAT(Do({"convert", "ink.tif", "--format", "gray", "-o", "back.png"}), HasSubstr("black channel"));
   EXPECT_EQ(ReadPNG(At("back.png")), ReadPNG(At("gray.png")));
   Fail({"convert", "rgb.png", "--format", "cmyk", "-o", "x.tif"}, "rgb.png", "can't be converted to CMYK");
   WritePNG(At("alpha.png"), Noise(9, 9, 4));
@@ -128,7 +128,7 @@ TEST_F(Formats, SixteenBitsAreRoundedWithANote) {
     WriteTIFF(At("a.tif"), Raster{2, 1, 1, {10, 20}}, {.Bits = 16, .Shift = 200, .Mode = mode});
     EXPECT_EQ(Converted("a.tif"), (Raster{2, 1, 1, {11, 21}}));
   }
-  EXPECT_THAT(Do({"convert", "a.tif", "-o", "a.png"}), HasSubstr("16 bits a sample reduced to 8"));
+  EXPECT_THAT(Do({"convert", "a.tif", "-o", "a.png"}), HasSubstr("16 bits per sample reduced to 8"));
   EXPECT_THAT(Do({"convert", "a.tif", "-q", "-o", "a.png"}), IsEmpty());
 }
 
@@ -239,6 +239,27 @@ TEST_F(Formats, ProfileAndResolutionGoAlong) {
   WriteTIFF(At("ink.tif"), Waves(9, 9, 4), {.CMYK = true, .DensityPerInch = 150});
   Do({"convert", "ink.tif", "-o", "ink.jpg"});
   EXPECT_THAT(Run({"info", "ink.jpg"}).Out, HasSubstr("150 x 150"));
+}
+
+// Catches inks that are inverted, black points left alone, and an embedded profile that isn't used.
+TEST_F(Formats, CMYKBecomesTheColoursOfItsProfile) {
+  const Raster ink = Waves(60, 40, 4);
+  Raster inverted = ink;
+  for (auto& sample : inverted.Samples) sample = std::uint8_t(255 - sample);
+  const Bytes press = ReadBytes("/usr/share/color/icc/ghostscript/default_cmyk.icc");
+  WriteTIFF(At("ink.tif"), ink, {.CMYK = true, .Profile = press});
+  WriteJPEG(At("ink.jpg"), inverted, {.Quality = 100, .Profile = press});
+  for (const auto& [intent, flags] : {std::pair{"perceptual", "-t0"}, {"relative", "-t1 -b"}}) {
+    SCOPED_TRACE(intent);
+    const std::string other = std::string("tificc ") + flags + " '" + At("ink.tif").string() + "' '" +
+                              At("other.tif").string() + "' > /dev/null 2>&1";
+    ASSERT_EQ(std::system(other.c_str()), 0);
+    const Raster expected = ReadTIFF(At("other.tif"));
+    for (const auto& [in, off] : {std::pair{"ink.tif", 1}, {"ink.jpg", 6}}) {
+      Do({"convert", in, "--profile", "srgb", "--intent", intent, "-o", "out.png"});
+      EXPECT_LE(Difference(ReadPNG(At("out.png")), expected), off) << in;
+    }
+  }
 }
 
 TEST_F(Formats, ArePackedAsAskedFor) {

@@ -2,6 +2,7 @@
 
 #include "flow_test_support.h"
 #include "scale_passes.h"
+#include "written_steps.h"
 
 namespace picturezor::flow {
 namespace {
@@ -173,6 +174,27 @@ TEST(Run, NeedsADiskOnlyWhereAPictureHasToStandWhole) {
   for (const Chain& chain : {ChainOf(Invert(), Crop({1, 2, 800, 2900}), Blur(3)), ChainOf(Scale(30, 100))})
     EXPECT_FALSE(Result(file, chain, noDisk).empty());
   EXPECT_THROW(Result(file, ChainOf(Turn()), noDisk), files::Failure);
+}
+
+// Catches a row of steps that takes whole pictures where the single command doesn't.
+TEST(Run, WorksOnAStepOfARowAsOnOneAlone) {
+  const Shape shape{900, 700, Format::RGB, {}};
+  for (const char* const text :
+       {"scale --width 30 --draft", "crop --rect 1,2,3,4", "mirror --vertical", "rotate --angle 90",
+        "rotate --angle 7", "filter blur --radius 2", "filter dither", "filter auto-level"}) {
+    SCOPED_TRACE(text);
+    const auto written = steps::ParseSteps(text, "steps");
+    const Chain row = steps::MakeChain(written, {});
+    const auto alone = steps::MakeOperation(*written[0].Of, written[0].Texts, {});
+    EXPECT_EQ(row[0]->Turns(), alone->Turns());
+    EXPECT_EQ(row[0]->Parts(shape).size(), alone->Parts(shape).size());
+    EXPECT_EQ(row[0]->Cuts().has_value(), alone->Cuts().has_value());
+    EXPECT_EQ(row[0]->Drafted(shape).has_value(), alone->Drafted(shape).has_value());
+    EXPECT_EQ(row[0]->Pictures(), alone->Pictures());
+    const Dependence inRow = row[0]->DependsOn(shape), byItself = alone->DependsOn(shape);
+    EXPECT_EQ(inRow.Of, byItself.Of);
+    EXPECT_EQ(inRow.KeepsSource, byItself.KeepsSource);
+  }
 }
 
 // Catches a file that is decoded anew for each stripe of a scale: larger pictures are scaled in one.
