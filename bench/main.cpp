@@ -14,13 +14,13 @@
 #include "picturezor/host.h"
 #include "race.h"
 
-// Runs the races and prints a table a room: medians, and ours as a multiple of each other's.
+// Runs the races and prints a table a component: medians, and ours as a multiple of each other's.
 
 namespace picturezor::bench {
 namespace {
 
 struct Race {
-  std::string Room, Work;
+  std::string Component, Work;
   std::vector<std::string> Names;
   double Pixels;
 };
@@ -35,8 +35,8 @@ std::map<std::string, std::string>& Peers() {
   return peers;
 }
 
-std::string Key(const std::string& room, const std::string& work, const std::string& name) {
-  return room + "/" + work + "/" + name;
+std::string Key(const std::string& component, const std::string& work, const std::string& name) {
+  return component + "/" + work + "/" + name;
 }
 
 /// Keeps every timing, in milliseconds; the other reporter shows that it goes on.
@@ -100,25 +100,25 @@ std::string Processor() {
   return "an unknown processor";
 }
 
-void PrintRoom(const std::string& room, Collector& times) {
+void PrintComponent(const std::string& component, Collector& times) {
   std::vector<std::string> names;
   for (const Race& race : Races())
-    if (race.Room == room && times.Median(Key(room, race.Work, race.Names[0])) >= 0)
+    if (race.Component == component && times.Median(Key(component, race.Work, race.Names[0])) >= 0)
       for (const std::string& name : race.Names)
         if (std::ranges::find(names, name) == names.end()) names.push_back(name);
   if (names.empty()) return;
-  std::printf("\n### %s\n\n| | ns a pixel |", room.c_str());
+  std::printf("\n### %s\n\n| | ns a pixel |", component.c_str());
   for (const std::string& name : names) std::printf(" %s |", name.c_str());
   std::printf("\n|---|--:|");
   for (std::size_t i = 0; i < names.size(); ++i) std::printf("--:|");
   std::printf("\n");
   for (const Race& race : Races()) {
-    if (race.Room != room) continue;
-    const double ours = times.Median(Key(room, race.Work, race.Names[0]));
+    if (race.Component != component) continue;
+    const double ours = times.Median(Key(component, race.Work, race.Names[0]));
     if (ours < 0) continue;
     std::printf("| %s | %.3g |", race.Work.c_str(), ours * 1e6 / race.Pixels);
     for (const std::string& name : names) {
-      const double time = times.Median(Key(room, race.Work, name));
+      const double time = times.Median(Key(component, race.Work, name));
       if (time < 0)
         std::printf(" |");
       else if (name == race.Names[0])
@@ -139,20 +139,21 @@ void PrintTables(Collector& times) {
   std::printf(
       "\n\nMilliseconds, medians; in parentheses PictureZOR's time divided by the other's. A pixel is one of "
       "the result.\n");
-  std::vector<std::string> rooms;
+  std::vector<std::string> components;
   for (const Race& race : Races())
-    if (std::ranges::find(rooms, race.Room) == rooms.end()) rooms.push_back(race.Room);
-  std::ranges::sort(rooms);
-  for (const std::string& room : rooms) PrintRoom(room, times);
+    if (std::ranges::find(components, race.Component) == components.end())
+      components.push_back(race.Component);
+  std::ranges::sort(components);
+  for (const std::string& component : components) PrintComponent(component, times);
 }
 
 }
 
 int InstructionSets() { return instructionSets; }
 
-bool AddRace(const std::string& room, const std::string& work, std::vector<Contender> contenders,
+bool AddRace(const std::string& component, const std::string& work, std::vector<Contender> contenders,
              double pixels) {
-  Race race{room, work, {}, pixels};
+  Race race{component, work, {}, pixels};
   for (Contender& contender : contenders) {
     race.Names.push_back(contender.Name);
     const auto run = [prepare = std::move(contender.Prepare)](benchmark::State& state) {
@@ -160,7 +161,7 @@ bool AddRace(const std::string& room, const std::string& work, std::vector<Conte
       work();
       for ([[maybe_unused]] auto _ : state) work();
     };
-    benchmark::RegisterBenchmark(Key(room, work, contender.Name).c_str(), run)
+    benchmark::RegisterBenchmark(Key(component, work, contender.Name).c_str(), run)
         ->Unit(benchmark::kMillisecond)
         ->UseRealTime();
   }

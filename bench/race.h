@@ -19,7 +19,7 @@ struct Contender {
 /// Lets contenders do one piece of work side by side. The first is ours; a copy of the same bytes by `memcpy`
 /// is a contender like the others. To be called before `main`: `const auto registered = AddRace(...)`.
 /// `pixels` is how many the work makes.
-bool AddRace(const std::string& room, const std::string& work, std::vector<Contender> contenders,
+bool AddRace(const std::string& component, const std::string& work, std::vector<Contender> contenders,
              double pixels = double(Width) * Height);
 
 /// Tells which version of a peer is in the race.

@@ -8,7 +8,7 @@ namespace zor {
 
 constexpr Word NoFlags = 0, PlainFlags = 4, PictureFlags = 0x40000;
 
-/// A method row as its room declares it: its place in the table of the class, and how to write it there.
+/// A method row as its component declares it: its place in the table of the class, and how to write it there.
 struct MethodRow {
   int Number;
   void (*Write)(MethodRecord&);
@@ -51,12 +51,12 @@ constexpr MethodRow SharedMethod{
 
 void ARowNumberIsUsedTwice();  // never defined: a call of it stops the compiler
 
-/// The rows of all rooms in the order of the table. A number used twice doesn't compile.
+/// The rows of all components in the order of the table. A number used twice doesn't compile.
 template <std::size_t... Counts>
-consteval auto InTableOrder(const MethodRow (&... rooms)[Counts]) {
+consteval auto InTableOrder(const MethodRow (&... components)[Counts]) {
   std::array<MethodRow, (Counts + ...)> table{};
   auto end = table.begin();
-  ((end = std::copy_n(rooms, Counts, end)), ...);
+  ((end = std::copy_n(components, Counts, end)), ...);
   std::ranges::sort(table, {}, &MethodRow::Number);
   auto sameNumber = [](const MethodRow& a, const MethodRow& b) { return a.Number == b.Number; };
   if (std::ranges::adjacent_find(table, sameNumber) != table.end()) ARowNumberIsUsedTwice();
