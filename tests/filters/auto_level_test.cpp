@@ -1,6 +1,6 @@
 #include <array>
 
-#include "support/point_filter.h"
+#include "support/filter_models.h"
 
 namespace picturezor {
 namespace {
@@ -60,7 +60,7 @@ TEST(AutoLevel, StretchesTheRectangle) {
                                    return {};
                                  return levels[v];
                                }},
-                              picture, picture, before);
+                              picture, picture);
         }
         EXPECT_EQ(asked ? picture.AutoLevel(*asked) : picture.AutoLevel(), picture.IsRGB());
         EXPECT_EQ(StoredRows(picture), wanted);

@@ -2,7 +2,7 @@
 
 #include <cmath>
 
-#include "support/area_filter.h"
+#include "support/filter_models.h"
 
 namespace picturezor {
 namespace {
@@ -64,12 +64,6 @@ TEST(BoxBlurFractionalFilter, KeepsAnEvenPictureWhereTheWeightsAreExact) {
     lower = lower || Packed(picture.BoxBlurFractionalFilter({}, 0.6))[0] < value;
   }
   EXPECT_TRUE(lower);
-}
-
-TEST(BoxBlurFractionalFilter, HasNothingForRawPixels) {
-  const Picture picture(3, 3, Format::Buffer);
-  EXPECT_FALSE(picture.BoxBlurFractionalFilter({}, 0.5));
-  EXPECT_FALSE(picture.BoxBlurFractionalFilter(Picture(3, 3, Format::Buffer), 0.5));
 }
 
 }
