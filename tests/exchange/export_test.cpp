@@ -129,8 +129,7 @@ TEST(Export, DrawsAlphaIntoTheMask) {
       InHost(form, [&] {
         SCOPED_TRACE(testing::Message() << int(form) << " drawing " << draws);
         Host::Hide("DrawPicture", !draws);
-        const Picture picture(9, 7, Format::GA);
-        FillWithNoise(picture, 5);
+        const Picture picture = NoisePicture(9, 7, Format::GA, 5);
         const HostPicture result = picture.CopyPictureWithMask();
         EXPECT_EQ(result.RGB(), picture.CopyPicture().RGB());
         ASSERT_TRUE(result.Mask());

@@ -240,8 +240,7 @@ TEST(Import, FillsInArgumentsThatAreLeftOut) {
     for (const auto& one : cases)
       for (const Format format : {Format::RGBA, Format::G}) {
         SCOPED_TRACE(testing::Message() << "case " << &one - cases << ", format " << int(format));
-        const Picture image(5, 4, format);
-        FillWithNoise(image, 9);
+        const Picture image = NoisePicture(5, 4, format, 9);
         const Samples expected = Expected(image, picture, picture.Mask(), {one.Dest, 0, 0}, one.By);
         one.Call(image);
         EXPECT_EQ(Packed(image), expected);

@@ -63,8 +63,7 @@ TEST(OilFilter, LeavesAnEvenPictureAlone) {
 
 // More samples in a neighbourhood than 16 bits count.
 TEST(OilFilter, TakesWideRanges) {
-  const Picture picture(300, 290, Format::G);
-  FillWithNoise(picture, 61);
+  const Picture picture = NoisePicture(300, 290, Format::G, 61);
   for (const int range : {127, 128}) {
     std::vector<int> counts(64), sums(64);
     const Samples pixels = Packed(picture);

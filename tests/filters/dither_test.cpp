@@ -80,8 +80,7 @@ TEST(DitherFilter, PicksTheLevelByThePlace) {
       if (matrix == DitherMatrix::Ordered6x6 && levels == 5) ExpectPointFilter(filter);
       for (const Format format : {Format::G, Format::GA, Format::RGB, Format::BGRX, Format::ARGB})
         ForEveryTarget([&] {
-          const Picture picture(150, 17, format);
-          FillWithNoise(picture, 91);
+          const Picture picture = NoisePicture(150, 17, format, 91);
           const Picture blank(150, 17, format);
           ASSERT_EQ(StoredRows(picture.DitherFilter({}, matrix, levels)), WantedRows(filter, picture, blank));
         });
@@ -90,8 +89,7 @@ TEST(DitherFilter, PicksTheLevelByThePlace) {
 }
 
 TEST(DitherFilter, TakesAnyNumbers) {
-  const Picture picture(20, 20, Format::RGB);
-  FillWithNoise(picture, 92);
+  const Picture picture = NoisePicture(20, 20, Format::RGB, 92);
   const auto dithered = [&](int levels) {
     return Packed(picture.DitherFilter({}, DitherMatrix::Cluster8, levels));
   };

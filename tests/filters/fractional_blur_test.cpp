@@ -46,8 +46,7 @@ TEST(BoxBlurFractionalFilter, WorksOutByHand) {
 }
 
 TEST(BoxBlurFractionalFilter, TakesNothingButTheFraction) {
-  const Picture picture(40, 5, Format::BGRA);
-  FillWithNoise(picture, 53);
+  const Picture picture = NoisePicture(40, 5, Format::BGRA, 53);
   const Planar source = PlanesIn(picture, 40, 5);
   const double infinity = std::numeric_limits<double>::infinity();
   for (const double radius : {0.0, 3.0, -2.0, 1e300, infinity, -infinity, std::nan("")})

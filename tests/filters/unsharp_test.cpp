@@ -46,20 +46,15 @@ TEST(UnsharpFilter, PushesEveryPair) {
 TEST(UnsharpFilter, WorksOnEveryPlaneOfEveryStore) {
   for (const Format format : EveryFormat())
     ForEveryTarget([&] {
-      const Picture blurred(37, 7, format);
-      FillWithNoise(blurred, 80);
+      const Picture blurred = NoisePicture(37, 7, format, 80);
       const std::vector<Samples> others = StoredRows(blurred);
-      const std::vector<PlacedPlane> from = PlanesOf(blurred);
+      const Planar from = PlanesIn(blurred, 37, 7);
       ForEveryStore(37, 7, format, [&](const Picture& picture) {
         SetPacked(picture, Noise(81).Many(std::size_t(37 * 7 * picture.PixelSize())));
-        std::vector<Samples> wanted = StoredRows(picture);
-        const std::vector<PlacedPlane> planes = PlanesOf(picture);
-        for (std::size_t y = 0; y < 7; ++y)
-          for (int x = 0; x < 37; ++x)
-            for (std::size_t c = 0; c < planes.size(); ++c) {
-              auto& sample = wanted[y][std::size_t(x * picture.PixelSize() + planes[c].Offset)];
-              sample = Cell(sample, others[y][std::size_t(x * blurred.PixelSize() + from[c].Offset)], 0.3, 4);
-            }
+        Planar planes = PlanesIn(picture, 37, 7);
+        for (std::size_t i = 0; i < planes.Of.size(); ++i)
+          planes.Of[i] = Cell(planes.Of[i], from.Of[i], 0.3, 4);
+        const std::vector<Samples> wanted = With(StoredRows(picture), picture, planes);
         ASSERT_TRUE(picture.UnsharpFilter(blurred, 0.3, 4));
         ASSERT_EQ(StoredRows(picture), wanted) << int(format);
         ASSERT_EQ(StoredRows(blurred), others);
@@ -91,8 +86,7 @@ TEST(UnsharpFilter, ReadsWhatItHasWritten) {
 }
 
 TEST(UnsharpFilter, RefusesOtherPictures) {
-  const Picture picture(5, 4, Format::RGB);
-  FillWithNoise(picture, 3);
+  const Picture picture = NoisePicture(5, 4, Format::RGB, 3);
   const std::vector<Samples> before = StoredRows(picture);
   Picture closed(5, 4, Format::RGB);
   closed.Close();

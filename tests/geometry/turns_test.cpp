@@ -159,20 +159,17 @@ TEST(Turns, EndAsTheSlowForms) {
     for (const ImageSize& size : sizes)
       for (const int left : {0, 3}) {
         SCOPED_TRACE(testing::Message() << size.Width << " x " << size.Height << " at " << left);
-        const Picture source(size.Width + 5, size.Height, format);
-        FillWithNoise(source, 59);
+        const Picture source = NoisePicture(size.Width + 5, size.Height, format, 59);
         agree(source.ClipImage({left, 0, size.Width, size.Height}), size, left);
       }
-    const Picture source(large[i].Width, large[i].Height, format);
-    FillWithNoise(source, 60);
+    const Picture source = NoisePicture(large[i].Width, large[i].Height, format, 60);
     agree(source, large[i], 7);
   }
 }
 
 // Rows of a caller's block that overlap hold what was written last.
 TEST(Turns, WriteOverlappingRowsInTheSlowOrder) {
-  const Picture source(70, 90, Format::RGB);
-  FillWithNoise(source, 61);
+  const Picture source = NoisePicture(70, 90, Format::RGB, 61);
   const std::pair<Picture (Picture::*)(const Picture&) const, Picture (Picture::*)(const Picture&) const>
       pairs[] = {{&Picture::Rotate90, &Picture::Rotate90slow},
                  {&Picture::Rotate270, &Picture::Rotate270slow}};

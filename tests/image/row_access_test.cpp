@@ -57,8 +57,7 @@ void ConvertEveryPair(int width, Noise& noise) {
   for (const Format own : EveryFormat())
     for (const Format other : EveryFormat()) {
       SCOPED_TRACE(std::to_string(int(own)) + " and " + std::to_string(int(other)));
-      const Picture picture(width, Height, own);
-      FillWithNoise(picture, unsigned(noise.Byte()));
+      const Picture picture = NoisePicture(width, Height, own, unsigned(noise.Byte()));
       const Samples before = Packed(picture);
       const Samples zeros(std::size_t(width * Height * BytesPerPixel(other)), 0);
       const Samples given = noise.Many(zeros.size());
@@ -125,8 +124,7 @@ TEST(RowAccess, GivesGrayByWeightsThatKeepWhite) {
 }
 
 TEST(RowAccess, HandsOutStoredRows) {
-  const Picture picture(5, 3, Format::RGBX);
-  FillWithNoise(picture, 8);
+  const Picture picture = NoisePicture(5, 3, Format::RGBX, 8);
   const Samples row = picture.Row(1);
   EXPECT_EQ(row.size(), 64u);
   const MemoryBlock raw = picture.RawRow(1);

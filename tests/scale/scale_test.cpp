@@ -159,12 +159,6 @@ void ExpectScaled(const Picture& dest, const Picture& source, Kernel kernel,
         << "plane " << c;
 }
 
-Picture NoisePicture(int width, int height, Format format, unsigned seed) {
-  Picture picture(width, height, format);
-  FillWithNoise(picture, seed);
-  return picture;
-}
-
 // One row each, worked out by hand from the kernels' formulas.
 TEST(Scale, GivesTheWorkedRows) {
   const struct {

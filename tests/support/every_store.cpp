@@ -111,6 +111,12 @@ void FillWithNoise(const Picture& picture, unsigned seed) {
   for (int y = 0; y < picture.Height(); ++y) picture.SetRow(y, noise.Many(std::size_t(picture.RowSize())));
 }
 
+Picture NoisePicture(int width, int height, Format format, unsigned seed) {
+  const Picture picture(width, height, format);
+  FillWithNoise(picture, seed);
+  return picture;
+}
+
 Samples Packed(const Picture& picture) {
   Samples pixels;
   for (int y = 0; y < picture.Height(); ++y) {

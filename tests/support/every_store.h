@@ -98,6 +98,7 @@ void SetStoredRows(const Picture& picture, const std::vector<Samples>& rows);
 
 /// Fills every byte of a picture's rows, filler and padding included.
 void FillWithNoise(const Picture& picture, unsigned seed);
+Picture NoisePicture(int width, int height, Format format, unsigned seed);
 
 /// The packed pixels of the whole picture as they are stored, filler included.
 Samples Packed(const Picture& picture);

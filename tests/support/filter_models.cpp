@@ -20,17 +20,6 @@ Format OtherOrder(Format format) {
   }
 }
 
-/// The stored rows with the planes written into the top left of the picture.
-std::vector<Samples> With(std::vector<Samples> rows, const Picture& picture, const Planar& planes) {
-  const std::vector<PlacedPlane> places = PlanesOf(picture);
-  for (int c = 0; c < planes.Count; ++c)
-    for (int y = 0; y < planes.Height; ++y)
-      for (int x = 0; x < planes.Width; ++x)
-        rows[std::size_t(y)][std::size_t(places[std::size_t(c)].Offset + x * picture.PixelSize())] =
-            planes(c, x, y);
-  return rows;
-}
-
 bool Served(const AreaFilter& filter, Format format) {
   const Picture picture(1, 1, format);
   return !PlanesOf(picture).empty() && (filter.ServesCMYK || !picture.IsCMYK());
@@ -113,6 +102,16 @@ Planar PlanesIn(const Picture& picture, int width, int height) {
         planes(c, x, y) = row[std::size_t(places[std::size_t(c)].Offset + x * picture.PixelSize())];
   }
   return planes;
+}
+
+std::vector<Samples> With(std::vector<Samples> rows, const Picture& picture, const Planar& planes) {
+  const std::vector<PlacedPlane> places = PlanesOf(picture);
+  for (int c = 0; c < planes.Count; ++c)
+    for (int y = 0; y < planes.Height; ++y)
+      for (int x = 0; x < planes.Width; ++x)
+        rows[std::size_t(y)][std::size_t(places[std::size_t(c)].Offset + x * picture.PixelSize())] =
+            planes(c, x, y);
+  return rows;
 }
 
 void ExpectLikeModel(const AreaFilter& filter, std::initializer_list<std::pair<int, int>> sizes) {

@@ -62,6 +62,9 @@ struct PointFilter {
   bool ServesCMYK = false;
 };
 
+/// Stored rows of a picture with these planes in its top left.
+std::vector<Samples> With(std::vector<Samples> rows, const Picture& picture, const Planar& planes);
+
 /// The rows that the destination must hold: its own but for the samples that the filter writes.
 std::vector<Samples> WantedRows(const PointFilter& filter, const Picture& source, const Picture& dest);
 
