@@ -15,6 +15,18 @@
 
 namespace picturezor::tests {
 
+Arguments operator+(Arguments first, const Arguments& more) {
+  first.insert(first.end(), more.begin(), more.end());
+  return first;
+}
+
+Arguments Words(const std::string& line) {
+  Arguments words;
+  std::istringstream stream(line);
+  for (std::string word; stream >> word;) words.push_back(word == "''" ? "" : word);
+  return words;
+}
+
 Raster Noise(int width, int height, int channels) {
   std::mt19937 random(std::uint32_t(width * 31 + height * 7 + channels));
   Raster raster{width, height, channels, Bytes(std::size_t(width * height * channels))};

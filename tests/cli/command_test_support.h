@@ -13,6 +13,10 @@ namespace picturezor::tests {
 using Bytes = std::vector<std::uint8_t>;
 using Arguments = std::vector<std::string>;
 
+Arguments operator+(Arguments first, const Arguments& more);
+/// The words of a command line; '' is an empty one.
+Arguments Words(const std::string& line);
+
 /// Pixels as they stand in a file: 1 to 4 samples a pixel, or ink for 4 in CMYK.
 struct Raster {
   int Width = 0, Height = 0, Channels = 0;

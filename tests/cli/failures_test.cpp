@@ -92,40 +92,55 @@ TEST_F(Failures, BadInput) {
 }
 
 TEST_F(Failures, WrongCommandLines) {
-  WritePNG(At("a.png"), Noise(8, 8, 3));
-  const Arguments cases[] = {
-      {},
-      {"paint"},
-      {"convert", "a.png"},
-      {"convert", "a.png", "-o", "b.gif"},
-      {"convert", "a.png", "-o", "b.png", "--format", "hsv"},
-      {"convert", "a.png", "-o", "b.png", "--store", "tape"},
-      {"convert", "a.png", "-o", "b.png", "--memory-limit", "much"},
-      {"convert", "a.png", "-o", "b.png", "--memory-limit", "-1M"},
-      {"convert", "a.png", "-o", "b.jpg", "--quality", "101"},
-      {"convert", "a.png", "-o", "b.png", "--frobnicate"},
-      {"scale", "a.png", "-o", "b.png"},
-      {"scale", "a.png", "-o", "b.png", "--width", "0"},
-      {"scale", "a.png", "-o", "b.png", "--width", "-5"},
-      {"scale", "a.png", "-o", "b.png", "--width", "99999999999999999999"},
-      {"scale", "a.png", "-o", "b.png", "--width", "ten"},
-      {"scale", "a.png", "-o", "b.png", "--width", "4", "--kernel", "sharp"},
-      {"scale", "a.png", "-o", "b.png", "--width", "4", "--fit", "4x4"},
-      {"scale", "a.png", "-o", "b.png", "--width", "4", "--threads", "33"},
-      {"scale", "a.png", "-o", "b.png", "--width", "4", "--fast", "--kernel", "box"},
-      {"scale", "a.png", "-o", "b.png", "--fit", "4x"},
-      {"scale", "a.png", "-o", "b.png", "--fit", "0x4"},
-      {"scale", "a.png", "-o", "b.png", "--percent", "0"},
-      {"scale", "a.png", "-o", "b.png", "--percent", "nan"},
-      {"scale", "a.png", "-o", "b.png", "--percent", "1e300"},
+  const struct {
+    const char* Command;
+    std::vector<const char*> Wrong;
+  } cases[] = {
+      {"convert",
+       {"--format hsv", "--store tape", "--memory-limit much", "--memory-limit -1M", "--quality 101",
+        "--frobnicate", "--compression lzw", "--compression 10"}},
+      {"scale",
+       {"", "--width 0", "--width -5", "--width 99999999999999999999", "--width ten",
+        "--width 4 --kernel sharp", "--width 4 --fit 4x4", "--width 4 --threads 33",
+        "--width 4 --fast --kernel box", "--fit 4x", "--fit 0x4", "--percent 0", "--percent nan",
+        "--percent 1e300"}},
+      {"crop", {"--rect 0,0,0,5", "--rect 0,0,5,-5", "--rect 1,2,3", "--rect 1,2,3,4,5", "--rect a,b,c,d"}},
+      {"mirror", {""}},
+      {"rotate", {"", "--angle nan", "--angle inf", "--angle 12x", "--angle 12 --background red"}},
+      {"combine a.png", {"--fore 12345", "--at 1", "--at a,b", "--fore 000000 --mask a.png"}},
+      {"filter gamma", {"", "--gamma nan", "--gamma 0", "--gamma 1,2"}},
+      {"filter transfer", {"", "--red 1", "--table 1,x", "--table 4294967296"}},
+      {"filter",
+       {"sharpen-it", "gain --gain inf", "matrix --weights 1,2", "matrix --weights ''", "blur --radius 0",
+        "blur --only-horizontal --only-vertical", "dither --levels 1", "dither --pattern stripes",
+        "stamp --black red", "invert --radius 2"}},
+      {"thumbnail",
+       {"", "--size 0", "--size 5 --name {side}.png", "--size 5 --name {stem}",
+        "--size 5 --name {stem}.gif"}},
+      {"channels", {""}},
+      {"tiles",
+       {"--format tif", "--layout iiif --overlap 1", "--tile 4", "--kernel gauss", "--part 1/2", "--part 2/1",
+        "--part 1/1x", "--part 1/1 --join 1", "--part 1/1 --resume", "--part 1/1 --use-levels",
+        "--part 1/1 --kernel cubic"}},
   };
-  for (const Arguments& arguments : cases) {
-    SCOPED_TRACE(testing::PrintToString(arguments));
-    const Outcome outcome = Run(arguments);
+  std::vector<std::string> lines;
+  for (const char* line :
+       {"", "paint", "filter", "convert a.png", "show a.png --width 0", "convert a.png -o b.gif",
+        "convert a.png -o b.jpg --tile 64", "convert a.png -o b.jpg --pyramid",
+        "convert a.png -o b.tif --tile 20", "tiles a.png --resume -o p.zip"})
+    lines.push_back(line);
+  for (const auto& [command, wrong] : cases)
+    for (const std::string options : wrong) lines.push_back(command + (" " + options) + " a.png -o b.png");
+  WritePNG(At("a.png"), Noise(8, 8, 3));
+  for (const std::string& line : lines) {
+    SCOPED_TRACE(line);
+    const Outcome outcome = Run(Words(line));
     EXPECT_EQ(outcome.Code, 3);
     EXPECT_THAT(outcome.Error, testing::MatchesRegex("picturezor: [^\n]+\n"));
     EXPECT_THAT(Files(), ElementsAre("a.png"));
   }
+  EXPECT_THAT(Run({"filter", "sharpen-it", "a.png"}).Error,
+              HasSubstr(": sharpen-it: there is no such filter"));
   EXPECT_EQ(Run({"--help"}).Code, 0);
   EXPECT_THAT(Run({"scale", "--help"}).Out, HasSubstr("Examples:"));
   EXPECT_THAT(Run({"--version"}).Out, HasSubstr("picturezor 1."));

@@ -80,13 +80,6 @@ TEST_F(Scaling, CMYKAndPartsOfIt) {
   Fail({"scale", "a.tif", "--width", "10", "--fast", "-o", "b.tif"}, "a.tif", "--fast");
 }
 
-// Larger than memory may be: the result is the same and nothing stays behind.
-TEST_F(Scaling, BeyondTheMemoryLimit) {
-  WritePNG(At("a.png"), Noise(500, 400, 3));
-  const Raster wanted = Scaled({"--width", "123"});
-  EXPECT_EQ(Scaled({"--width", "123", "--memory-limit", "100K"}), wanted);
-}
-
 // Twice as large as the result is enough for the reader; PNG has no such way, and half of it isn't twice
 // smaller.
 TEST_F(Scaling, ADraftIsNearAndOnlyAskedFor) {

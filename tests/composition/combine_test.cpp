@@ -119,9 +119,7 @@ TEST(Combine, BlendsEveryTripleOfGroups) {
 TEST(Combine, DividesExactly) {
   const Picture image(256, 256, Format::G), mask(256, 256, Format::G), dest(256, 256, Format::G);
   for (int y = 0; y < 256; ++y) {
-    Samples across(256);
-    for (int x = 0; x < 256; ++x) across[std::size_t(x)] = std::uint8_t(x);
-    image.SetRow(y, across);
+    image.SetRow(y, Ramp());
     mask.SetRow(y, Samples(256, std::uint8_t(y)));
   }
   for (const bool preMultiplied : {false, true})

@@ -11,8 +11,7 @@ TEST(CompareImages, AddsUpTheDifferencesOfAllPairs) {
   for (const Format a : EveryFormat())
     for (const Format b : EveryFormat()) {
       SCOPED_TRACE(testing::Message() << int(a) << " and " << int(b) << ", seed 31");
-      const Picture one(Width, Height, a);
-      FillWithNoise(one, noise.Byte());
+      const Picture one = NoisePicture(Width, Height, a, noise.Byte());
       const PlainPicture plain(one);
       ForStores(a == b, Width, Height, b, [&](const Picture& other) {
         SetPacked(other, noise.Many(std::size_t(Width * Height * other.PixelSize())));

@@ -25,8 +25,7 @@ TEST(CopyPixels, CopiesEveryPairOfFormats) {
   constexpr int Width = 41, Height = 6;
   Noise noise(51);
   for (const Format from : EveryFormat()) {
-    const Picture source(Width - 3, Height + 1, from);
-    FillWithNoise(source, noise.Byte());
+    const Picture source = NoisePicture(Width - 3, Height + 1, from, noise.Byte());
     const PlainPicture plain(source);
     for (const Format into : EveryFormat()) {
       SCOPED_TRACE(testing::Message() << int(from) << " into " << int(into) << ", seed 51");
@@ -72,8 +71,7 @@ TEST(CopyPixels, IsTheSameWithEveryInstructionSet) {
 // As wide as a page, so that rows of mapped pictures have no gaps either.
 TEST(CopyPixels, TakesRowsWithoutGapsTogether) {
   constexpr int Width = 4096, Height = 12;
-  const Picture source(Width, Height, Format::G);
-  FillWithNoise(source, 53);
+  const Picture source = NoisePicture(Width, Height, Format::G, 53);
   for (const Picture& from : {source, source.MirroredView()})
     for (const Format into : {Format::G, Format::RGBX})
       ForEveryStore(Width, Height, into, [&](const Picture& dest) {

@@ -30,15 +30,6 @@ HostPicture NoisePicture(int width, int height, PictureForm form, unsigned seed)
 
 void GiveMask(const HostPicture& picture, const HostPicture& mask) { Inside(picture).Mask = mask; }
 
-std::string LettersOf(Format format) {
-  static const char* const letters[] = {
-      "",  "RGB",  "RGBA",  "RGB-",  "ARGB",  "-RGB",  "BGR",  "BGRA",  "BGR-",  "ABGR",  "-BGR",
-      "g", "gA",   "Ag",    "",      "g--",   "-g-",   "--g",  "g---",  "-g--",  "--g-",  "---g",
-      "-", "CMYK", "CMYKA", "ACMYK", "CMYK-", "-CMYK", "KYMC", "KYMCA", "AKYMC", "KYMC-", "-KYMC"};
-  return std::size_t(format) < std::size(letters) ? letters[int(format)]
-                                                  : std::string(std::size_t(BytesPerPixel(format)), '-');
-}
-
 std::vector<std::string> ServicesOf(const std::function<void()>& call) {
   std::vector<std::string> names;
   model::TheRuntime().OnPictureService = [&](const char* name) { names.push_back(name); };

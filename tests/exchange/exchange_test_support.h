@@ -20,9 +20,6 @@ model::PicturePayload& Inside(const HostPicture& picture);
 HostPicture NoisePicture(int width, int height, PictureForm form, unsigned seed);
 void GiveMask(const HostPicture& picture, const HostPicture& mask);
 
-/// The bytes of a pixel of a format as letters: R G B, C M Y K, g for gray, A for alpha, - for none.
-std::string LettersOf(Format format);
-
 /// The services of pictures and QuickDraw that a call asks for.
 std::vector<std::string> ServicesOf(const std::function<void()>& call);
 

@@ -86,8 +86,7 @@ TEST(Export, GivesTheColoursOfEveryFormat) {
         ForEveryStore(9, 7, format, [&](const Picture& picture) {
           SetPacked(picture, Noise(7).Many(9 * 7 * letters.size()));
           for (const Rect& rect : Rectangles) {
-            SCOPED_TRACE(testing::Message()
-                         << rect.X << ' ' << rect.Y << ' ' << rect.Width << ' ' << rect.Height);
+            SCOPED_TRACE(testing::PrintToString(rect));
             Expect(picture.CopyPicture(rect), picture, rect,
                    [&](const std::uint8_t* pixel) { return ColourOf(letters, pixel); });
             Expect(picture.CopyMask(rect), picture, rect,
@@ -130,8 +129,7 @@ TEST(Export, DrawsAlphaIntoTheMask) {
       InHost(form, [&] {
         SCOPED_TRACE(testing::Message() << int(form) << " drawing " << draws);
         Host::Hide("DrawPicture", !draws);
-        const Picture picture(9, 7, Format::GA);
-        FillWithNoise(picture, 5);
+        const Picture picture = NoisePicture(9, 7, Format::GA, 5);
         const HostPicture result = picture.CopyPictureWithMask();
         EXPECT_EQ(result.RGB(), picture.CopyPicture().RGB());
         ASSERT_TRUE(result.Mask());

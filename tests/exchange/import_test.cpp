@@ -104,41 +104,22 @@ Change Blended(bool invert) {
 
 struct Method {
   const char* Name;
-  std::function<void(const Picture&, const HostPicture&, const Block&)> Call;
+  std::function<void(const Picture&, const HostPicture&, const Rect& dest, int sourceX, int sourceY)> Call;
   Change By;
 };
 
 std::vector<Method> Methods() {
-  std::vector<Method> methods = {{"red",
-                                  [](const Picture& i, const HostPicture& p, const Block& b) {
-                                    i.DrawPictureRedToGrayChannel(p, b.Dest, b.SourceX, b.SourceY);
-                                  },
-                                  Gray(&Color::Red)},
-                                 {"green",
-                                  [](const Picture& i, const HostPicture& p, const Block& b) {
-                                    i.DrawPictureGreenToGrayChannel(p, b.Dest, b.SourceX, b.SourceY);
-                                  },
-                                  Gray(&Color::Green)},
-                                 {"blue",
-                                  [](const Picture& i, const HostPicture& p, const Block& b) {
-                                    i.DrawPictureBlueToGrayChannel(p, b.Dest, b.SourceX, b.SourceY);
-                                  },
-                                  Gray(&Color::Blue)},
-                                 {"colours",
-                                  [](const Picture& i, const HostPicture& p, const Block& b) {
-                                    i.DrawPictureRGB(p, b.Dest, b.SourceX, b.SourceY);
-                                  },
-                                  Colours}};
+  std::vector<Method> methods = {
+      {"red", [](auto& i, const auto&... of) { i.DrawPictureRedToGrayChannel(of...); }, Gray(&Color::Red)},
+      {"green", [](auto& i, const auto&... of) { i.DrawPictureGreenToGrayChannel(of...); },
+       Gray(&Color::Green)},
+      {"blue", [](auto& i, const auto&... of) { i.DrawPictureBlueToGrayChannel(of...); }, Gray(&Color::Blue)},
+      {"colours", [](auto& i, const auto&... of) { i.DrawPictureRGB(of...); }, Colours}};
   for (const bool invert : {false, true}) {
-    methods.push_back({"alpha",
-                       [=](const Picture& i, const HostPicture& p, const Block& b) {
-                         i.DrawMaskedPictureRGB(p, b.Dest, b.SourceX, b.SourceY, invert);
-                       },
+    methods.push_back({"alpha", [=](auto& i, const auto&... of) { i.DrawMaskedPictureRGB(of..., invert); },
                        WithAlpha(invert)});
     methods.push_back({"blend",
-                       [=](const Picture& i, const HostPicture& p, const Block& b) {
-                         i.DrawMaskedPictureApplyMaskRGB(p, b.Dest, b.SourceX, b.SourceY, invert);
-                       },
+                       [=](auto& i, const auto&... of) { i.DrawMaskedPictureApplyMaskRGB(of..., invert); },
                        Blended(invert)});
   }
   return methods;
@@ -167,12 +148,11 @@ void DrawAll(const Picture& image, const HostPicture& picture, const HostPicture
   const Samples before = Noise(17).Many(Packed(image).size());
   for (const Method& method : Methods())
     for (const Block& block : Blocks()) {
-      SCOPED_TRACE(testing::Message()
-                   << method.Name << ' ' << block.Dest.X << ' ' << block.Dest.Y << ' ' << block.Dest.Width
-                   << ' ' << block.Dest.Height << " from " << block.SourceX << ' ' << block.SourceY);
+      SCOPED_TRACE(testing::Message() << method.Name << ' ' << testing::PrintToString(block.Dest) << " from "
+                                      << block.SourceX << ' ' << block.SourceY);
       SetPacked(image, before);
       const Samples expected = reachable ? Expected(image, picture, mask, block, method.By) : before;
-      method.Call(image, picture, block);
+      method.Call(image, picture, block.Dest, block.SourceX, block.SourceY);
       ASSERT_EQ(Packed(image), expected);
     }
 }
@@ -240,64 +220,31 @@ TEST(Import, FillsInArgumentsThatAreLeftOut) {
   InHost(PictureForm::GWorld32, [] {
     const HostPicture picture = NoisePicture(4, 3, PictureForm::GWorld32, 7);
     GiveMask(picture, NoisePicture(4, 3, PictureForm::GWorld32, 8));
-    using Short = std::function<void(const Picture&)>;
+    const Rect all{0, 0, 4, 3}, moved{2, 1, 4, 3}, turned{3, 2, -3, 2}, part{1, 1, 2, 2};
     const struct {
-      Short Call, Whole;
+      std::function<void(const Picture&)> Call;
+      Rect Dest;
+      Change By;
     } cases[] = {
-        {[&](const Picture& i) { i.DrawPictureRGB(picture); },
-         [&](const Picture& i) {
-           i.DrawPictureRGB(picture, {0, 0, 4, 3}, 0, 0);
-         }},
-        {[&](const Picture& i) { i.DrawPictureRGB(picture, 2, 1); },
-         [&](const Picture& i) {
-           i.DrawPictureRGB(picture, {2, 1, 4, 3}, 0, 0);
-         }},
-        {[&](const Picture& i) {
-           i.DrawPictureRGB(picture, {3, 2, -3, 2});
-         },
-         [&](const Picture& i) {
-           i.DrawPictureRGB(picture, {0, 2, 3, 2}, 0, 0);
-         }},
-        {[&](const Picture& i) { i.DrawMaskedPictureRGB(picture, true); },
-         [&](const Picture& i) {
-           i.DrawMaskedPictureRGB(picture, {0, 0, 4, 3}, 0, 0, true);
-         }},
-        {[&](const Picture& i) { i.DrawMaskedPictureRGB(picture, 2, 1); },
-         [&](const Picture& i) {
-           i.DrawMaskedPictureRGB(picture, {2, 1, 4, 3}, 0, 0, false);
-         }},
-        {[&](const Picture& i) {
-           i.DrawMaskedPictureRGB(picture, {1, 1, 2, 2}, true);
-         },
-         [&](const Picture& i) {
-           i.DrawMaskedPictureRGB(picture, {1, 1, 2, 2}, 0, 0, true);
-         }},
-        {[&](const Picture& i) { i.DrawMaskedPictureApplyMaskRGB(picture); },
-         [&](const Picture& i) {
-           i.DrawMaskedPictureApplyMaskRGB(picture, {0, 0, 4, 3}, 0, 0, false);
-         }},
-        {[&](const Picture& i) { i.DrawMaskedPictureApplyMaskRGB(picture, 2, 1, true); },
-         [&](const Picture& i) {
-           i.DrawMaskedPictureApplyMaskRGB(picture, {2, 1, 4, 3}, 0, 0, true);
-         }},
-        {[&](const Picture& i) {
-           i.DrawMaskedPictureApplyMaskRGB(picture, {1, 1, 2, 2});
-         },
-         [&](const Picture& i) {
-           i.DrawMaskedPictureApplyMaskRGB(picture, {1, 1, 2, 2}, 0, 0, false);
-         }},
+        {[&](auto& i) { i.DrawPictureRGB(picture); }, all, Colours},
+        {[&](auto& i) { i.DrawPictureRGB(picture, 2, 1); }, moved, Colours},
+        {[&](auto& i) { i.DrawPictureRGB(picture, turned); }, turned, Colours},
+        {[&](auto& i) { i.DrawMaskedPictureRGB(picture, true); }, all, WithAlpha(true)},
+        {[&](auto& i) { i.DrawMaskedPictureRGB(picture, 2, 1); }, moved, WithAlpha(false)},
+        {[&](auto& i) { i.DrawMaskedPictureRGB(picture, part, true); }, part, WithAlpha(true)},
+        {[&](auto& i) { i.DrawMaskedPictureApplyMaskRGB(picture); }, all, Blended(false)},
+        {[&](auto& i) { i.DrawMaskedPictureApplyMaskRGB(picture, 2, 1, true); }, moved, Blended(true)},
+        {[&](auto& i) { i.DrawMaskedPictureApplyMaskRGB(picture, part); }, part, Blended(false)},
+        {[&](auto& i) { i.DrawPictureGreenToGrayChannel(picture, part); }, part, Gray(&Color::Green)},
     };
-    for (const auto& [call, whole] : cases) {
-      const Picture a(5, 4, Format::RGBA), b(5, 4, Format::RGBA);
-      for (const Picture& image : {a, b}) FillWithNoise(image, 9);
-      call(a);
-      whole(b);
-      EXPECT_EQ(Packed(a), Packed(b));
-    }
-    const Picture gray(5, 4, Format::G), same(5, 4, Format::G);
-    gray.DrawPictureGreenToGrayChannel(picture, {1, 1, 3, 3});
-    same.DrawPictureGreenToGrayChannel(picture, {1, 1, 3, 3}, 0, 0);
-    EXPECT_EQ(Packed(gray), Packed(same));
+    for (const auto& one : cases)
+      for (const Format format : {Format::RGBA, Format::G}) {
+        SCOPED_TRACE(testing::Message() << "case " << &one - cases << ", format " << int(format));
+        const Picture image = NoisePicture(5, 4, format, 9);
+        const Samples expected = Expected(image, picture, picture.Mask(), {one.Dest, 0, 0}, one.By);
+        one.Call(image);
+        EXPECT_EQ(Packed(image), expected);
+      }
   });
 }
 

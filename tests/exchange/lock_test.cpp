@@ -147,8 +147,7 @@ TEST(Locks, LeaveNothingWhenTheHostRefuses) {
     for (const bool late : {false, true})
       InHost(form, [&] {
         SCOPED_TRACE(testing::Message() << service << (late ? " after it worked" : " never there"));
-        const Picture image(5, 4, Format::RGBA);
-        FillWithNoise(image, 1);
+        const Picture image = NoisePicture(5, 4, Format::RGBA, 1);
         // An unlock that answers no lock is the price of a lock that isn't there.
         const bool uneven = !std::strcmp(service, "lockPictureDescription");
         if (late) {
@@ -190,8 +189,7 @@ TEST(Locks, RefuseARecordOfAnotherKind) {
 TEST(Locks, CopyRowsOnlyBetweenAlikePictures) {
   InHost(PictureForm::Rows, [] {
     Host::Hide("DrawPicture");
-    const Picture image(5, 4, Format::GA);
-    FillWithNoise(image, 2);
+    const Picture image = NoisePicture(5, 4, Format::GA, 2);
     // The mask is as large as its picture and not as large as what was asked for.
     const HostPicture clipped = image.CopyPictureWithMask({1, 0, 20, 20});
     EXPECT_EQ(clipped.Mask().RGB(), image.CopyMask({1, 0, 20, 20}).RGB());

@@ -60,8 +60,7 @@ TEST(AreaFilters, WriteRowsThatOverlapInTheirOrder) {
                {Blurred, BlurredDown, BlurredAlong},
                {BlurredALittle, BlurredALittleDown, BlurredALittle}};
   const int width = 6, height = 7, rowBytes = width * 3, rowSize = 8;
-  const Picture source(width, height, Format::RGB);
-  FillWithNoise(source, 71);
+  const Picture source = NoisePicture(width, height, Format::RGB, 71);
   for (std::size_t i = 0; i < std::size(cases); ++i) {
     Samples wanted(std::size_t(rowSize) * (height - 1) + rowBytes);
     const Samples down = Packed(cases[i].Down(source, {}));
@@ -98,14 +97,12 @@ TEST(AreaFilters, GiveNilWhereARowCantBeReached) {
 }
 
 TEST(AreaFilters, LeaveRawPixelsAlone) {
-  const Picture picture(3, 3, Format::Scaling5);
-  FillWithNoise(picture, 65);
-  for (const Picture& result :
-       {picture.OilFilter({}, 4, 1), picture.DiffuseFilter({}, 1), picture.EngraveFilter({}, 1),
-        picture.NeonFilter(), picture.ApplyMatrix({}, 1, IntegerArray({1}))})
-    EXPECT_EQ(Packed(result), Samples(45, 0));
-  const Picture inks(2, 2, Format::CMYK);
-  FillWithNoise(inks, 66);
+  const Picture picture = NoisePicture(3, 3, Format::Scaling5, 65);
+  for (const auto filter : {Sharpened, Oiled, Diffused, Engraved, Neon, Blurred})
+    EXPECT_EQ(Packed(filter(picture, {})), Samples(45, 0));
+  EXPECT_FALSE(BlurredALittle(picture, {}));
+  EXPECT_FALSE(BlurredALittle(picture, Picture(3, 3, Format::Scaling5)));
+  const Picture inks = NoisePicture(2, 2, Format::CMYK, 66);
   EXPECT_EQ(Packed(inks.DiffuseFilter({}, 1)), Samples(16, 0));
   const Picture small(1, 1, Format::G);
   EXPECT_EQ(inks.DiffuseFilter(small, 1), small) << "nothing is written, so any picture will do";

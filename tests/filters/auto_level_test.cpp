@@ -1,6 +1,6 @@
 #include <array>
 
-#include "support/point_filter.h"
+#include "support/filter_models.h"
 
 namespace picturezor {
 namespace {
@@ -8,16 +8,10 @@ namespace {
 /// What becomes of a channel's sample, by counting pixels for every level.
 std::array<std::uint8_t, 256> Levels(const Picture& picture, const Rect& part) {
   std::vector<int> lumas;
-  const std::vector<PlacedPlane> planes = PlanesOf(picture);
-  for (int y = part.Y; y < part.Y + part.Height; ++y) {
-    const Samples row = picture.Row(y);
-    for (int x = part.X; x < part.X + part.Width; ++x) {
-      const auto sample = [&](std::size_t c) {
-        return row[std::size_t(x * picture.PixelSize() + planes[c].Offset)];
-      };
-      lumas.push_back(int(0.177 * sample(0) + 0.813 * sample(1) + 0.01 * sample(2)));
-    }
-  }
+  const Planar planes = PlanesIn(picture, picture.Width(), picture.Height());
+  for (int y = part.Y; y < part.Y + part.Height; ++y)
+    for (int x = part.X; x < part.X + part.Width; ++x)
+      lumas.push_back(int(0.177 * planes(0, x, y) + 0.813 * planes(1, x, y) + 0.01 * planes(2, x, y)));
   const float total = float(lumas.size());
   const auto last = [&](float count) {
     int level = 0;
@@ -60,7 +54,7 @@ TEST(AutoLevel, StretchesTheRectangle) {
                                    return {};
                                  return levels[v];
                                }},
-                              picture, picture, before);
+                              picture, picture);
         }
         EXPECT_EQ(asked ? picture.AutoLevel(*asked) : picture.AutoLevel(), picture.IsRGB());
         EXPECT_EQ(StoredRows(picture), wanted);
@@ -88,8 +82,7 @@ TEST(AutoLevel, CutsBesideTheLumaOfEveryGray) {
 }
 
 TEST(AutoLevel, RefusesWhatHasNoPart) {
-  const Picture picture(5, 4, Format::RGBA);
-  FillWithNoise(picture, 3);
+  const Picture picture = NoisePicture(5, 4, Format::RGBA, 3);
   const std::vector<Samples> before = StoredRows(picture);
   for (const Rect& part : {Rect{5, 0, 3, 3}, Rect{0, 4, 3, 3}, Rect{0, 0, 0, 2}, Rect{-3, -3, 3, 3}})
     EXPECT_FALSE(picture.AutoLevel(part));

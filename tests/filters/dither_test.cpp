@@ -1,5 +1,4 @@
-#include "support/area_filter.h"
-#include "support/point_filter.h"
+#include "support/filter_models.h"
 
 namespace picturezor {
 namespace {
@@ -81,19 +80,16 @@ TEST(DitherFilter, PicksTheLevelByThePlace) {
       if (matrix == DitherMatrix::Ordered6x6 && levels == 5) ExpectPointFilter(filter);
       for (const Format format : {Format::G, Format::GA, Format::RGB, Format::BGRX, Format::ARGB})
         ForEveryTarget([&] {
-          const Picture picture(150, 17, format);
-          FillWithNoise(picture, 91);
+          const Picture picture = NoisePicture(150, 17, format, 91);
           const Picture blank(150, 17, format);
-          ASSERT_EQ(StoredRows(picture.DitherFilter({}, matrix, levels)),
-                    WantedRows(filter, picture, blank, StoredRows(blank)));
+          ASSERT_EQ(StoredRows(picture.DitherFilter({}, matrix, levels)), WantedRows(filter, picture, blank));
         });
       if (HasFailure()) return;
     }
 }
 
 TEST(DitherFilter, TakesAnyNumbers) {
-  const Picture picture(20, 20, Format::RGB);
-  FillWithNoise(picture, 92);
+  const Picture picture = NoisePicture(20, 20, Format::RGB, 92);
   const auto dithered = [&](int levels) {
     return Packed(picture.DitherFilter({}, DitherMatrix::Cluster8, levels));
   };

@@ -1,4 +1,4 @@
-#include "support/point_filter.h"
+#include "support/filter_models.h"
 
 namespace picturezor {
 namespace {
@@ -31,7 +31,7 @@ TEST(Invert, ComplementsTheRectangle) {
       const auto run = [&](const Picture& picture) {
         SetPacked(picture, Noise(71).Many(std::size_t(70 * 7 * picture.PixelSize())));
         const std::vector<Samples> before = StoredRows(picture);
-        const std::vector<Samples> wanted = WantedRows(Complement(part), picture, picture, before);
+        const std::vector<Samples> wanted = WantedRows(Complement(part), picture, picture);
         const auto invert = [&] { asked ? picture.Invert(*asked) : picture.Invert(); };
         invert();
         EXPECT_EQ(StoredRows(picture), wanted);

@@ -2,7 +2,7 @@
 
 #include <cmath>
 
-#include "support/area_filter.h"
+#include "support/filter_models.h"
 
 namespace picturezor {
 namespace {
@@ -100,9 +100,7 @@ TEST(ApplyMatrix, WorksOutByHand) {
 // Every sum up to 1279 by itself. Catches a factor that is rounded before it is used.
 TEST(ApplyMatrix, TruncatesWhatTheFactorGives) {
   const Picture picture(256, 1, Format::G);
-  Samples ramp(256);
-  for (int x = 0; x < 256; ++x) ramp[std::size_t(x)] = std::uint8_t(x);
-  SetPacked(picture, ramp);
+  SetPacked(picture, Ramp());
   for (const double scale :
        {1.0 / 3, 1.0 / 9, 0.1, 0.7, 1.0 / 273, 0.999999999, 3.3, 1e-9, 1e-6, 1.1e-6, 9.9e5, 1e6})
     for (int delta = 0; delta < 1280; delta += 256) {

@@ -1,6 +1,6 @@
 #include <cmath>
 
-#include "support/point_filter.h"
+#include "support/filter_models.h"
 
 namespace picturezor {
 namespace {
@@ -37,7 +37,7 @@ TEST(StampFilter, StepsBetweenTwoColours) {
                             return Stamped(v, threshold, softness, black.Blue, white.Blue);
                           return Stamped(v, threshold, softness, black.Green, white.Green);
                         }},
-                       blurred, blank, StoredRows(blank));
+                       blurred, blank);
         const Picture result = picture.StampFilter({}, radius, threshold, softness, black, white);
         ASSERT_TRUE(bool(result));
         ASSERT_EQ(StoredRows(result), wanted);
@@ -47,9 +47,7 @@ TEST(StampFilter, StepsBetweenTwoColours) {
 
 TEST(StampFilter, HasTheseNumbers) {
   const Picture ramp(256, 1, Format::G);
-  Samples row;
-  for (int v = 0; v < 256; ++v) row.push_back(std::uint8_t(v));
-  ramp.SetRowInFormat(0, Format::G, row);
+  SetPacked(ramp, Ramp());
   const auto stamped = [&](double softness, Color black, Color white) {
     return ramp.StampFilter({}, 0, 0.5, softness, black, white).RowInFormat(0, Format::G);
   };

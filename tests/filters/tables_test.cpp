@@ -1,7 +1,7 @@
 #include <array>
 #include <cmath>
 
-#include "support/point_filter.h"
+#include "support/filter_models.h"
 
 // The filters that send each plane through a table.
 
@@ -14,10 +14,8 @@ using testing::PrintToString;
 /// All samples from 0 to 255, sent through a filter.
 Table Mapped(const std::function<Picture(const Picture&)>& filter) {
   const Picture ramp(256, 1, Format::G);
-  Samples row(256);
-  for (int v = 0; v < 256; ++v) row[std::size_t(v)] = std::uint8_t(v);
-  ramp.SetRowInFormat(0, Format::G, row);
-  const Samples result = filter(ramp).RowInFormat(0, Format::G);
+  SetPacked(ramp, Ramp());
+  const Samples result = Packed(filter(ramp));
   Table table{};
   std::copy(result.begin(), result.end(), table.begin());
   return table;

@@ -1,7 +1,7 @@
 #include <algorithm>
 #include <cmath>
 
-#include "support/point_filter.h"
+#include "support/filter_models.h"
 
 namespace picturezor {
 namespace {
@@ -15,33 +15,6 @@ std::uint8_t Cell(int a, int b, double amount, int threshold) {
 
 /// All pairs of samples, and each amount in one picture.
 TEST(UnsharpFilter, PushesEveryPair) {
-  const double amounts[] = {0,
-                            0.1,
-                            0.3,
-                            0.5,
-                            0.35,
-                            0.025,
-                            0.33,
-                            0.82,
-                            31.25,
-                            31.26,
-                            0.155,
-                            1.0 / 3,
-                            1,
-                            2.7,
-                            63,
-                            1e5,
-                            1e300,
-                            -0.1,
-                            -0.25,
-                            -0.26,
-                            -0.5,
-                            -3,
-                            double(INFINITY),
-                            double(NAN),
-                            1e-17,
-                            0.05,
-                            0.2};
   const Picture all(256, 256, Format::G), blurred(256, 256, Format::G);
   Samples a, b;
   for (int i = 0; i < 65536; ++i) {
@@ -49,7 +22,11 @@ TEST(UnsharpFilter, PushesEveryPair) {
     b.push_back(std::uint8_t(i));
   }
   SetPacked(blurred, b);
-  for (const double amount : amounts)
+  constexpr double infinity = INFINITY, nan = NAN;
+  for (const double amount :
+       {0.0,   0.1,  0.3,  0.5, 0.35,  0.025, 0.33,  0.82,  31.25, 31.26, 0.155,    0.3333333333333333,
+        1.0,   2.7,  63.0, 1e5, 1e300, -0.1,  -0.25, -0.26, -0.5,  -3.0,  infinity, nan,
+        1e-17, 0.05, 0.2})
     for (const int threshold : {0, 1, 7, 255, 256, -5, 2147483647, -2147483647 - 1}) {
       SCOPED_TRACE(testing::Message() << amount << ' ' << threshold);
       ForEveryTarget([&] {
@@ -69,20 +46,15 @@ TEST(UnsharpFilter, PushesEveryPair) {
 TEST(UnsharpFilter, WorksOnEveryPlaneOfEveryStore) {
   for (const Format format : EveryFormat())
     ForEveryTarget([&] {
-      const Picture blurred(37, 7, format);
-      FillWithNoise(blurred, 80);
+      const Picture blurred = NoisePicture(37, 7, format, 80);
       const std::vector<Samples> others = StoredRows(blurred);
-      const std::vector<PlacedPlane> from = PlanesOf(blurred);
+      const Planar from = PlanesIn(blurred, 37, 7);
       ForEveryStore(37, 7, format, [&](const Picture& picture) {
         SetPacked(picture, Noise(81).Many(std::size_t(37 * 7 * picture.PixelSize())));
-        std::vector<Samples> wanted = StoredRows(picture);
-        const std::vector<PlacedPlane> planes = PlanesOf(picture);
-        for (std::size_t y = 0; y < 7; ++y)
-          for (int x = 0; x < 37; ++x)
-            for (std::size_t c = 0; c < planes.size(); ++c) {
-              auto& sample = wanted[y][std::size_t(x * picture.PixelSize() + planes[c].Offset)];
-              sample = Cell(sample, others[y][std::size_t(x * blurred.PixelSize() + from[c].Offset)], 0.3, 4);
-            }
+        Planar planes = PlanesIn(picture, 37, 7);
+        for (std::size_t i = 0; i < planes.Of.size(); ++i)
+          planes.Of[i] = Cell(planes.Of[i], from.Of[i], 0.3, 4);
+        const std::vector<Samples> wanted = With(StoredRows(picture), picture, planes);
         ASSERT_TRUE(picture.UnsharpFilter(blurred, 0.3, 4));
         ASSERT_EQ(StoredRows(picture), wanted) << int(format);
         ASSERT_EQ(StoredRows(blurred), others);
@@ -114,8 +86,7 @@ TEST(UnsharpFilter, ReadsWhatItHasWritten) {
 }
 
 TEST(UnsharpFilter, RefusesOtherPictures) {
-  const Picture picture(5, 4, Format::RGB);
-  FillWithNoise(picture, 3);
+  const Picture picture = NoisePicture(5, 4, Format::RGB, 3);
   const std::vector<Samples> before = StoredRows(picture);
   Picture closed(5, 4, Format::RGB);
   closed.Close();

@@ -127,18 +127,13 @@ TEST(Turns, WriteOtherOrdersAndLargerPictures) {
       const Samples pixels = Noise(57).Many(18 * 20 * 3);
       SetPacked(source, pixels);
       FillWithNoise(dest, 58);
-      Picture wanted = dest.Clone();
-      const int width = way.Swaps ? 20 : 18, height = way.Swaps ? 18 : 20;
-      const Picture part = wanted.ClipImage({0, 0, width, height});
       const Samples turned = Wanted(way, pixels, Samples(pixels.size()), 18, 20, Format::RGB);
-      for (int c = 0; c < 3; ++c) {
-        Samples plane;
-        for (std::size_t i = std::size_t(c); i < turned.size(); i += 3) plane.push_back(turned[i]);
-        const Picture views[] = {part.RedChannel(), part.GreenChannel(), part.BlueChannel()};
-        views[c].SetDataStringInFormat(Format::G, plane);
-      }
+      std::vector<Samples> wanted = StoredRows(dest);
+      const std::size_t width = way.Swaps ? 20 : 18, pixel = LettersOf(format).size();
+      for (std::size_t i = 0; i < turned.size(); ++i)
+        wanted[i / 3 / width][i / 3 % width * pixel + LettersOf(format).find("RGB"[i % 3])] = turned[i];
       EXPECT_EQ(way.Turn(source, dest), dest);
-      EXPECT_EQ(StoredRows(dest), StoredRows(wanted)) << way.Name << " " << int(format);
+      EXPECT_EQ(StoredRows(dest), wanted) << way.Name << " " << int(format);
     }
 }
 
@@ -164,20 +159,17 @@ TEST(Turns, EndAsTheSlowForms) {
     for (const ImageSize& size : sizes)
       for (const int left : {0, 3}) {
         SCOPED_TRACE(testing::Message() << size.Width << " x " << size.Height << " at " << left);
-        const Picture source(size.Width + 5, size.Height, format);
-        FillWithNoise(source, 59);
+        const Picture source = NoisePicture(size.Width + 5, size.Height, format, 59);
         agree(source.ClipImage({left, 0, size.Width, size.Height}), size, left);
       }
-    const Picture source(large[i].Width, large[i].Height, format);
-    FillWithNoise(source, 60);
+    const Picture source = NoisePicture(large[i].Width, large[i].Height, format, 60);
     agree(source, large[i], 7);
   }
 }
 
 // Rows of a caller's block that overlap hold what was written last.
 TEST(Turns, WriteOverlappingRowsInTheSlowOrder) {
-  const Picture source(70, 90, Format::RGB);
-  FillWithNoise(source, 61);
+  const Picture source = NoisePicture(70, 90, Format::RGB, 61);
   const std::pair<Picture (Picture::*)(const Picture&) const, Picture (Picture::*)(const Picture&) const>
       pairs[] = {{&Picture::Rotate90, &Picture::Rotate90slow},
                  {&Picture::Rotate270, &Picture::Rotate270slow}};

@@ -36,27 +36,13 @@ TEST(Declaration, IsTakenApart) {
 
 // A wrong row of a module is a message for its author, never a crash or a row half understood.
 TEST(Declaration, IsRefusedWhereItIsMalformed) {
-  for (const char* text : {"",
-                           " ",
-                           "(",
-                           "F(",
-                           "F(a",
-                           "F(a as",
-                           "F(a as integer",
-                           "F(a as integer,",
-                           "F(a as integer,)",
-                           "F(a as integers)",
-                           "F(a is integer)",
-                           "F(a( as integer)",
-                           "F(a as integer=)",
-                           "F(a as integer=maybe)",
-                           "F(a as integer=1, b as integer)",
-                           "F as",
-                           "F as void",
-                           "F as integer integer",
-                           "F(a as integer))",
-                           "F(a as integer) integer",
-                           "F[a]"})
+  const std::string whole = "F(a as integer)";
+  for (std::size_t size = 2; size < whole.size(); ++size)
+    EXPECT_THROW(ParseDeclaration(whole.substr(0, size)), ModuleError) << size;
+  for (const char* text :
+       {"", " ", "(", "F(a as integer,", "F(a as integer,)", "F(a as integers)", "F(a is integer)",
+        "F(a( as integer)", "F(a as integer=)", "F(a as integer=maybe)", "F(a as integer=1, b as integer)",
+        "F as", "F as void", "F as integer integer", "F(a as integer))", "F(a as integer) integer", "F[a]"})
     EXPECT_THROW(ParseDeclaration(text), ModuleError) << text;
 }
 

@@ -58,19 +58,28 @@ TEST(Formats, LayPlanesOut) {
       char Letter;
       bool Has;
       int Offset;
-    } planes[] = {{'R', picture.HasRed(), picture.RedOffset()},
-                  {'G', picture.HasGreen(), picture.GreenOffset()},
-                  {'B', picture.HasBlue(), picture.BlueOffset()},
-                  {'g', picture.HasGray(), picture.GrayOffset()},
-                  {'A', picture.HasAlpha(), picture.AlphaOffset()},
-                  {'C', picture.HasCyan(), picture.CyanOffset()},
-                  {'M', picture.HasMagenta(), picture.MagentaOffset()},
-                  {'Y', picture.HasYellow(), picture.YellowOffset()},
-                  {'K', picture.HasBlack(), picture.BlackOffset()}};
-    for (const auto& [letter, has, offset] : planes) {
+      Picture View;
+    } planes[] = {{'R', picture.HasRed(), picture.RedOffset(), picture.RedChannel()},
+                  {'G', picture.HasGreen(), picture.GreenOffset(), picture.GreenChannel()},
+                  {'B', picture.HasBlue(), picture.BlueOffset(), picture.BlueChannel()},
+                  {'g', picture.HasGray(), picture.GrayOffset(), picture.GrayChannel()},
+                  {'A', picture.HasAlpha(), picture.AlphaOffset(), picture.AlphaChannel()},
+                  {'C', picture.HasCyan(), picture.CyanOffset(), picture.CyanChannel()},
+                  {'M', picture.HasMagenta(), picture.MagentaOffset(), picture.MagentaChannel()},
+                  {'Y', picture.HasYellow(), picture.YellowOffset(), picture.YellowChannel()},
+                  {'K', picture.HasBlack(), picture.BlackOffset(), picture.BlackChannel()}};
+    for (const auto& [letter, has, offset, view] : planes) {
+      SCOPED_TRACE(letter);
       const auto found = bytes.find(letter);
-      EXPECT_EQ(has, found != std::string::npos) << letter;
-      EXPECT_EQ(offset, has ? int(found) : 0) << letter;
+      EXPECT_EQ(has, found != std::string::npos);
+      EXPECT_EQ(offset, has ? int(found) : 0);
+      ASSERT_EQ(bool(view), has);
+      if (!view) continue;
+      EXPECT_EQ(view.GrayOffset(), offset);
+      EXPECT_EQ(view.ImageFormatString(), "G");
+      EXPECT_EQ(view.PixelSize(), picture.PixelSize());
+      EXPECT_EQ(view.ChannelCount(), 1);
+      EXPECT_TRUE(view.IsGray() && view.HasGray() && !view.HasAlpha());
     }
     EXPECT_EQ(picture.IsRGB(), bytes.find('R') != std::string::npos);
     EXPECT_EQ(picture.IsGray(), bytes.find('g') != std::string::npos);

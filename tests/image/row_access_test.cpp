@@ -8,16 +8,6 @@ namespace {
 
 using testing::Each;
 
-/// A pixel by its planes, as a second reading of the formats' names: where each plane stands in a pixel.
-std::string LayoutOf(Format format) {
-  static const char* const layouts[] = {
-      "",  "RGB",  "RGBA",  "RGBX",  "ARGB",  "XRGB",   "BGR",     "BGRA",    "BGRX",  "ABGR",  "XBGR",
-      "g", "gA",   "Ag",    "",      "gXX",   "XgX",    "XXg",     "gXXX",    "XgXX",  "XXgX",  "XXXg",
-      "X", "CMYK", "CMYKA", "ACMYK", "CMYKX", "XCMYK",  "KYMC",    "KYMCA",   "AKYMC", "KYMCX", "XKYMC",
-      "X", "XX",   "XXX",   "XXXX",  "XXXXX", "XXXXXX", "XXXXXXX", "XXXXXXXX"};
-  return layouts[int(format)];
-}
-
 char FamilyOf(const std::string& layout) {
   for (char family : {'R', 'g', 'C'})
     if (layout.find(family) != std::string::npos) return family;
@@ -49,7 +39,7 @@ struct Expected {
 };
 
 Expected Convert(Format from, const Samples& pixels, Format into, Samples dest, bool invertAlpha) {
-  const std::string a = LayoutOf(from), b = LayoutOf(into);
+  const std::string a = LettersOf(from), b = LettersOf(into);
   bool converts = true;
   for (std::size_t x = 0; x < pixels.size() / a.size(); ++x)
     converts = ConvertPixel(a, &pixels[x * a.size()], b, &dest[x * b.size()], invertAlpha) && converts;
@@ -57,7 +47,7 @@ Expected Convert(Format from, const Samples& pixels, Format into, Samples dest, 
 }
 
 bool Raises(Format from, Format into) {
-  const char a = FamilyOf(LayoutOf(from)), b = FamilyOf(LayoutOf(into));
+  const char a = FamilyOf(LettersOf(from)), b = FamilyOf(LettersOf(into));
   return (a == 'R' && b == 'C') || (a == 'C' && b == 'R');
 }
 
@@ -67,8 +57,7 @@ void ConvertEveryPair(int width, Noise& noise) {
   for (const Format own : EveryFormat())
     for (const Format other : EveryFormat()) {
       SCOPED_TRACE(std::to_string(int(own)) + " and " + std::to_string(int(other)));
-      const Picture picture(width, Height, own);
-      FillWithNoise(picture, unsigned(noise.Byte()));
+      const Picture picture = NoisePicture(width, Height, own, unsigned(noise.Byte()));
       const Samples before = Packed(picture);
       const Samples zeros(std::size_t(width * Height * BytesPerPixel(other)), 0);
       const Samples given = noise.Many(zeros.size());
@@ -135,23 +124,13 @@ TEST(RowAccess, GivesGrayByWeightsThatKeepWhite) {
 }
 
 TEST(RowAccess, HandsOutStoredRows) {
-  const Picture picture(5, 3, Format::RGBX);
-  FillWithNoise(picture, 8);
+  const Picture picture = NoisePicture(5, 3, Format::RGBX, 8);
   const Samples row = picture.Row(1);
   EXPECT_EQ(row.size(), 64u);
   const MemoryBlock raw = picture.RawRow(1);
   EXPECT_EQ(Samples(raw.Data().begin(), raw.Data().end()), row);
   raw.Data()[3] = std::uint8_t(row[3] + 1);  // a filler byte: the block lies over the row itself
   EXPECT_EQ(picture.Row(1)[3], std::uint8_t(row[3] + 1));
-}
-
-std::string RaisedBy(const std::function<void()>& call) {
-  try {
-    call();
-  } catch (const HostException& exception) {
-    return exception.ClassName() + ": " + exception.what();
-  }
-  return "";
 }
 
 TEST(RowAccess, RaisesWhatAProgramCanCatch) {

@@ -21,7 +21,7 @@ TEST(ClipImage, CutsItsRectangle) {
       {{1, 1, Most, Most}, 1, 1, 99, 49}, {{5, 5, Least, Least}, 0, 0, 5, 5},
   };
   for (const auto& [asked, left, top, width, height] : cases) {
-    SCOPED_TRACE(testing::PrintToString(std::array{asked.X, asked.Y, asked.Width, asked.Height}));
+    SCOPED_TRACE(testing::PrintToString(asked));
     const Picture view = picture.ClipImage(asked);
     EXPECT_TRUE(view.Valid());
     EXPECT_EQ(view.Width(), width);
@@ -83,30 +83,6 @@ TEST(Views, WriteTheirPlaneAlone) {
     EXPECT_EQ(Packed(picture), pixels);
     EXPECT_EQ(picture.RGBChannels().BlueChannel().DataStringInFormat(Format::G), plane);
   });
-}
-
-TEST(Views, ShowOnlyPlanesThatAreThere) {
-  using View = Picture (Picture::*)() const;
-  const std::pair<char, View> planes[] = {
-      {'R', &Picture::RedChannel},     {'G', &Picture::GreenChannel},  {'B', &Picture::BlueChannel},
-      {'A', &Picture::AlphaChannel},   {'g', &Picture::GrayChannel},   {'C', &Picture::CyanChannel},
-      {'M', &Picture::MagentaChannel}, {'Y', &Picture::YellowChannel}, {'K', &Picture::BlackChannel}};
-  const std::pair<Format, std::string> formats[] = {{Format::BGRA, "BGRA"},   {Format::XRGB, "XRGB"},
-                                                    {Format::GA, "gA"},       {Format::ThreeOf4, "XXgX"},
-                                                    {Format::AKYMC, "AKYMC"}, {Format::Scaling4, "XXXX"}};
-  for (const auto& [format, layout] : formats)
-    for (const auto& [letter, view] : planes) {
-      SCOPED_TRACE(layout + " " + letter);
-      const Picture shown = (Picture(2, 2, format).*view)();
-      const auto place = layout.find(letter);
-      ASSERT_EQ(bool(shown), place != std::string::npos);
-      if (!shown) continue;
-      EXPECT_EQ(shown.GrayOffset(), int(place));
-      EXPECT_EQ(shown.ImageFormatString(), "G");
-      EXPECT_EQ(shown.PixelSize(), int(layout.size()));
-      EXPECT_EQ(shown.ChannelCount(), 1);
-      EXPECT_TRUE(shown.IsGray() && shown.HasGray() && !shown.HasAlpha());
-    }
 }
 
 TEST(Views, ShowTheColoursOfAFamily) {

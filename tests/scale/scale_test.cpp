@@ -2,7 +2,6 @@
 
 #include <array>
 #include <cmath>
-#include <map>
 
 #include "image/picture_data.h"
 #include "support/every_store.h"
@@ -124,7 +123,14 @@ std::vector<Picture> ColoursOf(const Picture& p) {
   }
 }
 
-/// What feeds each plane of dest, alpha last.
+/// The planes of dest that are written.
+std::vector<Picture> WrittenIn(const Picture& dest, const Picture& source) {
+  std::vector<Picture> views = ColoursOf(dest);
+  if (dest.HasAlpha() && source.HasAlpha()) views.push_back(dest.AlphaChannel());
+  return views;
+}
+
+/// What feeds each of them.
 std::vector<Terms> FeedsOf(const Picture& source, const Picture& dest) {
   std::vector<Plane> planes;
   for (const Picture& view : ColoursOf(source)) planes.push_back(PlaneOf(view));
@@ -145,20 +151,12 @@ std::vector<Terms> FeedsOf(const Picture& source, const Picture& dest) {
 /// Compares what a scale left in dest, whose size is the result's, with the second implementation.
 void ExpectScaled(const Picture& dest, const Picture& source, Kernel kernel,
                   const std::vector<Terms>& feeds) {
-  std::vector<Picture> views = ColoursOf(dest);
-  if (dest.HasAlpha() && source.HasAlpha()) views.push_back(dest.AlphaChannel());
+  const std::vector<Picture> views = WrittenIn(dest, source);
   ASSERT_EQ(views.size(), feeds.size());
-  std::map<const Terms*, Plane> known;
   for (std::size_t c = 0; c < views.size(); ++c)
     EXPECT_EQ(PlaneOf(views[c]),
               Scaled(feeds[c], source.Width(), source.Height(), dest.Width(), dest.Height(), kernel))
         << "plane " << c;
-}
-
-Picture NoisePicture(int width, int height, Format format, unsigned seed) {
-  Picture picture(width, height, format);
-  FillWithNoise(picture, seed);
-  return picture;
 }
 
 // One row each, worked out by hand from the kernels' formulas.
@@ -295,17 +293,11 @@ TEST(Scale, KnowsFourteenPairs) {
         }
         ExpectScaled(dest, source, Kernel::Lanczos3, FeedsOf(source, dest));
         // What isn't a plane of the pair is as it was.
-        std::vector<Picture> views = ColoursOf(dest);
-        if (dest.HasAlpha() && source.HasAlpha()) views.push_back(dest.AlphaChannel());
         const Picture was(14, 17, into);
-        const auto clear = [](const Picture& view) {
-          view.SetDataStringInFormat(Format::G, Samples(14 * 17));
-        };
-        for (const Picture& view : views) clear(view);
         SetStoredRows(was, before);
-        std::vector<Picture> planes = ColoursOf(was);
-        if (dest.HasAlpha() && source.HasAlpha()) planes.push_back(was.AlphaChannel());
-        for (const Picture& view : planes) clear(view);
+        for (const Picture& cleared : {dest, was})
+          for (const Picture& view : WrittenIn(cleared, source))
+            view.SetDataStringInFormat(Format::G, Samples(14 * 17));
         EXPECT_EQ(StoredRows(dest), StoredRows(was));
       });
     }
@@ -505,6 +497,12 @@ TEST(ScaleFast, TakesTruncatedPlaces) {
     }
 }
 
+Samples Repeated(const Samples& pixel, int count) {
+  Samples all;
+  for (int i = 0; i < count; ++i) all.insert(all.end(), pixel.begin(), pixel.end());
+  return all;
+}
+
 // Which pairs there are, and what a pixel becomes.
 TEST(ScaleFast, ConvertsOnTheWay) {
   using F = Format;
@@ -541,23 +539,13 @@ TEST(ScaleFast, ConvertsOnTheWay) {
   };
   for (const auto& [from, into, pixel, wanted] : cases) {
     SCOPED_TRACE(testing::Message() << int(from) << " to " << int(into));
-    const Samples nines(std::size_t(BytesPerPixel(into)), 9);
+    const Samples nines(std::size_t(42 * BytesPerPixel(into)), 9);
     ForEveryStore(7, 6, into, [&, pixel = pixel, wanted = wanted, from = from](const Picture& dest) {
-      Samples all;
-      for (int i = 0; i < 42; ++i) all.insert(all.end(), nines.begin(), nines.end());
-      SetPacked(dest, all);
+      SetPacked(dest, nines);
       const Picture source(3, 5, from);
-      Samples pixels;
-      for (int i = 0; i < 15; ++i) pixels.insert(pixels.end(), pixel.begin(), pixel.end());
-      SetPacked(source, pixels);
+      SetPacked(source, Repeated(pixel, 15));
       ASSERT_EQ(dest.ScaleFast(source, 7, 6), !wanted.empty());
-      if (wanted.empty()) {
-        EXPECT_EQ(Packed(dest), all);
-        return;
-      }
-      Samples expected;
-      for (int i = 0; i < 42; ++i) expected.insert(expected.end(), wanted.begin(), wanted.end());
-      EXPECT_EQ(Packed(dest), expected);
+      EXPECT_EQ(Packed(dest), wanted.empty() ? nines : Repeated(wanted, 42));
     });
   }
 }

@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <array>
 #include <atomic>
 
 #include "image/file_regions.h"
@@ -15,17 +16,55 @@ namespace {
 
 /// Bytes before the first pixel of a row of the picture, in the stored row.
 std::size_t RowStart(const Picture& picture) {
-  const int pixel = picture.PixelSize();
-  for (const char* plane : {"Gray", "Red", "Cyan"})
-    if (picture.BooleanProperty("Has" + std::string(plane)))
-      return std::size_t(picture.IntegerProperty(std::string(plane) + "Offset") / pixel * pixel);
-  return 0;
+  const auto planes = PlanesOf(picture);
+  return planes.empty() ? 0 : std::size_t(planes[0].Offset / picture.PixelSize() * picture.PixelSize());
 }
 
 std::size_t RowBytes(const Picture& picture) {
   return std::size_t(picture.Width()) * std::size_t(picture.PixelSize());
 }
 
+}
+
+std::vector<PlacedPlane> PlanesOf(const Picture& picture) {
+  std::vector<PlacedPlane> planes;
+  if (picture.IsGray()) planes = {{Plane::Gray, picture.GrayOffset()}};
+  if (picture.IsRGB())
+    planes = {{Plane::Red, picture.RedOffset()},
+              {Plane::Green, picture.GreenOffset()},
+              {Plane::Blue, picture.BlueOffset()}};
+  if (picture.IsCMYK())
+    planes = {{Plane::Cyan, picture.CyanOffset()},
+              {Plane::Magenta, picture.MagentaOffset()},
+              {Plane::Yellow, picture.YellowOffset()},
+              {Plane::Black, picture.BlackOffset()}};
+  if (!planes.empty() && picture.HasAlpha()) planes.push_back({Plane::Alpha, picture.AlphaOffset()});
+  return planes;
+}
+
+std::string LettersOf(const Picture& picture) {
+  std::string letters(std::size_t(picture.PixelSize()), '-');
+  for (const auto& [plane, offset] : PlanesOf(picture))
+    letters[std::size_t(offset % picture.PixelSize())] = "gRGBCMYKA"[int(plane)];
+  return letters;
+}
+
+const std::string& LettersOf(Format format) {
+  static const auto known = [] {
+    std::array<std::string, 41> all;
+    for (const Format of : EveryFormat()) all[std::size_t(of)] = LettersOf(Picture(1, 1, of));
+    return all;
+  }();
+  return known[std::size_t(format)];
+}
+
+std::string RaisedBy(const std::function<void()>& call) {
+  try {
+    call();
+  } catch (const HostException& exception) {
+    return exception.ClassName() + ": " + exception.what();
+  }
+  return "";
 }
 
 zor::PictureData& DataOf(const Picture& picture) {
@@ -70,6 +109,12 @@ void SetStoredRows(const Picture& picture, const std::vector<Samples>& rows) {
 void FillWithNoise(const Picture& picture, unsigned seed) {
   Noise noise(seed);
   for (int y = 0; y < picture.Height(); ++y) picture.SetRow(y, noise.Many(std::size_t(picture.RowSize())));
+}
+
+Picture NoisePicture(int width, int height, Format format, unsigned seed) {
+  const Picture picture(width, height, format);
+  FillWithNoise(picture, seed);
+  return picture;
 }
 
 Samples Packed(const Picture& picture) {

@@ -3,6 +3,8 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
+#include <numeric>
 #include <random>
 #include <string>
 #include <vector>
@@ -18,6 +20,9 @@ namespace picturezor {
 using Samples = Bytes;
 
 inline void PrintTo(Format format, std::ostream* out) { *out << "Format " << int(format); }
+inline void PrintTo(const Rect& rect, std::ostream* out) {
+  *out << rect.Width << " x " << rect.Height << " at " << rect.X << ", " << rect.Y;
+}
 
 /// All codes that have a layout.
 inline std::vector<Format> EveryFormat() {
@@ -26,6 +31,20 @@ inline std::vector<Format> EveryFormat() {
     if (BytesPerPixel(Format(code)) > 0) formats.push_back(Format(code));
   return formats;
 }
+
+/// In the order of a group, alpha last.
+enum class Plane { Gray, Red, Green, Blue, Cyan, Magenta, Yellow, Black, Alpha };
+
+/// The planes of a picture, and where they stand in its rows.
+struct PlacedPlane {
+  Plane Of;
+  int Offset;
+};
+std::vector<PlacedPlane> PlanesOf(const Picture& picture);
+
+/// The bytes of a pixel as letters: R G B, C M Y K, g for gray, A for alpha, - for none.
+std::string LettersOf(const Picture& picture);
+const std::string& LettersOf(Format format);
 
 /// A stream of numbers from a seed that a failing test prints.
 class Noise {
@@ -44,6 +63,13 @@ class Noise {
   std::mt19937 Engine;
 };
 
+/// Every value of a sample, 0 to 255.
+inline Samples Ramp() {
+  Samples ramp(256);
+  std::iota(ramp.begin(), ramp.end(), std::uint8_t(0));
+  return ramp;
+}
+
 /// A file name that nobody has, in the folder for temporary files; the file is removed at the end.
 class TemporaryFile {
  public:
@@ -55,6 +81,9 @@ class TemporaryFile {
  private:
   std::filesystem::path At;
 };
+
+/// The class and the message of the exception that a call raises; empty for none.
+std::string RaisedBy(const std::function<void()>& call);
 
 /// The instance data of a picture, for what can't be seen from outside.
 zor::PictureData& DataOf(const Picture& picture);
@@ -69,6 +98,7 @@ void SetStoredRows(const Picture& picture, const std::vector<Samples>& rows);
 
 /// Fills every byte of a picture's rows, filler and padding included.
 void FillWithNoise(const Picture& picture, unsigned seed);
+Picture NoisePicture(int width, int height, Format format, unsigned seed);
 
 /// The packed pixels of the whole picture as they are stored, filler included.
 Samples Packed(const Picture& picture);

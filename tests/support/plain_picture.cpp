@@ -3,18 +3,7 @@
 namespace picturezor {
 
 PlainPicture::PlainPicture(const Picture& picture)
-    : Width(picture.Width()),
-      Height(picture.Height()),
-      Layout(std::size_t(picture.PixelSize()), 'X'),
-      Pixels(Packed(picture)) {
-  const std::pair<char, const char*> planes[] = {{'g', "Gray"},   {'R', "Red"},   {'G', "Green"},
-                                                 {'B', "Blue"},   {'C', "Cyan"},  {'M', "Magenta"},
-                                                 {'Y', "Yellow"}, {'K', "Black"}, {'A', "Alpha"}};
-  for (const auto& [letter, name] : planes)
-    if (picture.BooleanProperty("Has" + std::string(name)))
-      Layout[std::size_t(picture.IntegerProperty(std::string(name) + "Offset") % picture.PixelSize())] =
-          letter;
-}
+    : Width(picture.Width()), Height(picture.Height()), Layout(LettersOf(picture)), Pixels(Packed(picture)) {}
 
 std::string PlainPicture::Colours() const {
   return Family() == 'g' ? "g" : Family() == 'R' ? "RGB" : Family() == 'C' ? "CMYK" : "";

@@ -23,7 +23,6 @@ struct PlainPicture {
   int Gray(int x, int y) const;
 
   int Width, Height;
-  /// A letter a byte of the pixel; X where no plane stands.
   std::string Layout;
   Samples Pixels;
 };

@@ -67,27 +67,12 @@ RowArguments::~RowArguments() {
 }
 
 Value RowArguments::Ordinary(const MethodEntry& row, const Parameter& parameter) const {
-  static const std::map<std::string, std::int64_t> known = {{"width", Width},
-                                                            {"height", Height},
-                                                            {"destwidth", Width},
-                                                            {"destheight", Height},
-                                                            {"w", Width},
-                                                            {"h", Height},
-                                                            {"imageformat", 2},
-                                                            {"theimageformat", 2},
-                                                            {"destx", 0},
-                                                            {"desty", 0},
-                                                            {"sourcex", 0},
-                                                            {"sourcey", 0},
-                                                            {"rowsize", 64},
-                                                            {"mode", 3},
-                                                            {"threads", 2},
-                                                            {"levels", 4},
-                                                            {"matrixdimension", 3},
-                                                            {"index", 0},
-                                                            {"alpha", 128},
-                                                            {"x", 0},
-                                                            {"y", 0}};
+  static const std::map<std::string, std::int64_t> known = {
+      {"width", Width}, {"height", Height}, {"destwidth", Width},   {"destheight", Height}, {"w", Width},
+      {"h", Height},    {"mode", 3},        {"imageformat", 2},     {"theimageformat", 2},  {"threads", 2},
+      {"destx", 0},     {"desty", 0},       {"sourcex", 0},         {"sourcey", 0},         {"x", 0},
+      {"y", 0},         {"rowsize", 64},    {"matrixdimension", 3}, {"levels", 4},          {"index", 0},
+      {"alpha", 128}};
   const model::TypeName& type = parameter.Type;
   if (type == "integer" || type == "boolean" || type == "color") {
     const auto found = known.find(model::Lower(parameter.Name));

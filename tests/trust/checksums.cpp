@@ -7,6 +7,7 @@
 #include <list>
 #include <map>
 #include <span>
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -17,11 +18,11 @@
 #include "support/every_target.h"
 #include "support/row_call.h"
 
-// A line for each row of the class, format and kernel or dither matrix: what comes out of calls with seeded
-// arguments, down to the padding of the rows, as one number; and a line for each row and kernel or matrix of
-// very tall and very wide pictures. It is the same on every machine and for every instruction set. Without an
-// argument the lines are printed; with the name of a file they are compared to its lines, with a number N
-// behind it only every N-th one of them.
+// A line for each row of the class and kernel or dither matrix: what comes out of calls with seeded
+// arguments, down to the padding of the rows, as one number for each format, and a last one for very tall and
+// very wide pictures. They are the same on every machine and for every instruction set. Without an argument
+// the lines are printed; with the name of a file they are compared to its lines, with a number N behind it
+// only every N-th number.
 
 /// The one thing that differs from system to system: the numbers of the C library.
 static std::uint32_t RandomState;
@@ -298,57 +299,77 @@ bool TakesTooLong(const MethodEntry& row, const Shape& shape) {
   return row.LowerName == "rotate" && shape.Height > 10000;
 }
 
-/// Every n-th line.
-std::vector<std::string> Lines(int every = 1) {
-  std::vector<std::string> lines;
+/// Calls body(line, format, sum) for every n-th sum in the order of the file; the format is 0 for extreme
+/// pictures.
+template <class Body>
+void ForSums(int every, Body&& body) {
   int number = 0;
-  const auto add = [&](const MethodEntry& row, int chosen, Format format, std::span<const Shape> shapes,
-                       const char* what) {
-    if (number++ % every != 0) return;
-    Checksum sum;
-    for (std::size_t i = 0; i < shapes.size(); ++i)
-      if (!TakesTooLong(row, shapes[i])) AddCall(sum, row, format, chosen, shapes[i], int(i));
-    char line[120];
-    std::snprintf(line, sizeof line, "%s %d %d%s %08x", KeyOf(row).c_str(), chosen, int(format), what,
-                  unsigned(sum.Folded()));
-    lines.push_back(line);
-  };
   std::size_t extremes = 0;
   for (const MethodEntry& row : model::ClassNamed("PictureZOR").Methods) {
     if (DependsOnTheMachine(row)) continue;
-    for (const int chosen : ChoicesOf(row))
-      for (const Format format : EveryFormat()) add(row, chosen, format, Ordinary, "");
-    for (const int chosen : ChoicesOf(row))
-      add(row, chosen, ExtremeFormats[extremes++ % std::size(ExtremeFormats)], Extreme, " extreme");
+    for (const int chosen : ChoicesOf(row)) {
+      const std::string line = KeyOf(row) + " " + std::to_string(chosen);
+      const auto add = [&](Format format, Format named, std::span<const Shape> shapes) {
+        if (number++ % every != 0) return;
+        Checksum sum;
+        for (std::size_t i = 0; i < shapes.size(); ++i)
+          if (!TakesTooLong(row, shapes[i])) AddCall(sum, row, format, chosen, shapes[i], int(i));
+        body(line, int(named), sum.Folded());
+      };
+      for (const Format format : EveryFormat()) add(format, format, Ordinary);
+      add(ExtremeFormats[extremes++ % std::size(ExtremeFormats)], Format::Unknown, Extreme);
+    }
   }
-  return lines;
 }
 
-std::string KeyOf(const std::string& line) { return line.substr(0, line.rfind(' ')); }
+void Print() {
+  ForSums(1, [](const std::string& line, int format, std::uint32_t sum) {
+    if (format == 1) std::fputs(line.c_str(), stdout);
+    std::printf(" %08x", unsigned(sum));
+    if (format == 0) std::puts("");
+  });
+}
+
+/// The sums of a file by their lines and formats.
+std::map<std::pair<std::string, int>, std::uint32_t> Read(const char* file) {
+  std::map<std::pair<std::string, int>, std::uint32_t> sums;
+  std::ifstream in(file);
+  for (std::string text; std::getline(in, text);) {
+    std::istringstream words(text);
+    std::string name, chosen;
+    words >> name >> chosen >> std::hex;
+    std::vector<Format> formats = EveryFormat();
+    formats.push_back(Format::Unknown);
+    std::uint32_t sum;
+    for (std::size_t i = 0; i < formats.size() && words >> sum; ++i)
+      sums[{name + " " + chosen, int(formats[i])}] = sum;
+  }
+  return sums;
+}
 
 int Compare(const char* file, int every) {
-  std::map<std::string, std::string> wanted;
-  std::ifstream in(file);
-  for (std::string line; std::getline(in, line);) wanted[KeyOf(line)] = line;
-  int failures = 0;
-  std::size_t compared = 0;
+  const auto wanted = Read(file);
+  std::size_t failures = 0, compared = 0;
   const zor::Target best = TargetOfModule();
   for (int target = 0; target <= int(best); ++target) {
     TargetOfModule() = zor::Target(target);
-    const std::vector<std::string> lines = Lines(every);
-    compared += lines.size();
-    // A row that is gone shows by the lines that are left over.
-    if (every == 1 && lines.size() != wanted.size()) {
+    std::size_t known = 0;
+    ForSums(every, [&](const std::string& line, int format, std::uint32_t sum) {
+      ++compared;
+      const auto found = wanted.find({line, format});
+      known += found != wanted.end();
+      if (found != wanted.end() && found->second == sum) return;
+      if (++failures <= 40)
+        std::cout << "target " << target << ": " << line << ", "
+                  << (format ? "format " + std::to_string(format) : "extreme pictures") << "\n";
+    });
+    // A row that is gone shows by what is left over.
+    if (every == 1 && known != wanted.size()) {
       ++failures;
-      std::cout << lines.size() << " lines, " << wanted.size() << " in the file\n";
-    }
-    for (const std::string& line : lines) {
-      const auto found = wanted.find(KeyOf(line));
-      if (found != wanted.end() && found->second == line) continue;
-      if (++failures <= 40) std::cout << "target " << target << ": " << line << "\n";
+      std::cout << wanted.size() - known << " sums of the file are of no row\n";
     }
   }
-  std::cout << compared << " lines compared for " << int(best) + 1 << " instruction sets, " << failures
+  std::cout << compared << " sums compared for " << int(best) + 1 << " instruction sets, " << failures
             << " differ\n";
   if (failures) std::cout << "Where results were meant to change: scripts/checksums writes the file anew.\n";
   return failures > 0 || compared == 0;
@@ -361,5 +382,5 @@ int main(int count, char** arguments) {
   using namespace picturezor;
   Host::Load(PICTUREZOR_MODULE);
   if (count > 1) return Compare(arguments[1], count > 2 ? std::max(std::atoi(arguments[2]), 1) : 1);
-  for (const std::string& line : Lines()) std::cout << line << "\n";
+  Print();
 }
