@@ -23,17 +23,15 @@ Picture Load(const Input& input) {
 
 void Save(Output& output, const FileType& type, const Picture& picture) {
   const std::filesystem::path& file = output.Target();
+  if (!HasColours(picture)) throw Failure(file, "the picture has no colours");
   ImageInfo info;
   info.Width = picture.Width();
   info.Height = picture.Height();
   info.Pixels = StorableFormat(file, type, FileFormatOf(picture));
   RequireStorableSize(file, type, info.Width, info.Height);
   const auto writer = type.Create(output.Descriptor(), file, info, {});
-  for (std::int32_t y = 0; y < info.Height; ++y) {
-    const Bytes row = picture.RowInFormat(y, info.Pixels);
-    if (row.empty()) throw Failure(file, "a row of the picture can't be reached");
-    writer->WriteRow(row.data());
-  }
+  Silence silent;
+  WriteFrom(picture, *writer, info.Pixels, silent);
   writer->Finish();
   output.Commit();
 }

@@ -233,8 +233,10 @@ void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress) {
   reader.Finish();
 }
 
+bool HasColours(const Picture& picture) { return picture.IsGray() || picture.IsRGB() || picture.IsCMYK(); }
+
 Format FileFormatOf(const Picture& picture) {
-  if (!picture.IsGray() && !picture.IsRGB() && !picture.IsCMYK()) throw Failure("the picture has no colours");
+  if (!HasColours(picture)) throw Failure("the picture has no colours");
   const Format colours = picture.IsGray() ? Format::G : picture.IsRGB() ? Format::RGB : Format::CMYK;
   return picture.HasAlpha() ? WithAlpha(colours) : colours;
 }

@@ -51,6 +51,7 @@ std::uint8_t* RowOf(const Picture& picture, std::int32_t y);
 Rect Stored(const Rect& upright, const ImageInfo& info);
 /// Reads all rows into a picture of the upright size and the file's format.
 void ReadInto(const Picture& picture, ImageReader& reader, Progress& progress);
+bool HasColours(const Picture& picture);
 /// The format of files that has a picture's colours and alpha. Throws Failure for one without colours.
 Format FileFormatOf(const Picture& picture);
 /// Whether there is a way from a picture's format to a file's.

@@ -7,6 +7,9 @@ namespace picturezor::tests {
 
 namespace {
 
+using testing::HasSubstr;
+using testing::ThrowsMessage;
+
 class EmbeddedFiles : public CommandTest {
  protected:
   void SetUp() override { Host::Load(PICTUREZOR_MODULE); }
@@ -52,12 +55,17 @@ TEST_F(EmbeddedFiles, BecomePicturesOfTheHost) {
 
 TEST_F(EmbeddedFiles, SayWhatCantBeDone) {
   EXPECT_THROW(LoadImage(At("none.png")), std::runtime_error);
-  EXPECT_THROW(SaveImage(At("a.png"), Picture()), std::runtime_error);
-  EXPECT_THROW(SaveImage(At("a.png"), HostPicture()), std::runtime_error);
-  EXPECT_THROW(SaveImage(At("a.png"), NoisePicture(Format::CMYK)), std::runtime_error);
-  EXPECT_THROW(SaveImage(At("a.png"), NoisePicture(Format::Scaling3)), std::runtime_error);
-  EXPECT_THROW(SaveImage(At("a.gif"), NoisePicture(Format::G)), std::runtime_error);
-  EXPECT_THROW(SaveImage(At("no/a.png"), NoisePicture(Format::G)), std::runtime_error);
+  const auto save = [&](const char* name, const auto& picture) {
+    return [=, this] { SaveImage(At(name), picture); };
+  };
+  const std::function<void()> failures[] = {save("a.png", Picture()),
+                                            save("a.png", HostPicture()),
+                                            save("a.png", NoisePicture(Format::CMYK)),
+                                            save("a.png", NoisePicture(Format::Scaling3)),
+                                            save("a.gif", NoisePicture(Format::G)),
+                                            save("no/a.png", NoisePicture(Format::G))};
+  for (const auto& failure : failures)
+    EXPECT_THAT(failure, ThrowsMessage<std::runtime_error>(HasSubstr(At("").string())));
   EXPECT_THROW(EncodeImage("gif", NoisePicture(Format::G)), std::runtime_error);
   EXPECT_THROW(DecodeImage({}), std::runtime_error);
   const Bytes png = EncodeImage("png", NoisePicture(Format::G));
