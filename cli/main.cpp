@@ -1,3 +1,4 @@
+#include <malloc.h>
 #include <unistd.h>
 
 #include <CLI/CLI.hpp>
@@ -22,7 +23,18 @@ std::string See(const CLI::App& app) {
   return " (see picturezor" + command + " --help)";
 }
 
+/// Bands of rows, some megabytes each, come and go on all threads. By default the allocator takes each from
+/// the system and gives it back, and so every page is cleared and faulted in again for every band.
+void KeepBandsForTheNext() {
+#ifdef __GLIBC__
+  mallopt(M_MMAP_THRESHOLD, 32 << 20);
+  mallopt(M_TRIM_THRESHOLD, 64 << 20);
+  mallopt(M_ARENA_MAX, 1);
+#endif
+}
+
 int Run(int count, char** arguments) {
+  KeepBandsForTheNext();
   Session session;
   session.Stores.MemoryLimit = DefaultMemoryLimit();
   session.Stores.TempDirectory = DefaultTempDirectory();

@@ -13,7 +13,7 @@ namespace {
 
 constexpr std::int64_t LeastBytes = 1 << 20;
 /// How many times longer than its margin a band is, at best: what is read twice, and worked on twice.
-constexpr std::int64_t BestLength = 12;
+constexpr std::int64_t BestLength = 8;
 
 std::int64_t SourceBytes(const Shape& shape) { return std::int64_t{shape.Width} * BytesPerPixel(shape.Of); }
 
