@@ -1,5 +1,5 @@
 """What scripts/docs adds to the pages: the README in front, the files of the project that pages link to, the reference
-that scripts/reference has made, and bars beside the figures of a race."""
+that scripts/reference has made, and bars below ratios."""
 
 import pathlib
 import re
@@ -10,6 +10,9 @@ ROOT = pathlib.Path(__file__).resolve().parent.parent
 PLACE = ROOT / "build/docs-extra"
 # A cell of a race: the peer's time, and in parentheses ours divided by it.
 RACE = re.compile(r"^[\d.]+ \(([\d.]+)\)$")
+# A cell of a column of ratios.
+RATIO = re.compile(r"^(\d+\.\d+)$")
+RATIO_HEADS = {"of vips", "of gm", "ratio"}
 LINK = re.compile(r"(!?\[[^\]]*\]\()([^)#\s]+)((?:#[^)\s]*)?\))")
 BAR = '<span class="bar"><span style="width:{:.0f}%" class="{}"></span></span>'
 
@@ -76,19 +79,29 @@ def on_files(files, config):
     return Files([*files, *added])
 
 
-def with_bars(line):
-    cells = line.split("|")
-    for i, cell in enumerate(cells):
-        if found := RACE.match(cell.strip()):
-            ratio = float(found[1])
-            # A full bar is the peer's time; ours in it.
-            cells[i] = f" {cell.strip()}{BAR.format(min(ratio, 1) * 100, 'ahead' if ratio <= 1 else 'behind')} "
-    return "|".join(cells)
+def with_bars(text):
+    """Tables with a bar below each ratio: a full one is the peer's time, and ours in it."""
+    lines, ratios = [], None
+    for line in text.split("\n"):
+        if not line.startswith("|"):
+            ratios = None
+            lines.append(line)
+            continue
+        cells = line.split("|")
+        if ratios is None:  # The head of a table; at times it says for all columns what they are.
+            every = "ratio to" in cells[1]
+            ratios = {i for i, cell in enumerate(cells[2:], 2) if every or cell.strip().lower() in RATIO_HEADS}
+        for i, cell in enumerate(cells):
+            if found := RACE.match(cell.strip()) or (RATIO.match(cell.strip()) if i in ratios else None):
+                ratio = float(found[1])
+                cells[i] = f" {cell.strip()}{BAR.format(min(ratio, 1) * 100, 'ahead' if ratio <= 1 else 'behind')} "
+        lines.append("|".join(cells))
+    return "\n".join(lines)
 
 
 def on_page_markdown(markdown, page, **_):
     folder = ROOT if page.file.src_path in {"index.md", "contributing.md"} else (ROOT / "docs" / page.file.src_path).parent
     text = moved_links(markdown, folder)
     if page.file.src_path == "performance.md":
-        text = "\n".join(with_bars(line) if line.startswith("|") else line for line in text.split("\n"))
+        text = with_bars(text)
     return text

@@ -302,7 +302,7 @@ def to_pil(self) -> Any:
         raise _core.Error(f"Pillow has no picture like {self!r}")
     mode = ("L" if self.is_gray else "RGB" if self.is_rgb else "CMYK") + ("A" if self.has_alpha else "")
     format = {"L": "G", "LA": "GA"}.get(mode, mode)
-    if self.image_format_string == format:
+    if self.image_format.name == format:
         return Image.fromarray(self.to_array(), mode)
     return Image.frombytes(mode, (self.width, self.height), self.data_string_in_format(format))
 

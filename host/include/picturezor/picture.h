@@ -80,8 +80,8 @@ enum class Format : std::int32_t {
 int BytesPerPixel(Format format);
 
 /// What pixels are weighed by when an image is scaled, with the reach on either side in pixels of the coarser
-/// of the two: Triangle 1 (bilinear), Box 0.5 (the mean of an area), Lanczos3 3, Lanczos8 8, Mitchell, Poly3
-/// and Cubic 2.
+/// of the two: Triangle 1 (bilinear), Box 0.5 (the mean of an area), Lanczos3 and Cubic 3, Lanczos8 8, Mitchell
+/// and Poly3 2.
 enum class Kernel : std::int32_t { Triangle = 1, Box, Lanczos3, Lanczos8, Mitchell, Poly3, Cubic };
 
 /// The threshold matrices of `DitherFilter`, named after their kind and size.
