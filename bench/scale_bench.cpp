@@ -10,6 +10,8 @@ namespace {
 constexpr Sizes AllSizes[] = {{"to a quarter", 4000, 3000, 1000, 750},
                               {"to three quarters", 4000, 3000, 3000, 2250},
                               {"up by 4", 1000, 750, 4000, 3000}};
+/// Icons: what a call costs whatever the size.
+constexpr Sizes SmallSizes[] = {{"24 x 24 to a half", 24, 24, 12, 12}, {"24 x 24 up by 2", 24, 24, 48, 48}};
 constexpr std::pair<const char*, Kernel> Kernels[] = {
     {"triangle", Kernel::Triangle},  {"box", Kernel::Box},           {"Lanczos 3", Kernel::Lanczos3},
     {"Lanczos 8", Kernel::Lanczos8}, {"Mitchell", Kernel::Mitchell}, {"poly3", Kernel::Poly3},
@@ -41,6 +43,12 @@ Contender Mapped(Kernel kernel, const Sizes& sizes) {
 }
 
 const auto registered = [] {
+  for (const Sizes& sizes : SmallSizes) {
+    std::vector<Contender> contenders = ScalePeers(Format::RGB, Kernel::Lanczos3, sizes);
+    contenders.insert(contenders.begin(), Ours("PictureZOR", Format::RGB, Kernel::Lanczos3, sizes, 1));
+    AddRace("scale", std::string("RGB ") + sizes.Name + ", Lanczos 3", std::move(contenders),
+            double(sizes.IntoWidth) * sizes.IntoHeight);
+  }
   for (const auto& [formatName, format] : Formats)
     for (const Sizes& sizes : AllSizes)
       for (const auto& [kernelName, kernel] : Kernels) {

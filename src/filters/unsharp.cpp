@@ -46,7 +46,8 @@ struct WholePush {
   struct Hair {
     std::int16_t Difference = 256, From = 0;
   };
-  static constexpr int MostHairs = 12;
+  /// Most factors that have any have few.
+  static constexpr int FewHairs = 4, MostHairs = 12;
   std::array<Hair, MostHairs> Hairs{};
   int HairCount = 0;
   /// From the first, the lowest, to the highest.
@@ -155,8 +156,12 @@ void PushBlocks(Sample* samples, const Sample* beside, const Sample* mask, std::
     std::uint16_t found = 0;
     for (std::ptrdiff_t i = at; i < end; ++i)
       found |= std::uint16_t(std::uint16_t(samples[i] - beside[i] - lowest) <= reach);
-    found ? PushRunWhole<WholePush::MostHairs>(samples + at, beside + at, mask + at, end - at, push)
-          : PushRunWhole<0>(samples + at, beside + at, mask + at, end - at, push);
+    if (!found)
+      PushRunWhole<0>(samples + at, beside + at, mask + at, end - at, push);
+    else if (push.HairCount <= WholePush::FewHairs)
+      PushRunWhole<WholePush::FewHairs>(samples + at, beside + at, mask + at, end - at, push);
+    else
+      PushRunWhole<WholePush::MostHairs>(samples + at, beside + at, mask + at, end - at, push);
   }
 }
 

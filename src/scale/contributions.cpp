@@ -15,8 +15,10 @@ namespace {
 /// over and over, and a sine costs more than all that is done with it.
 class KnownValues {
  public:
-  explicit KnownValues(ScaleKernel kernel) : Kernel(kernel) {
-    for (Known& known : Values) known.Distance = -1.0;
+  /// For a table of a few lines few are kept, since all have to be made empty first.
+  KnownValues(ScaleKernel kernel, std::int32_t lines)
+      : Kernel(kernel), SizeBits(std::clamp(int(std::bit_width(std::uint32_t(lines))) + 3, 4, MostSizeBits)) {
+    for (int i = 0; i < 1 << SizeBits; ++i) Values[i].Distance = -1.0;
   }
   bool At(double a, double& value) {
     // Distances of one ratio differ in high bits or in low ones.
@@ -36,9 +38,10 @@ class KnownValues {
     double Distance, Value;
     bool InReach;
   };
+  static constexpr int MostSizeBits = 10;
   ScaleKernel Kernel;
-  static constexpr int SizeBits = 10;
-  Known Values[1 << SizeBits];
+  int SizeBits;
+  Known Values[1 << MostSizeBits];
 };
 
 /// Whether a position is a whole number of 2^-20 source lines. The differences of such positions are too, and
@@ -65,7 +68,7 @@ class ContributionTable::Filler {
         Scale(scale),
         Width(scale < 1.0 ? SearchRadius(kernel) / scale : SearchRadius(kernel)),
         Shrinks(scale < 1.0),
-        Values(kernel) {
+        Values(kernel, table.LineCount) {
     const std::int32_t common = std::gcd(table.LineCount, sourceCount);
     Period = table.LineCount / common;
     SourcePeriod = sourceCount / common;

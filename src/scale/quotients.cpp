@@ -1,12 +1,18 @@
 #include "scale/quotients.h"
 
 #include <algorithm>
+#include <bit>
 #include <cmath>
 #include <limits>
 #include <numeric>
 
 namespace zor {
 namespace {
+
+/// A number times 2^bits. The tables of small pictures spend their time on it, and `ldexp` is a call.
+double Times2To(int bits, double number) {
+  return number * std::bit_cast<double>(std::uint64_t(1023 + bits) << 52);
+}
 
 constexpr double LatticeUnit = 4096.0;  // 2^12 multiples make 1
 constexpr float Disturbing = 0x1p-26F;
@@ -51,7 +57,7 @@ struct Rounding {
 /// grow by so much that one could reach the next whole number.
 template <class Put>
 bool RoundShares(const Contribution& line, const Lattice& lattice, const Rounding& rounding, Put&& put) {
-  const double one = std::ldexp(1.0, rounding.Bits);
+  const double one = Times2To(rounding.Bits, 1.0);
   std::int64_t sum = 0;
   Multiple(line.Sum, sum);
   double tooLarge = 0.0, positive = 0.0, negative = 0.0;
@@ -187,7 +193,7 @@ struct LineDigits {
   bool SetTops(int bits) const {
     std::int32_t first = 0, end = 0;
     for (std::int32_t i = 0; i < Line.Count; ++i) {
-      if (std::ldexp(std::fabs(ShareOf(i)), bits) <= MostDigit) continue;
+      if (Times2To(bits, std::fabs(ShareOf(i))) <= MostDigit) continue;
       if (end == 0) first = Slot(i);
       end = Slot(i) + 1;
     }
@@ -213,12 +219,12 @@ struct Bounds {
 /// only the third digits have been added.
 bool Fits(double size, int bits) {
   constexpr double ofThird = SlotLine::MostTops * LinesInSlot * 255.0 * (1 << (SlotLine::TopShift - 1));
-  return std::ldexp((size + 0.1) * 255.0, bits) + ofThird < 0x1p31;
+  return Times2To(bits, (size + 0.1) * 255.0) + ofThird < 0x1p31;
 }
 
 /// What the third digits of a line cost, and its doubts with so many bits, by and large: in cycles a vector.
 double CostOf(const LineDigits& digits, int bits) {
-  return 5.0 * digits.Made.TopCount + std::ldexp(2000.0 * 64.0 * digits.Line.Count, -bits);
+  return 5.0 * digits.Made.TopCount + Times2To(-bits, 2000.0 * 64.0 * digits.Line.Count);
 }
 
 /// The number of bits from `least` to `most` that costs least; with third digits where a few shares are much
@@ -248,12 +254,12 @@ bool MakeAllDigits(const LineDigits& digits, int bits, double size) {
   const Contribution& line = digits.Line;
   SlotLine& made = digits.Made;
   int lowBits = MostLowBits;
-  while (lowBits > 0 && !(std::ldexp(line.Count * 255.0, lowBits - 1) < 0x1p31)) --lowBits;
+  while (lowBits > 0 && !(Times2To(lowBits - 1, line.Count * 255.0) < 0x1p31)) --lowBits;
   Shares coarse, fine;
   for (std::int32_t i = 0; i < line.Count; ++i) {
-    const double exact = std::ldexp(digits.ShareOf(i), bits);
+    const double exact = Times2To(bits, digits.ShareOf(i));
     const std::int32_t share = Rounded(exact);
-    const double rest = std::ldexp(exact - share, lowBits);
+    const double rest = Times2To(lowBits, exact - share);
     const std::int32_t digit = Rounded(rest);
     digits.PutHigh(i, share);
     digits.PutLow(i, digit);
@@ -268,7 +274,7 @@ bool MakeAllDigits(const LineDigits& digits, int bits, double size) {
   while (fineBits < std::min(MostBits, bits + lowBits) && Fits(size, fineBits + 1)) ++fineBits;
   made.Left = fineBits - bits;
   made.Right = lowBits - made.Left;
-  const Bounds fineDoubt(fine, std::ldexp(1.0, -made.Right));
+  const Bounds fineDoubt(fine, Times2To(-made.Right, 1.0));
   // Cutting off to the right takes away less than one.
   made.FineStart = fineDoubt.TooSmall + 1;
   made.FineGap = fineDoubt.Both() + 1;
@@ -301,7 +307,7 @@ void MakeDigits(const Contribution& line, SlotLine::Digits* digits, SlotLine& ma
   int most = MostBits;
   while (!Fits(size, most)) --most;
   int least = most;
-  while (std::ldexp(largest, least) > MostDigit) --least;
+  while (Times2To(least, largest) > MostDigit) --least;
   const Lattice lattice = LatticeOf(line);
   made.Plain = false;
   if (MakeOnLattice(of, lattice, least)) return;
