@@ -1,20 +1,15 @@
 #pragma once
-#include <algorithm>
 #include <condition_variable>
 #include <deque>
 #include <exception>
 #include <functional>
 #include <memory>
 #include <mutex>
-#include <thread>
 #include <vector>
 
-namespace picturezor::files {
+#include "worker_threads.h"
 
-/// The threads that an option asks for: 0 stands for one a processor.
-inline int ThreadsFor(int asked) {
-  return asked > 0 ? asked : std::max(1, int(std::thread::hardware_concurrency()));
-}
+namespace picturezor::files {
 
 /// Work on several threads whose results come out in the order in which it was put in. The caller's thread is
 /// one of them: it works while it would wait. Jobs begin in order, so one may wait for what an earlier one
@@ -46,7 +41,7 @@ class Conveyor {
     Changed.notify_all();
     // A single job is done by who waits for it.
     if (Places.size() > 1 && Threads.empty())
-      for (int i = 1; i < Most; ++i) Threads.emplace_back([this, i] { Serve(i); });
+      for (int i = 1; i < Most; ++i) Threads.push_back(StartThread([this, i] { Serve(i); }));
   }
 
   /// The oldest job, done. Throws what its work threw.

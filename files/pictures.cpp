@@ -36,9 +36,7 @@ std::string SizeText(const PictureSize& size) {
 }
 
 /// Bytes in memory, whatever the size.
-std::int64_t MemoryOf(const PictureSize& size) {
-  return (std::int64_t{size.Width} * BytesPerPixel(size.Of) + 63) / 64 * 64 * size.Height;
-}
+std::int64_t MemoryOf(const PictureSize& size) { return (size.RowBytes() + 63) / 64 * 64 * size.Height; }
 
 /// Of fewer bytes nobody has to ask whether there is room.
 constexpr std::int64_t FewBytes = 16 << 20;
@@ -47,7 +45,7 @@ constexpr std::int64_t MostOfItsOwn = INT32_MAX, MostOfBlocks = sizeof(void*) > 
 
 Picture MakeMapped(const PictureSize& size, const std::filesystem::path& directory) {
   const std::int64_t page = std::max<std::int64_t>(sysconf(_SC_PAGESIZE), 4096);
-  const std::int64_t row = (std::int64_t{size.Width} * BytesPerPixel(size.Of) + page - 1) / page * page;
+  const std::int64_t row = (size.RowBytes() + page - 1) / page * page;
   const std::int64_t bytes = row * size.Height + page;
   RequireRoom(directory, bytes, size);
   const int nameless = NamelessFile(directory);

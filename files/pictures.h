@@ -29,6 +29,9 @@ std::int64_t DefaultMemoryLimit();
 struct PictureSize {
   std::int32_t Width = 0, Height = 0;
   Format Of = Format::Unknown;
+
+  /// Of its pixels, without a gap.
+  std::int64_t RowBytes() const { return std::int64_t{Width} * BytesPerPixel(Of); }
 };
 
 /// Throws Failure where the disk under a directory has no room for a temporary file of so many bytes for

@@ -12,6 +12,8 @@
 #include <cstdlib>
 #include <cstring>
 #include <mutex>
+#include <random>
+#include <string_view>
 #include <utility>
 
 #include "failure.h"
@@ -105,6 +107,24 @@ std::filesystem::path DefaultTempDirectory() {
   return named && *named ? named : "/var/tmp";
 }
 
+template <class Make>
+int OutputFile::WithNewName(Make&& make) {
+  constexpr std::string_view letters = "abcdefghijklmnopqrstuvwxyz0123456789";
+  std::random_device random;
+  const SignalsHeldBack held;
+  for (;;) {
+    // Short, since a name may be as long as the system allows already.
+    std::string name = (Real.parent_path() / TemporaryPrefix).string();
+    for (int i = 0; i < 6; ++i) name += letters[random() % letters.size()];
+    if (const int made = make(name.c_str()); made >= 0) {
+      Temporary = name;
+      RemoveOnDeath(Temporary);
+      return made;
+    }
+    if (errno != EEXIST) throw Failure(Name, std::strerror(errno));
+  }
+}
+
 OutputFile::OutputFile(const std::filesystem::path& target) : Output(target), Real(target) {
   std::error_code failed;
   // What a link points to is replaced, not the link.
@@ -120,14 +140,9 @@ OutputFile::OutputFile(const std::filesystem::path& target) : Output(target), Re
   const std::filesystem::path directory = Real.has_parent_path() ? Real.parent_path() : ".";
   // Not every file system has files without a name, and there is one way only to name them later.
   if (access(OpenFiles, X_OK) == 0) File = open(directory.c_str(), O_TMPFILE | O_RDWR | O_CLOEXEC, 0666);
-  if (File < 0) {
-    const SignalsHeldBack held;
-    const std::string name = FreeName();
-    File = open(name.c_str(), O_CREAT | O_EXCL | O_RDWR | O_CLOEXEC, 0666);
-    if (File < 0) throw Failure(target, std::strerror(errno));
-    Temporary = name;
-    RemoveOnDeath(Temporary);
-  }
+  if (File < 0)
+    File =
+        WithNewName([](const char* name) { return open(name, O_CREAT | O_EXCL | O_RDWR | O_CLOEXEC, 0666); });
   if (there && fchmod(File, about.st_mode & 07777) != 0) {
     // A file system without permissions has none to set.
   }
@@ -139,29 +154,12 @@ OutputFile::~OutputFile() {
   KeepOnDeath(Temporary);
 }
 
-std::string OutputFile::FreeName() const {
-  // Short, since a name may be as long as the system allows already. That of a file that is made and goes
-  // away again is free.
-  std::string name = (Real.parent_path() / ".picturezor-XXXXXX").string();
-  const int place = mkostemp(name.data(), O_CLOEXEC);
-  if (place < 0) throw Failure(Name, std::strerror(errno));
-  close(place);
-  unlink(name.c_str());
-  return name;
-}
-
-void OutputFile::GetName() {
-  const std::string file = OpenFiles + std::to_string(File);
-  const SignalsHeldBack held;
-  const std::string name = FreeName();
-  if (linkat(AT_FDCWD, file.c_str(), AT_FDCWD, name.c_str(), AT_SYMLINK_FOLLOW) != 0)
-    throw Failure(Name, std::strerror(errno));
-  Temporary = name;
-  RemoveOnDeath(Temporary);
-}
-
 void OutputFile::Commit() {
-  if (Temporary.empty()) GetName();
+  if (Temporary.empty()) {
+    const std::string file = OpenFiles + std::to_string(File);
+    WithNewName(
+        [&](const char* name) { return linkat(AT_FDCWD, file.c_str(), AT_FDCWD, name, AT_SYMLINK_FOLLOW); });
+  }
   const int file = std::exchange(File, -1);
   if (close(file) != 0) throw Failure(Name, std::strerror(errno));
   if (rename(Temporary.c_str(), Real.c_str()) != 0) throw Failure(Name, std::strerror(errno));

@@ -32,6 +32,10 @@ class SignalsHeldBack {
 /// $TMPDIR, or /var/tmp, which lies on a disk where /tmp may lie in memory.
 std::filesystem::path DefaultTempDirectory();
 
+/// What the names of files begin with that are on their way to another name. A run that is killed at that
+/// very moment leaves one.
+inline constexpr const char* TemporaryPrefix = ".picturezor-";
+
 /// A file that comes to stand under its target's name when it is complete, and not before. Until then it has
 /// no name where the file system allows that, or one of its own beside the target, and goes away with this
 /// object.
@@ -43,8 +47,9 @@ class OutputFile final : public Output {
   void Commit() override;
 
  private:
-  std::string FreeName() const;
-  void GetName();
+  /// Calls make(a name beside the target), and gets its descriptor or 0, until there was no such file.
+  template <class Make>
+  int WithNewName(Make&& make);
 
   std::filesystem::path Real, Temporary;
 };

@@ -15,7 +15,7 @@
 #include <utility>
 
 #include "failure.h"
-#include "threads.h"
+#include "worker_threads.h"
 
 namespace picturezor::flow {
 
@@ -65,9 +65,7 @@ struct ArrivingPicture::Cursor {
 };
 
 ArrivingPicture::ArrivingPicture(const RowSource& rows, int readers)
-    : From(rows),
-      RowBytes(std::int64_t{rows.Of.Width} * BytesPerPixel(rows.Of.Of)),
-      RowSize(RoundedUp(RowBytes, RowUnit)) {
+    : From(rows), RowBytes(rows.Of.RowBytes()), RowSize(RoundedUp(RowBytes, RowUnit)) {
   try {
     Reserve(rows.Anywhere ? std::max(readers, 1) : 1);
     const std::span<std::uint8_t> all(Range, std::size_t(TotalBytes));
@@ -77,7 +75,8 @@ ArrivingPicture::ArrivingPicture(const RowSource& rows, int readers)
     // The first rows are wanted for certain.
     Cursors.front()->Wanted = 0;
     Cursors.front()->Used = ++Touches;
-    for (const auto& cursor : Cursors) cursor->Thread = StartThread([this, &own = *cursor] { Run(own); });
+    for (const auto& cursor : Cursors)
+      cursor->Thread = files::StartThread([this, &own = *cursor] { Run(own); });
   } catch (...) {
     Release();
     throw;

@@ -25,10 +25,11 @@ bool BandChain::KeepsSource() const {
 }
 
 std::int64_t BandChain::BytesOfRow() const {
-  const auto bytes = [](const Shape& shape) { return std::int64_t{shape.Width} * BytesPerPixel(shape.Of); };
-  std::int64_t most = bytes(Source());
-  for (std::size_t i = 0; i < Chain.size(); ++i)
-    most = std::max({most, bytes(Shapes[i]) * Chain[i]->Pictures(), bytes(Shapes[i]) + bytes(Shapes[i + 1])});
+  std::int64_t most = Source().RowBytes();
+  for (std::size_t i = 0; i < Chain.size(); ++i) {
+    const std::int64_t from = Shapes[i].RowBytes(), to = Shapes[i + 1].RowBytes();
+    most = std::max({most, from * Chain[i]->Pictures(), from + to});
+  }
   return most;
 }
 

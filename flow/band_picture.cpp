@@ -11,7 +11,7 @@
 
 #include "failure.h"
 #include "rows.h"
-#include "threads.h"
+#include "worker_threads.h"
 
 namespace picturezor::flow {
 
@@ -161,7 +161,7 @@ void ApplyBands(const Picture& source, const Rect& part, const BandChain& chain,
   } join{bands, workers};
   try {
     for (int i = 1; i < threads; ++i)
-      workers.push_back(StartThread([&bands, i] { bands.Work(std::size_t(i)); }));
+      workers.push_back(files::StartThread([&bands, i] { bands.Work(std::size_t(i)); }));
   } catch (const std::system_error&) {
     // Those that could be made do it.
   }

@@ -5,7 +5,7 @@
 #include <system_error>
 
 #include "failure.h"
-#include "threads.h"
+#include "worker_threads.h"
 
 namespace picturezor::flow {
 
@@ -14,8 +14,6 @@ namespace {
 constexpr std::int64_t LeastBytes = 1 << 20;
 /// How many times longer than its margin a band is, at best: what is read twice, and worked on twice.
 constexpr std::int64_t BestLength = 8;
-
-std::int64_t SourceBytes(const Shape& shape) { return std::int64_t{shape.Width} * BytesPerPixel(shape.Of); }
 
 /// A view as a picture of its own.
 Picture Packed(Picture result, const Shape& shape) {
@@ -33,7 +31,7 @@ BandSizes ChooseBands(const BandChain& chain, int threads, std::int64_t memory) 
   BandSizes sizes{1, threads + 2};
   const std::int64_t rowBytes = std::max<std::int64_t>(chain.BytesOfRow(), 1);
   const std::int64_t most = memory / sizes.InFlight / rowBytes - chain.Margin();
-  const std::int64_t best = std::max(LeastBytes / std::max<std::int64_t>(SourceBytes(chain.Source()), 1),
+  const std::int64_t best = std::max(LeastBytes / std::max<std::int64_t>(chain.Source().RowBytes(), 1),
                                      chain.Margin() * BestLength);
   sizes.Rows = std::int32_t(std::clamp<std::int64_t>(std::min(most, best), 1, chain.Result().Height));
   return sizes;
@@ -43,8 +41,9 @@ BandRows::BandRows(const RowSource& source, const BandChain& chain, int threads,
                    std::int64_t first)
     : Rows(chain.Result()), From(source), Chain(chain), Sizes(sizes), FirstRow(first), NextRow(first) {
   try {
-    Threads.push_back(StartThread([this] { ReadAhead(); }));
-    for (int i = 0; i < threads && !Chain.Empty(); ++i) Threads.push_back(StartThread([this] { Work(); }));
+    Threads.push_back(files::StartThread([this] { ReadAhead(); }));
+    for (int i = 0; i < threads && !Chain.Empty(); ++i)
+      Threads.push_back(files::StartThread([this] { Work(); }));
   } catch (const std::system_error&) {
     // Those that could be made do it.
     if (Threads.size() < (Chain.Empty() ? 1 : 2)) {
@@ -112,7 +111,7 @@ Picture BandRows::SourcePicture(std::int32_t rows) {
 
 Picture BandRows::ReadBand(RowRange rows, std::int64_t nextFirst) {
   const Picture picture = SourcePicture(std::int32_t(rows.Count()));
-  const std::int64_t rowBytes = SourceBytes(From.Of), rowSize = picture.RowSize();
+  const std::int64_t rowBytes = From.Of.RowBytes(), rowSize = picture.RowSize();
   std::uint8_t* const samples = RowOf(picture, 0);
   const auto at = [&](std::int64_t row) { return samples + (row - rows.First) * rowSize; };
   for (std::int64_t row = rows.First, kept = 0; row < RowsRead; ++row, kept += rowBytes)

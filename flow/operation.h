@@ -15,6 +15,9 @@ struct Shape {
   std::int32_t Width = 0, Height = 0;
   Format Of = Format::Unknown;
   std::optional<files::Resolution> Density;
+
+  /// Of its pixels, without a gap.
+  std::int64_t RowBytes() const { return std::int64_t{Width} * BytesPerPixel(Of); }
 };
 
 /// How the rows of a result come from those of the source.

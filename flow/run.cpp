@@ -9,8 +9,8 @@
 #include "band_rows.h"
 #include "failure.h"
 #include "in_format.h"
-#include "threads.h"
 #include "turned_rows.h"
+#include "worker_threads.h"
 
 namespace picturezor::flow {
 
@@ -28,11 +28,9 @@ constexpr std::int64_t MostArriving = UINT32_MAX;
 
 using Kind = Dependence::Kind;
 
-std::int64_t BytesOf(const Shape& shape) {
-  return std::int64_t{shape.Width} * shape.Height * BytesPerPixel(shape.Of);
-}
+std::int64_t BytesOf(const Shape& shape) { return shape.RowBytes() * shape.Height; }
 
-int ThreadsOf(const RunOptions& options) { return options.Threads > 0 ? options.Threads : Processors(); }
+int ThreadsOf(const RunOptions& options) { return files::ThreadsFor(options.Threads); }
 
 /// A picture on its way through operations: its rows come one by one, or all of them stand in memory.
 class Stream {
@@ -216,7 +214,7 @@ class Stream {
     std::atomic<bool> done = false;
     std::mutex access;
     std::condition_variable changed;
-    std::thread worker = StartThread([&] {
+    std::thread worker = files::StartThread([&] {
       try {
         Whole = work.Apply(source.Of(), {.Stores = Options.Stores, .Threads = threads});
       } catch (...) {

@@ -16,7 +16,7 @@ namespace picturezor::flow {
 
 Spool::Spool(const files::PictureSize& size, const files::StoreOptions& options)
     : Options(options), File(-1) {
-  const std::int64_t bytes = std::int64_t{size.Width} * BytesPerPixel(size.Of) * size.Height;
+  const std::int64_t bytes = size.RowBytes() * size.Height;
   if (bytes <= options.MemoryLimit) {
     File = memfd_create("picturezor", MFD_CLOEXEC);
     if (File < 0) Fail();

@@ -130,7 +130,7 @@ const Step Scale{
                  .Help =
                      "Start from a reduced image at least twice as large as the result, where the type has\n"
                      "one: JPEG and JPEG 2000 are decoded at a reduced size, TIFF files and slides may\n"
-                     "hold smaller copies. Faster, but not bit-exact"}},
+                     "hold smaller copies. Faster, but not bit-exact; no effect after another step"}},
     .Make = [](const Values& values, const Surroundings&) -> std::unique_ptr<const flow::Operation> {
       if (!values.Has("width") && !values.Has("height") && !values.Has("fit") && !values.Has("percent"))
         throw files::UsageFailure("give --width, --height, --fit or --percent");

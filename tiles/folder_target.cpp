@@ -125,7 +125,8 @@ SharedFolderTarget::SharedFolderTarget(const path& parent, const std::string& na
   if (!std::filesystem::exists(taskName)) {
     for (const auto& entry : std::filesystem::directory_iterator(Unfinished))
       // Another run may be just here, and write the same.
-      if (!entry.path().filename().string().starts_with(".picturezor-") && !std::filesystem::exists(taskName))
+      if (!entry.path().filename().string().starts_with(files::TemporaryPrefix) &&
+          !std::filesystem::exists(taskName))
         throw Failure(Unfinished, "something else is there");
     files::OutputFile file(taskName);
     files::WriteAll(file.Descriptor(), task + "\n", taskName);
@@ -146,6 +147,14 @@ std::unique_ptr<files::Output> SharedFolderTarget::Begin(const std::string& name
     if (mkdir(folder.c_str(), 0777) != 0 && errno != EEXIST) throw Failure(folder, std::strerror(errno));
   }
   return std::make_unique<files::OutputFile>(Unfinished / name);
+}
+
+void SharedFolderTarget::Commit() {
+  std::vector<path> left;
+  for (const auto& entry : std::filesystem::recursive_directory_iterator(Unfinished))
+    if (entry.path().filename().string().starts_with(files::TemporaryPrefix)) left.push_back(entry.path());
+  for (const path& file : left) std::filesystem::remove(file);
+  UnfinishedFolder::Commit();
 }
 
 }

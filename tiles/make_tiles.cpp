@@ -12,9 +12,9 @@
 #include "share.h"
 #include "step.h"
 #include "target.h"
-#include "threads.h"
 #include "tile_pixels.h"
 #include "tile_rows.h"
+#include "worker_threads.h"
 
 namespace picturezor::tiles {
 
@@ -57,7 +57,7 @@ class Maker {
         TileFormat(files::StorableFormat(name + Ending, type, shape.Of)),
         LevelFormat(shape.Of),
         Pixels(shape.Of, TileFormat, options.Background),
-        Threads(options.Running.Threads > 0 ? options.Running.Threads : flow::Processors()),
+        Threads(files::ThreadsFor(options.Running.Threads)),
         Jobs(Threads, [](Job& job, int thread) { job.Work(thread); }) {
     Writing.Threads = 1;
     for (int level = 0; level < Grids.LevelCount(); ++level) {

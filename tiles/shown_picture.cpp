@@ -7,7 +7,7 @@
 #include "box_levels.h"
 #include "failure.h"
 #include "run.h"
-#include "threads.h"
+#include "worker_threads.h"
 
 namespace picturezor::tiles {
 
@@ -43,7 +43,7 @@ ShownPicture::ShownPicture(const Opener& opener, const files::StoreOptions& stor
     if (std::shared_ptr<Plane> plane = FilePlane::Of(opener, size)) Planes.push_back(std::move(plane));
   if (std::shared_ptr<Plane> whole = FilePlane::Of(opener, {Of.Width, Of.Height}))
     Planes.insert(Planes.begin(), std::move(whole));
-  Worker = flow::StartThread([this] { Work(); });
+  Worker = files::StartThread([this] { Work(); });
 }
 
 ShownPicture::~ShownPicture() {

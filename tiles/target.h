@@ -66,6 +66,8 @@ class SharedFolderTarget final : public UnfinishedFolder {
   SharedFolderTarget(const std::filesystem::path& parent, const std::string& name, const std::string& task,
                      bool begins);
   std::unique_ptr<files::Output> Begin(const std::string& name) const override;
+  /// Nobody writes any more: what runs left that were killed is removed.
+  void Commit() override;
   /// What a part, counted from 1, keeps for who joins them.
   std::filesystem::path PartName(std::int32_t part) const {
     return Unfinished / ("part-" + std::to_string(part));

@@ -9,7 +9,7 @@
 
 #include "small_picture.h"
 #include "step_options.h"
-#include "threads.h"
+#include "worker_threads.h"
 
 namespace picturezor::cli {
 
@@ -131,7 +131,7 @@ void Make(Session& session, const Thumbnail& one, int threads) {
 /// Makes all of them, some at a time. What keeps one from being made is kept with it.
 void MakeAll(Session& session, std::vector<Thumbnail>& thumbnails, int asked) {
   KeepMemory();
-  const int processors = flow::Processors();
+  const int processors = files::Processors();
   const int jobs = int(std::min<std::size_t>(std::size_t(asked > 0 ? asked : processors), thumbnails.size()));
   // The jobs share the memory and the processors.
   session.Stores.MemoryLimit /= jobs;
@@ -159,7 +159,7 @@ void MakeAll(Session& session, std::vector<Thumbnail>& thumbnails, int asked) {
     }
   };
   std::vector<std::thread> workers;
-  for (int i = 0; i < jobs; ++i) workers.push_back(flow::StartThread(work));
+  for (int i = 0; i < jobs; ++i) workers.push_back(files::StartThread(work));
   session.Bar.Begin("making", std::int64_t(thumbnails.size()));
   std::unique_lock lock(access);
   for (std::size_t told = 0; told < thumbnails.size();) {

@@ -1,14 +1,15 @@
 #include <libheif/heif.h>
 
+#include <algorithm>
 #include <cstring>
 
-#include "conveyor.h"
 #include "exif.h"
 #include "failure.h"
 #include "handle.h"
 #include "type_module.h"
 #include "whole_reader.h"
 #include "whole_writer.h"
+#include "worker_threads.h"
 
 // AVIF and HEIC: the same boxes around pictures packed as AV1 or HEVC.
 

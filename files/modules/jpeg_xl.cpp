@@ -4,9 +4,9 @@
 #include <jxl/encode.h>
 #include <jxl/thread_parallel_runner.h>
 
+#include <algorithm>
 #include <cstring>
 
-#include "conveyor.h"
 #include "exif.h"
 #include "failure.h"
 #include "handle.h"
@@ -14,6 +14,7 @@
 #include "types/boxes.h"
 #include "whole_reader.h"
 #include "whole_writer.h"
+#include "worker_threads.h"
 
 namespace picturezor::files {
 

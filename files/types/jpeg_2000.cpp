@@ -1,17 +1,18 @@
 #include <openjpeg.h>
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 #include <cstring>
 
 #include "boxes.h"
-#include "conveyor.h"
 #include "exif.h"
 #include "failure.h"
 #include "file_types.h"
 #include "handle.h"
 #include "whole_reader.h"
 #include "whole_writer.h"
+#include "worker_threads.h"
 
 namespace picturezor::files {
 

@@ -7,6 +7,7 @@
 #include <system_error>
 
 #include "failure.h"
+#include "worker_threads.h"
 
 namespace picturezor::files {
 
@@ -106,7 +107,7 @@ Bytes PNGSource::NextOfChunk() {
 Bytes PNGSource::TakeStored() {
   if (!Ahead) return Stored();
   if (!Thread.joinable()) try {
-      Thread = std::thread([this] { UnpackAhead(); });
+      Thread = StartThread([this] { UnpackAhead(); });
     } catch (const std::system_error&) {
       Ahead = false;
       return Stored();

@@ -37,15 +37,20 @@ class SourceRows {
     if (Copies) return work(static_cast<const Sample*>(Copied(y))), true;
     return WithRow(Of, std::int32_t(y), [&](Sample* row) { work(Packing.Packed(row, Line.get())); });
   }
-  /// The same with two rows.
+  /// The same with two rows, of which the first is the upper one.
   template <class Work>
-  bool With(std::int64_t a, std::int64_t b, Work&& work) {
+  bool With(std::int64_t upper, std::int64_t lower, Work&& work) {
     if (Copies)
-      return work(static_cast<const Sample*>(Copied(a)), static_cast<const Sample*>(Copied(b))), true;
-    return Walk(From(Of, std::int32_t(a)), From(Of, std::int32_t(b)))
-        .Rows(1, [&](std::int32_t, Sample* rowA, Sample* rowB) {
-          work(Packing.Packed(rowA, Line.get()), Packing.Packed(rowB, Line.get() + Packing.Samples()));
-        });
+      return work(static_cast<const Sample*>(Copied(upper)), static_cast<const Sample*>(Copied(lower))), true;
+    Sample *const first = Line.get(), *const second = first + Packing.Samples();
+    const RowSpan between{Of, std::int32_t(upper), std::int32_t(lower - upper + 1)};
+    // So far apart that a window would move too often, they take one each.
+    if (Of.IsMapping && between.Count > RowsAtOnce(Of) / 2)
+      return WithRow(Of, between.First, [&](Sample* row) { Packing.Load(row, first); }) &&
+             WithRow(Of, std::int32_t(lower), [&](Sample* row) { work(first, Packing.Packed(row, second)); });
+    return WithRows(between, [&](const RowRun& rows) {
+      work(Packing.Packed(rows[0], first), Packing.Packed(rows[between.Count - 1], second));
+    });
   }
 
  private:
@@ -93,8 +98,8 @@ class ColumnSums {
   /// Writes the means around row y; y is 0 first, then one more each time.
   bool MoveTo(std::int64_t y, SourceRows& source, Sample* out) {
     if (y > 0)
-      return source.With(std::min(y + Radius, Height - 1), std::max<std::int64_t>(y - 1 - Radius, 0),
-                         [&](const Sample* entering, const Sample* leaving) {
+      return source.With(std::max<std::int64_t>(y - 1 - Radius, 0), std::min(y + Radius, Height - 1),
+                         [&](const Sample* leaving, const Sample* entering) {
                            OnBestTarget<MoveOn<Sum>>(Sums(), entering, leaving, out, Samples, Mean);
                          });
     std::fill_n(Sums(), Samples, Sum{0});

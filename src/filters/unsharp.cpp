@@ -30,17 +30,15 @@ void PushRun(Sample* samples, const Sample* beside, const Sample* mask, std::ptr
   }
 }
 
-/// The formula in whole numbers of 16 bits, for nearly all factors that are used. n times a factor, rounded
-/// down, is n Whole + (n Part >> 16): the fractions that agree with the products fill an interval between
-/// neighbours among those with denominators up to 255, which is wider than 2^-16 and so holds a Part.
+/// The formula in whole numbers of 16 bits, for nearly all factors that are used. d times a factor, rounded
+/// down, is d Whole + (d Part >> 16): the multiples of 2^-16 that agree with the products of all d above 0
+/// fill an interval between neighbours among the fractions with denominators up to 255, and so do those that
+/// agree with the products of all d below 0. Where a product is a whole number, the one begins and the other
+/// ends there, so that each sign has a Part of its own.
 struct WholePush {
-  struct Product {
-    std::uint16_t Whole, Part;
-  };
-  /// For a above b, and for a below b: there the product is rounded up, and so is 1 more than this one.
-  Product Above, Below;
+  std::int16_t Whole, PartAbove, PartBelow;
   /// Smaller differences leave a sample as it is.
-  std::int16_t Least;
+  Sample Least;
   /// A difference whose product lies a hair below a whole number, and counts as that number: the sum with b,
   /// in a double, is rounded to it too, but not below a certain size.
   struct Hair {
@@ -56,7 +54,6 @@ struct WholePush {
   static std::optional<WholePush> Of(double factor, std::int32_t threshold);
 
  private:
-  static std::optional<Product> ProductOf(double factor, bool negative);
   bool FindHairs(double factor);
 };
 
@@ -71,23 +68,31 @@ bool HairBelow(double product) {
 }
 double RoundedDown(double product) { return std::floor(product) + HairBelow(product); }
 
-std::optional<WholePush::Product> WholePush::ProductOf(double factor, bool negative) {
-  const auto rounded = [&](int n) {
-    // What is further away is clamped, whatever it is.
-    const double product = negative ? -RoundedDown(-factor * n) - 1 : RoundedDown(factor * n);
-    return std::int32_t(std::min(product, 256.0));
-  };
-  const std::int32_t whole = rounded(1);
-  // floor(n part / 2^16) == rest, for all n.
-  std::int32_t least = 0, most = 65535;
-  for (int n = 1; n <= 255; ++n) {
-    const std::int32_t rest = rounded(n) - n * whole;
-    least = std::max(least, ((rest << 16) + n - 1) / n);
-    if (rest + n * whole < 256) most = std::min(most, (((rest + 1) << 16) - 1) / n);
+/// The multiples of 2^-16 that have the products of a factor.
+struct Multipliers {
+  std::int64_t Least = 0, Most = std::int64_t(MostFactor) << 16;
+
+  static Multipliers Above(double factor) {
+    Multipliers all;
+    for (int n = 1; n <= 255; ++n) {
+      // What is further away is clamped, whatever it is.
+      const auto product = std::int64_t(std::min(RoundedDown(factor * n), 256.0));
+      all.Least = std::max(all.Least, ((product << 16) + n - 1) / n);
+      if (product < 256) all.Most = std::min(all.Most, (((product + 1) << 16) - 1) / n);
+    }
+    return all;
   }
-  if (least > most) return std::nullopt;
-  return Product{std::uint16_t(whole), std::uint16_t(least)};
-}
+  /// Of n below 0, whose products are rounded away from it.
+  static Multipliers Below(double factor) {
+    Multipliers all;
+    for (int n = 1; n <= 255; ++n) {
+      const auto product = std::int64_t(std::min(-RoundedDown(-factor * n), 256.0));
+      all.Least = std::max(all.Least, ((product - 1) << 16) / n + 1);
+      if (product < 256) all.Most = std::min(all.Most, (product << 16) / n);
+    }
+    return all;
+  }
+};
 
 bool WholePush::FindHairs(double factor) {
   for (int d = -255; d <= 255; ++d) {
@@ -106,10 +111,14 @@ bool WholePush::FindHairs(double factor) {
 }
 
 std::optional<WholePush> WholePush::Of(double factor, std::int32_t threshold) {
-  if (!(factor > 0 && factor <= MostFactor)) return std::nullopt;
-  const auto above = ProductOf(factor, false), below = ProductOf(factor, true);
-  if (!above || !below) return std::nullopt;
-  WholePush push{*above, *below, std::int16_t(std::clamp(threshold, 0, 256))};
+  if (!(factor > 0 && factor <= MostFactor) || threshold > 255) return std::nullopt;
+  const Multipliers above = Multipliers::Above(factor), below = Multipliers::Below(factor);
+  if (above.Least > above.Most || below.Least > below.Most) return std::nullopt;
+  const std::int64_t whole = (above.Least + 0x8000) >> 16, partAbove = above.Least - (whole << 16),
+                     partBelow = std::clamp(above.Least, below.Least, below.Most) - (whole << 16);
+  if (partBelow != std::int16_t(partBelow)) return std::nullopt;
+  WholePush push{std::int16_t(whole), std::int16_t(partAbove), std::int16_t(partBelow),
+                 Sample(std::max(threshold, 0))};
   if (!push.FindHairs(factor)) return std::nullopt;
   return push;
 }
@@ -118,30 +127,26 @@ std::optional<WholePush> WholePush::Of(double factor, std::int32_t threshold) {
 template <int Hairs>
 void PushRunWhole(Sample* __restrict samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count,
                   const WholePush& push) {
-  const auto [whole, part] = push.Above;
-  const std::uint16_t otherWhole = whole ^ push.Below.Whole, otherPart = part ^ push.Below.Part;
-  const std::int16_t least = push.Least;
+  const std::int16_t whole = push.Whole, above = push.PartAbove,
+                     other = std::int16_t(push.PartAbove ^ push.PartBelow);
+  const Sample least = push.Least;
   std::int16_t difference[Hairs + 1], from[Hairs + 1];
   for (int h = 0; h < Hairs; ++h) {
     difference[h] = push.Hairs[std::size_t(h)].Difference;
     from[h] = push.Hairs[std::size_t(h)].From;
   }
   for (std::ptrdiff_t i = 0; i < count; ++i) {
-    const std::int16_t a = samples[i], b = beside[i], d = std::int16_t(a - b), below = std::int16_t(-(d < 0));
-    const std::uint16_t n = std::uint16_t((d ^ below) - below);
-    const std::uint16_t high =
-        std::uint16_t(std::uint32_t{n} * std::uint16_t(part ^ (otherPart & below)) >> 16);
-    const std::uint16_t product =
-        std::uint16_t(std::uint16_t(n * std::uint16_t(whole ^ (otherWhole & below))) + high);
-    // Below b it is taken away, and 1 more.
-    std::int16_t v = std::int16_t(b + std::int16_t(product ^ below));
+    const Sample a = samples[i], b = beside[i], apart = Sample(std::max(a, b) - std::min(a, b));
+    const std::int16_t d = std::int16_t(a - b), part = std::int16_t(above ^ (other & -std::int16_t(d < 0)));
+    const std::int16_t rest = std::int16_t(std::int32_t{d} * part >> 16);
+    std::int16_t v = std::int16_t(std::int16_t(std::int16_t(d * whole) + rest) + b);
     for (int h = 0; h < Hairs; ++h) {
       const std::int16_t is = std::int16_t(-(d == difference[h])), small = std::int16_t(-(v < from[h]));
       v = std::int16_t(v + (is & small));
     }
     v = v < 0 ? std::int16_t{0} : v > 255 ? std::int16_t{255} : v;
-    const Sample moved = Sample(Sample(-(std::int16_t(n) >= least)) & mask[i]);
-    samples[i] = Sample((Sample(v) & moved) | (Sample(a) & ~moved));
+    const Sample moved = Sample(Sample(-(apart >= least)) & mask[i]);
+    samples[i] = Sample((Sample(v) & moved) | (a & ~moved));
   }
 }
 

@@ -5,6 +5,7 @@
 #include <bit>
 #include <cstring>
 
+#include "image/byte_blocks.h"
 #include "image/targets.h"
 
 namespace zor {
@@ -18,7 +19,7 @@ bool InOnePixel(const PlaneList& planes, int count) {
 
 /// The bytes that this processor shuffles at once.
 std::int32_t BytesOfShuffle() {
-  if (CurrentTarget == Target::Plain) return 0;
+  if (!ShufflesBytes()) return 0;
   return CurrentTarget == Target::AVX512VBMI ? ByteShuffle::Most : 16;
 }
 
@@ -92,7 +93,7 @@ std::int32_t RowConversion::FastPart(const Sample* from, Sample* into, std::int3
     std::memcpy(into, from, std::size_t(width) * std::size_t(In.Step));
     return width;
   }
-  if (IsLuma && CurrentTarget != Target::Plain)
+  if (IsLuma && ShufflesBytes())
     return LumaRow(from, In.Step, {In.Offset[0] - left, In.Offset[1] - left, In.Offset[2] - left}, into,
                    width);
   if (Shuffle.Pixels == 0) return 0;

@@ -112,16 +112,17 @@ Boolean ScaleFast(PictureZOR* self, PictureZOR* source, Integer width, Integer h
   bool reached = true;
   for (std::int32_t y = 0, last = -1; reached && y < height; ++y) {
     const auto nearest = std::int32_t(yRatio * y);
-    const Lane into = Yielding(Into(dest, y));
     if (repeats && nearest == last)
-      reached = Walk(From(dest, y - 1), into).Rows(1, [&](std::int32_t, const Sample* above, Sample* row) {
+      reached = WithRows({dest, y - 1, 2}, [&](const RowRun& rows) {
         const std::int32_t first = FirstOffset(out);
-        std::memcpy(row + first, above + first, std::size_t(width) * std::size_t(out.Step));
+        std::memcpy(rows[1] + first, rows[0] + first, std::size_t(width) * std::size_t(out.Step));
       });
     else
-      reached = Walk(From(from, nearest), into).Rows(1, [&](std::int32_t, const Sample* source, Sample* row) {
-        take(source, in, row, out, width, columns);
-      });
+      reached = Walk(From(from, nearest), Into(dest, y))
+                    .Rows(1, [&](std::int32_t, const Sample* source, Sample* row) {
+                      take(source, in, row, out, width, columns);
+                    });
+    if (reached) MayYield(dest);
     last = nearest;
   }
   return reached;

@@ -55,6 +55,7 @@ def test_interrupted_it_goes_on(batch, scan, by, code):
     # One part's file says that its tiles are there; without it they are made again.
     (unfinished / "part-1").unlink()
     os.truncate(unfinished / "p_files/11/0_0.jpg", 0)
+    (unfinished / "p_files/11/.picturezor-killed").touch()
     batch.run(*words)
     assert (batch.directory / "made/p_files/11/0_2.jpg").stat().st_mtime_ns == made
     assert tree(batch.directory / "made") == tree(scan / "alone")

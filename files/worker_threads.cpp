@@ -1,11 +1,11 @@
-#include "threads.h"
+#include "worker_threads.h"
 
 #include <sched.h>
 
 #include <algorithm>
 #include <csignal>
 
-namespace picturezor::flow {
+namespace picturezor::files {
 
 int Processors() {
   cpu_set_t allowed;
