@@ -95,13 +95,15 @@ const auto registered = [] {
                                       };
                                     }}};
 #ifdef PICTUREZOR_OPENCV
-    // Without a threshold.
-    unsharp.push_back(OpenCV(Format::RGB, [=](cv::Mat& source, cv::Mat& dest) {
-      cv::addWeighted(dest, 1 + 4 * amount, source, -4 * amount, 0, dest);
+    // Of a copy as well, and without a threshold.
+    unsharp.push_back(OpenCV(Format::RGB, [=, copy = cv::Mat()](cv::Mat& source, cv::Mat& beside) mutable {
+      source.copyTo(copy);
+      cv::addWeighted(copy, 1 + 4 * amount, beside, -4 * amount, 0, copy);
     }));
 #endif
     unsharp.push_back(Memcpy(BytesOf(3)));
-    AddRace("filters", amount == 0.5 ? "UnsharpFilter of a copy, RGB" : "UnsharpFilter of a copy, RGB, doubtful factor",
+    AddRace("filters",
+            amount == 0.5 ? "UnsharpFilter of a copy, RGB" : "UnsharpFilter of a copy, RGB, doubtful factor",
             std::move(unsharp));
   }
 

@@ -39,17 +39,17 @@ struct WholePush {
   std::int16_t Whole, PartAbove, PartBelow;
   /// Smaller differences leave a sample as it is.
   Sample Least;
-  /// A difference whose product lies a hair below a whole number, and counts as that number: the sum with b,
-  /// in a double, is rounded to it too, but not below a certain size.
+  /// A product that lies a hair below a whole number counts as that number: the sum with b, in a double, is
+  /// rounded to it too. Of some differences no sum is; of others none below a certain size. All are on one
+  /// side, that of the error of the factor.
   struct Hair {
-    std::int16_t Difference = 256, From = 0;
+    Sample Apart = 0, From = 0;
   };
-  /// Most factors that have any have few.
-  static constexpr int FewHairs = 4, MostHairs = 12;
-  std::array<Hair, MostHairs> Hairs{};
-  int HairCount = 0;
-  /// From the first, the lowest, to the highest.
-  std::uint16_t HairReach = 0;
+  static constexpr int MostNever = 8, MostSmall = 4;
+  std::array<Sample, MostNever> NeverRounded{};
+  std::array<Hair, MostSmall> NotWhenSmall{};
+  int NeverCount = 0, SmallCount = 0;
+  bool HairsBelow = false;
 
   static std::optional<WholePush> Of(double factor, std::int32_t threshold);
 
@@ -99,13 +99,23 @@ bool WholePush::FindHairs(double factor) {
     const double product = factor * d, whole = std::floor(product) + 1;
     if (!HairBelow(product)) continue;
     // The largest sum that isn't rounded; larger ones are.
-    int from = 1;
-    for (int b = 0; b <= 255 && whole + b <= 255; ++b)
-      if (whole + b >= 1 && product + b != whole + b) from = int(whole) + b + 1;
+    int from = 1, largest = 0;
+    for (int b = 0; b <= 255 && whole + b <= 255; ++b) {
+      largest = int(whole) + b;
+      if (largest >= 1 && product + b != largest) from = largest + 1;
+    }
     if (from == 1) continue;
-    if (HairCount == MostHairs) return false;
-    Hairs[std::size_t(HairCount++)] = {std::int16_t(d), std::int16_t(from)};
-    HairReach = std::uint16_t(d - Hairs[0].Difference);
+    const bool below = d < 0;
+    if (NeverCount + SmallCount > 0 && below != HairsBelow) return false;
+    HairsBelow = below;
+    const auto apart = Sample(std::abs(d));
+    if (from > largest) {
+      if (NeverCount == MostNever) return false;
+      NeverRounded[std::size_t(NeverCount++)] = apart;
+    } else {
+      if (SmallCount == MostSmall) return false;
+      NotWhenSmall[std::size_t(SmallCount++)] = {apart, Sample(from)};
+    }
   }
   return true;
 }
@@ -123,57 +133,52 @@ std::optional<WholePush> WholePush::Of(double factor, std::int32_t threshold) {
   return push;
 }
 
-/// By masks, not by choices, so that it becomes vector code.
-template <int Hairs>
+/// By masks, not by choices, so that it becomes vector code. For up to so many differences of either kind; an
+/// apart of 0 is on neither side.
+template <int Never, int Small>
 void PushRunWhole(Sample* __restrict samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count,
                   const WholePush& push) {
   const std::int16_t whole = push.Whole, above = push.PartAbove,
                      other = std::int16_t(push.PartAbove ^ push.PartBelow);
-  const Sample least = push.Least;
-  std::int16_t difference[Hairs + 1], from[Hairs + 1];
-  for (int h = 0; h < Hairs; ++h) {
-    difference[h] = push.Hairs[std::size_t(h)].Difference;
-    from[h] = push.Hairs[std::size_t(h)].From;
+  const Sample least = push.Least, side = push.HairsBelow ? 255 : 0;
+  Sample never[Never + 1], small[Small + 1], from[Small + 1];
+  for (int h = 0; h < Never; ++h) never[h] = push.NeverRounded[std::size_t(h)];
+  for (int h = 0; h < Small; ++h) {
+    small[h] = push.NotWhenSmall[std::size_t(h)].Apart;
+    from[h] = push.NotWhenSmall[std::size_t(h)].From;
   }
   for (std::ptrdiff_t i = 0; i < count; ++i) {
     const Sample a = samples[i], b = beside[i], apart = Sample(std::max(a, b) - std::min(a, b));
     const std::int16_t d = std::int16_t(a - b), part = std::int16_t(above ^ (other & -std::int16_t(d < 0)));
     const std::int16_t rest = std::int16_t(std::int32_t{d} * part >> 16);
     std::int16_t v = std::int16_t(std::int16_t(std::int16_t(d * whole) + rest) + b);
-    for (int h = 0; h < Hairs; ++h) {
-      const std::int16_t is = std::int16_t(-(d == difference[h])), small = std::int16_t(-(v < from[h]));
-      v = std::int16_t(v + (is & small));
+    const Sample hasHairs = Sample(-(side ? a < b : a > b));
+    if constexpr (Never > 0) {
+      Sample less = 0;
+      for (int h = 0; h < Never; ++h) less |= Sample(-(apart == never[h]));
+      v = std::int16_t(v - std::int16_t(less & hasHairs & 1));
     }
     v = v < 0 ? std::int16_t{0} : v > 255 ? std::int16_t{255} : v;
+    Sample pushed = Sample(v);
+    if constexpr (Small > 0) {
+      Sample less = 0;
+      for (int h = 0; h < Small; ++h) less |= Sample(-(apart == small[h]) & -(pushed < from[h]));
+      less &= hasHairs & 1;
+      pushed = Sample(std::max(pushed, less) - less);
+    }
     const Sample moved = Sample(Sample(-(apart >= least)) & mask[i]);
-    samples[i] = Sample((Sample(v) & moved) | (a & ~moved));
-  }
-}
-
-/// Hairs belong to a few differences, which soft places don't have: each block is looked at before.
-void PushBlocks(Sample* samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count,
-                const WholePush& push) {
-  constexpr std::ptrdiff_t block = 256;
-  const std::int16_t lowest = push.Hairs[0].Difference;
-  const std::uint16_t reach = push.HairReach;
-  for (std::ptrdiff_t at = 0; at < count; at += block) {
-    const std::ptrdiff_t end = std::min(count, at + block);
-    std::uint16_t found = 0;
-    for (std::ptrdiff_t i = at; i < end; ++i)
-      found |= std::uint16_t(std::uint16_t(samples[i] - beside[i] - lowest) <= reach);
-    if (!found)
-      PushRunWhole<0>(samples + at, beside + at, mask + at, end - at, push);
-    else if (push.HairCount <= WholePush::FewHairs)
-      PushRunWhole<WholePush::FewHairs>(samples + at, beside + at, mask + at, end - at, push);
-    else
-      PushRunWhole<WholePush::MostHairs>(samples + at, beside + at, mask + at, end - at, push);
+    samples[i] = Sample((pushed & moved) | (a & ~moved));
   }
 }
 
 void PushRow(Sample* samples, const Sample* beside, const Sample* mask, std::ptrdiff_t count,
              const WholePush& push) {
-  push.HairCount == 0 ? OnBestTarget<PushRunWhole<0>>(samples, beside, mask, count, push)
-                      : OnBestTarget<PushBlocks>(samples, beside, mask, count, push);
+  const auto has = [&](int never, int small) { return push.NeverCount <= never && push.SmallCount <= small; };
+  has(0, 0)   ? OnBestTarget<PushRunWhole<0, 0>>(samples, beside, mask, count, push)
+  : has(1, 1) ? OnBestTarget<PushRunWhole<1, 1>>(samples, beside, mask, count, push)
+  : has(4, 4) ? OnBestTarget<PushRunWhole<4, 4>>(samples, beside, mask, count, push)
+              : OnBestTarget<PushRunWhole<WholePush::MostNever, WholePush::MostSmall>>(samples, beside, mask,
+                                                                                       count, push);
 }
 
 /// The formula as a table by both samples, for planes that lie in other ways and for pictures that share
