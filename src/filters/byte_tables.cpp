@@ -28,7 +28,8 @@ ByteTables::ByteTables(const PlaneList& planes, const std::array<const SampleTab
 std::ptrdiff_t MapBytes(const ByteTables& tables, const Sample* in, Sample* out) {
   const std::ptrdiff_t width = (tables.Bytes + tables.Step - 1) / tables.Step;
   if (CurrentTarget == Target::AVX512VBMI) return MapBytesVBMI(tables, in, out), width;
-  std::ptrdiff_t i = CurrentTarget == Target::Plain ? 0 : MapBytesAVX2(tables, in, out);
+  std::ptrdiff_t i =
+      CurrentTarget == Target::Plain ? MapBytesNEON(tables, in, out) : MapBytesAVX2(tables, in, out);
   if (!tables.Uniform) return i / tables.Step;
   const SampleTable& table = *tables.Table[0];
   // Eight look-ups before the first of them is written, so that none waits for a write.

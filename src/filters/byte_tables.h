@@ -31,9 +31,10 @@ struct ByteTables {
 /// pixels from the left are done. The rows are one and the same or don't overlap.
 std::ptrdiff_t MapBytes(const ByteTables& tables, const Sample* in, Sample* out);
 
-// The forms that look bytes up in registers, each for its instruction set; that for AVX2 gives how many bytes
-// are done, whole pixels unless the tables are Uniform.
+// The forms that look bytes up in registers, each for its instruction set; those that give a number
+// have done so many bytes, whole pixels unless the tables are Uniform.
 std::ptrdiff_t MapBytesAVX2(const ByteTables& tables, const Sample* in, Sample* out);
+std::ptrdiff_t MapBytesNEON(const ByteTables& tables, const Sample* in, Sample* out);
 void MapBytesVBMI(const ByteTables& tables, const Sample* in, Sample* out);
 
 }

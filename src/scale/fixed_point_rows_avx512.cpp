@@ -91,8 +91,10 @@ struct GroupRunner {
       const __m512i take = _mm512_load_si512(pattern.Index);
       __m512i sums[Rows][Digits];
       const Sample* source[Rows];
+#pragma GCC unroll 4
       for (int r = 0; r < Rows; ++r) {
         source[r] = from[r] + plan.Lead + group->Base;
+#pragma GCC unroll 4
         for (int d = 0; d < Digits; ++d) sums[r][d] = zero;
         // Only lines of three digits have a bias.
         if constexpr (Digits == 3) sums[r][2] = _mm512_load_si512(pattern.Bias);
@@ -101,17 +103,22 @@ struct GroupRunner {
       std::int32_t s = 0;
       for (; s < group->WholeSteps; ++s, weights += Digits * VectorBytes) {
         __m512i weight[Digits];
+#pragma GCC unroll 4
         for (int d = 0; d < Digits; ++d) weight[d] = _mm512_load_si512(weights + d * VectorBytes);
+#pragma GCC unroll 4
         for (int r = 0; r < Rows; ++r) {
           const __m512i taps = _mm512_permutexvar_epi8(take, _mm512_loadu_si512(source[r] + s * step));
+#pragma GCC unroll 4
           for (int d = 0; d < Digits; ++d) sums[r][d] = _mm512_dpbusd_epi32(sums[r][d], taps, weight[d]);
         }
       }
       for (; s < group->Steps; ++s, weights += Digits * VectorBytes) {
         const std::int64_t left = std::max<std::int64_t>(plan.RowBytes - group->Base - s * step, 0);
+#pragma GCC unroll 4
         for (int r = 0; r < Rows; ++r) {
           const __m512i taps =
               _mm512_permutexvar_epi8(take, _mm512_maskz_loadu_epi8(Lowest(left), source[r] + s * step));
+#pragma GCC unroll 4
           for (int d = 0; d < Digits; ++d)
             sums[r][d] = _mm512_dpbusd_epi32(sums[r][d], taps, _mm512_load_si512(weights + d * VectorBytes));
         }
@@ -119,21 +126,26 @@ struct GroupRunner {
 
       const std::int64_t at = std::int64_t{group->FirstColumn - columns.First} * writer.Count;
       const std::int64_t room = std::int64_t{columns.Count()} * writer.Count - at;
+      [[maybe_unused]] const __m512i doubtful = _mm512_load_si512(pattern.Doubtful);
+      [[maybe_unused]] std::uint32_t doubts[Rows];
+#pragma GCC unroll 4
       for (int r = 0; r < Rows; ++r) {
         __m512i sum = Joined<Digits>(sums[r]);
         if (plan.Parts > 1) sum = PartsAdded(sum, plan.Parts, lanesOfPart);
         const __m512i value = _mm512_srai_epi32(sum, FixedPointLine::Bits);
         writer.Write(_mm512_min_epi32(_mm512_max_epi32(value, zero), white), into[r] + at,
                      group->Columns * writer.Count, room);
-        if constexpr (Digits == 3) {
-          __mmask16 doubt =
-              _mm512_cmplt_epu32_mask(_mm512_and_si512(sum, fraction), _mm512_load_si512(pattern.Doubtful));
-          if (doubt) [[unlikely]] {
-            // Near 0 both sides give the same byte.
-            doubt = _mm512_mask_cmpge_epi32_mask(doubt, sum, half);
-            if (doubt) Settle(plan, *group, doubt, from[r], into[r] + at, order);
-          }
-        }
+        if constexpr (Digits == 3)
+          // Near 0 both sides give the same byte.
+          doubts[r] = _mm512_mask_cmpge_epi32_mask(
+              _mm512_cmplt_epu32_mask(_mm512_and_si512(sum, fraction), doubtful), sum, half);
+      }
+      if constexpr (Digits == 3) {
+        std::uint32_t any = 0;
+#pragma GCC unroll 4
+        for (int r = 0; r < Rows; ++r) any |= doubts[r];
+        if (any) [[unlikely]]
+          for (int r = 0; r < Rows; ++r) Settle(plan, *group, doubts[r], from[r], into[r] + at, order);
       }
     }
   }
