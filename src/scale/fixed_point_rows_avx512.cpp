@@ -54,7 +54,8 @@ struct ByteWriter {
 
 }
 
-/// Runs groups over one row or several.
+/// Runs groups over one row or several. Loops over rows and digits are unrolled, so that all sums stay in
+/// registers.
 struct GroupRunner {
   /// A lane's sum, its digits put together.
   template <int Digits>

@@ -99,6 +99,7 @@ LOOP_INLINE Bits DoubtsOf(Bytes whole, const Sums* sums, std::int32_t gap, int b
 template <int Units>
 LOOP_INLINE void AddSlot(Sums* sums, const Sample* slot, const std::int16_t* two) {
   const auto digits = DigitsOf(two);
+  // Else the compiler keeps an address for each vector of the slot, more than there are registers.
   slot = __builtin_launder(slot);
   UNROLL
   for (int u = 0; u < Units; ++u) AddProducts(sums + u * 4, slot + u * UnitBytes, digits);

@@ -161,5 +161,18 @@ TEST(BoxMean, EqualsTheDivision) {
   }
 }
 
+// Catches rows of a mapped picture that went away with a window: with both rows of a sum in one, and with few
+// rows in each.
+TEST(BoxBlurFilter, MovesWindows) {
+  for (const auto& [width, height, radius] : {std::array{400000, 90, 2}, {3500000, 9, 1}}) {
+    const Picture noise = NoisePicture(width, height, Format::G, 9);
+    const StoredPicture from(StoredPicture::Mapped, width, height, Format::G),
+        into(StoredPicture::Mapped, width, height, Format::G);
+    SetPacked(from.Get(), Packed(noise));
+    ASSERT_TRUE(from.Get().BoxBlurFilter(into.Get(), radius));
+    EXPECT_TRUE(Packed(into.Get()) == Packed(noise.BoxBlurFilter({}, radius))) << width << ' ' << radius;
+  }
+}
+
 }
 }
