@@ -166,11 +166,13 @@ TEST(BoxMean, EqualsTheDivision) {
 TEST(BoxBlurFilter, MovesWindows) {
   for (const auto& [width, height, radius] : {std::array{400000, 90, 2}, {3500000, 9, 1}}) {
     const Picture noise = NoisePicture(width, height, Format::G, 9);
-    const StoredPicture from(StoredPicture::Mapped, width, height, Format::G),
-        into(StoredPicture::Mapped, width, height, Format::G);
-    SetPacked(from.Get(), Packed(noise));
-    ASSERT_TRUE(from.Get().BoxBlurFilter(into.Get(), radius));
-    EXPECT_TRUE(Packed(into.Get()) == Packed(noise.BoxBlurFilter({}, radius))) << width << ' ' << radius;
+    const TemporaryFile file, other;
+    // Windows of 16 MiB, or of five rows.
+    const Picture from = Picture::Mapped(file.Path(), width, height, Format::G),
+                  into = Picture::Mapped(other.Path(), width, height, Format::G);
+    SetPacked(from, Packed(noise));
+    ASSERT_TRUE(from.BoxBlurFilter(into, radius));
+    EXPECT_TRUE(Packed(into) == Packed(noise.BoxBlurFilter({}, radius))) << width << ' ' << radius;
   }
 }
 
