@@ -67,7 +67,7 @@ void ColourRun(const std::array<Sample, 3>& s, const Sample* m, Sample* d, std::
 /// The pictures of a call, usable, and what is left of its block. Without a mask that is the image.
 struct CombineCall {
   PictureData &Dest, &Image, &Mask;
-  Block Of;
+  CopyBlock Of;
   bool PreMultiplied;
 };
 
@@ -181,15 +181,15 @@ bool WithMaskColour(const CombineCall& call, Integer colour) {
 
 /// The way in of the three forms with a mask or a colour; runs body with what is left of the block.
 template <class Body>
-bool Enter(PictureData& dest, PictureData& image, PictureData* mask, bool preMultiplied, const Block& asked,
-           Body&& body) {
+bool Enter(PictureData& dest, PictureData& image, PictureData* mask, bool preMultiplied,
+           const CopyBlock& asked, Body&& body) {
   if (!image.Valid || (mask && !mask->Valid)) return false;
   if (mask && (mask->Width != image.Width || mask->Height != image.Height)) return false;
   if (!Usable(dest)) return false;
   MayYield(dest);
   if (!Usable(image) || (mask && !Usable(*mask))) return false;
   MayYield(image);
-  const Block block = CopyRect(dest, image, asked);
+  const CopyBlock block = CopyRect(dest, image, asked);
   return !block.Dest.Empty() && body(CombineCall{dest, image, mask ? *mask : image, block, preMultiplied});
 }
 
@@ -230,7 +230,7 @@ Boolean Combine(PictureZOR* self, PictureZOR* image, Boolean preMultipliedSource
   if (!image || width < 1 || height < 1) return false;
   if (!mask && foreColour < 0 && maskColour < 0)
     return CopyPixels(self, image, destX, destY, width, height, sourceX, sourceY);
-  const Block asked{{destX, destY, width, height}, sourceX, sourceY};
+  const CopyBlock asked{{destX, destY, width, height}, sourceX, sourceY};
   return Enter(DataOf(self), DataOf(image), mask ? &DataOf(mask) : nullptr, preMultipliedSource != 0, asked,
                [&](const CombineCall& call) {
                  if (mask) return ThroughMask(call);

@@ -21,7 +21,7 @@ constexpr FamilyPair CopyPairs[] = {
 /// A block that goes from one picture into another, by rows.
 class BlockCopy {
  public:
-  BlockCopy(PictureData& dest, PictureData& source, const Block& block, const RowConversion& convert)
+  BlockCopy(PictureData& dest, PictureData& source, const CopyBlock& block, const RowConversion& convert)
       : Dest(dest), Source(source), Of(block), Convert(convert) {}
 
   /// Between pictures that share no samples.
@@ -106,7 +106,7 @@ class BlockCopy {
   }
 
   PictureData &Dest, &Source;
-  Block Of;
+  CopyBlock Of;
   const RowConversion& Convert;
   std::size_t RowBytes = 0;
   Buffer Rows;
@@ -132,7 +132,7 @@ Boolean CopyPixels(PictureZOR* self, PictureZOR* source, Integer destX, Integer 
   MayYield(dest);
   if (!Usable(from)) return false;
   MayYield(from);
-  const Block block = CopyRect(dest, from, {{destX, destY, destWidth, destHeight}, sourceX, sourceY});
+  const CopyBlock block = CopyRect(dest, from, {{destX, destY, destWidth, destHeight}, sourceX, sourceY});
   const RowConversion convert = Find(CopyPairs, from, dest);
   if (block.Dest.Empty() || !convert) return false;
   BlockCopy copy(dest, from, block, convert);

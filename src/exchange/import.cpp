@@ -15,7 +15,7 @@ namespace {
 bool HasColours(const PictureData& image) { return image.HasRed && image.HasGreen && image.HasBlue; }
 
 /// All of a picture, to land at a place.
-Block WholeAt(HostPicture* pic, Integer x, Integer y) {
+CopyBlock WholeAt(HostPicture* pic, Integer x, Integer y) {
   return {{x, y, HostPictureWidth(pic), HostPictureHeight(pic)}, 0, 0};
 }
 
@@ -25,12 +25,12 @@ void SkipRows(HostPictureLock& lock, std::int32_t rows) {
 
 enum HostColour { HostRed, HostGreen, HostBlue };
 
-void DrawToGrayChannel(PictureData& image, HostPicture* pic, const Block& block, HostColour colour) {
+void DrawToGrayChannel(PictureData& image, HostPicture* pic, const CopyBlock& block, HostColour colour) {
   if (!image.HasGray || !Usable(image)) return;
   MayYield(image);
   HostPictureLock lock;
   if (!LockPictureForReading(lock, pic)) return;
-  const Block part = CopyRect(image, lock.Width, lock.Height, block);
+  const CopyBlock part = CopyRect(image, lock.Width, lock.Height, block);
   const PlaneList from{1, lock.PixelBytes, {ColoursOf(lock, part.SourceX).Offset[colour]}};
   const PlaneList into{1, image.PixelSize, {image.GrayOffset + part.Dest.X * image.PixelSize}};
   if (part.Dest.Empty()) return;
@@ -42,8 +42,8 @@ void DrawToGrayChannel(PictureData& image, HostPicture* pic, const Block& block,
   });
 }
 
-void DrawColours(PictureData& image, HostPictureLock& lock, const Block& block) {
-  const Block part = CopyRect(image, lock.Width, lock.Height, block);
+void DrawColours(PictureData& image, HostPictureLock& lock, const CopyBlock& block) {
+  const CopyBlock part = CopyRect(image, lock.Width, lock.Height, block);
   if (part.Dest.Empty()) return;
   MayYield(image);
   const PlaneList from = ColoursOf(lock, part.SourceX), into = PlanesOf(Group::RGB, image, part.Dest.X);
@@ -55,7 +55,7 @@ void DrawColours(PictureData& image, HostPictureLock& lock, const Block& block) 
   });
 }
 
-void DrawPictureRGB(PictureData& image, HostPicture* pic, const Block& block) {
+void DrawPictureRGB(PictureData& image, HostPicture* pic, const CopyBlock& block) {
   if (!HasColours(image) || !Usable(image)) return;
   MayYield(image);
   if (HostPictureLock lock; LockPictureForReading(lock, pic)) DrawColours(image, lock, block);
@@ -76,9 +76,9 @@ PlaneList PlanesWithAlpha(const PictureData& image) {
 /// A picture without a mask has one that is white everywhere.
 constexpr Sample White = 255;
 
-void DrawThroughMask(PictureData& image, HostPictureLock& lock, HostPictureLock* maskLock, const Block& block,
-                     PlaneList into, MaskUse use) {
-  const Block part = CopyRect(image, lock.Width, lock.Height, block);
+void DrawThroughMask(PictureData& image, HostPictureLock& lock, HostPictureLock* maskLock,
+                     const CopyBlock& block, PlaneList into, MaskUse use) {
+  const CopyBlock part = CopyRect(image, lock.Width, lock.Height, block);
   const Rectangle& dest = part.Dest;
   // The mask is taken to be as large as the picture; one that is narrower can't be read.
   if (dest.Empty() || (maskLock && (maskLock->Height < 1 || maskLock->Width - part.SourceX < dest.Width)))
@@ -96,7 +96,7 @@ void DrawThroughMask(PictureData& image, HostPictureLock& lock, HostPictureLock*
   });
 }
 
-void DrawThroughMask(PictureData& image, HostPicture* pic, HostPicture* mask, const Block& block,
+void DrawThroughMask(PictureData& image, HostPicture* pic, HostPicture* mask, const CopyBlock& block,
                      const PlaneList& into, MaskUse use) {
   if (!Usable(image)) return;
   MayYield(image);
@@ -111,13 +111,13 @@ void DrawThroughMask(PictureData& image, HostPicture* pic, HostPicture* mask, co
 /// The mask comes with a reference, as all that this host gives.
 HeldPicture MaskOf(HostPicture* pic) { return HeldPicture(pic ? REALGetPictureMask(pic, 0, 0, 0) : nullptr); }
 
-void DrawMaskedPictureRGB(PictureData& image, HostPicture* pic, const Block& block, Boolean invertMask) {
+void DrawMaskedPictureRGB(PictureData& image, HostPicture* pic, const CopyBlock& block, Boolean invertMask) {
   if (!HasColours(image)) return;
   const HeldPicture mask = MaskOf(pic);
   DrawThroughMask(image, pic, mask.get(), block, PlanesWithAlpha(image), {MaskUse::Alpha, invertMask != 0});
 }
 
-void DrawMaskedPictureApplyMaskRGB(PictureData& image, HostPicture* pic, const Block& block,
+void DrawMaskedPictureApplyMaskRGB(PictureData& image, HostPicture* pic, const CopyBlock& block,
                                    Boolean invertMask) {
   if (!HasColours(image)) return;
   const HeldPicture mask = MaskOf(pic);

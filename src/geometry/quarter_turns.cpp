@@ -2,7 +2,9 @@
 
 #include "geometry/geometry.h"
 #include "geometry/transposition.h"
+#include "image/byte_blocks.h"
 #include "image/clip.h"
+#include "image/file_regions.h"
 #include "image/filter.h"
 #include "image/walk.h"
 
@@ -16,8 +18,7 @@ struct TileSize {
   std::int32_t Rows, Columns;
 };
 
-/// A part of the source that becomes a part of the destination, with all its rows in both in the address
-/// space.
+/// A part of the source that becomes a part of the destination.
 struct Tile {
   const FilterCall& Call;
   Direction Way;
@@ -26,23 +27,26 @@ struct Tile {
   std::int32_t FirstDestRow() const {
     return Way == Direction::Clockwise ? Source.X : Call.Source.Width - Source.X - Source.Width;
   }
-  /// As a transposition: clockwise its source is read from the bottom row up, else its destination is written
-  /// so.
+  std::int32_t FirstDestColumn() const {
+    return Way == Direction::Clockwise ? Call.Source.Height - Source.Y - Source.Height : Source.Y;
+  }
+  /// As a transposition, between the places of its first pixels: clockwise its source is read from the bottom
+  /// row up, else its destination is written so.
   Transposition Between(const RowRun& from, const RowRun& into) const {
     const bool clockwise = Way == Direction::Clockwise;
-    const std::int32_t lastRow = Source.Height - 1, lastColumn = Source.Width - 1;
-    const std::int32_t left = clockwise ? Call.Source.Height - Source.Y - Source.Height : Source.Y;
-    return {from[clockwise ? lastRow : 0] + std::ptrdiff_t{Source.X} * Call.In.Step,
+    return {from[clockwise ? Source.Height - 1 : 0],
             clockwise ? -from.Stride : from.Stride,
-            into[clockwise ? 0 : lastColumn] + std::ptrdiff_t{left} * Call.Out.Step,
+            into[clockwise ? 0 : Source.Width - 1],
             clockwise ? into.Stride : -into.Stride,
             Source.Width,
             Source.Height};
   }
+  /// With all its rows in both in the address space.
   bool Turn() const {
     return WithRows({Call.Source, Source.Y, Source.Height}, {Call.Dest, FirstDestRow(), Source.Width},
                     [&](const RowRun& from, const RowRun& into) {
-                      const Transposition pixels = Between(from, into);
+                      const Transposition pixels = Between(AtColumn(from, Source.X, Call.In),
+                                                           AtColumn(into, FirstDestColumn(), Call.Out));
                       // Where what is written shows in other places too, the order makes the result.
                       Call.SharesPixels ? InOrder(pixels) : Transpose(pixels, Call.In, Call.Out);
                     });
@@ -60,7 +64,70 @@ struct Tile {
       }
     });
   }
+  static RowRun AtColumn(const RowRun& rows, std::int32_t x, const PlaneList& planes) {
+    return {rows.First + std::ptrdiff_t{x} * planes.Step, rows.Stride};
+  }
 };
+
+/// Pixels in memory of their own, as they stand in a picture.
+class Pixels {
+ public:
+  Pixels(std::int32_t width, std::int32_t height, PlaneList planes)
+      : Stride(Padded(std::int64_t{width} * planes.Step)), Memory(NewBuffer(height, Stride)), Of(planes) {
+    for (std::int32_t& offset : Of.Offset) offset -= LeftOf(planes);
+  }
+  explicit operator bool() const { return Memory != nullptr; }
+  RowRun Rows() const { return {Memory.get(), Stride}; }
+  const PlaneList& Planes() const { return Of; }
+
+  static std::int64_t Padded(std::int64_t bytes) { return (bytes + CacheLine - 1) / CacheLine * CacheLine; }
+
+ private:
+  std::ptrdiff_t Stride;
+  Buffer Memory;
+  PlaneList Of;
+};
+
+/// How many rows of the destination are composed in memory and then written to its file; 0 where they are
+/// mapped instead. They take what the regions of both pictures would.
+std::int32_t RowsComposed(const FilterCall& call) {
+  if (!call.Dest.IsMapping || call.SharesPixels || !FillPixels(call.Out)) return 0;
+  const std::int64_t row = Pixels::Padded(std::int64_t{call.Source.Height} * call.Out.Step);
+  return std::int32_t(std::min<std::int64_t>(2 * MostBytesBeside(call.Dest) / row, call.Source.Width));
+}
+
+/// Composes so many rows of the destination at a time. By way of mappings each page that is written costs a
+/// fault and is cleared first, and one that is read costs a fault for each time that it is needed again;
+/// where the system has the file in small pages that takes many times as long as the copies do.
+bool TurnComposed(const FilterCall& call, Direction way, std::int32_t rows) {
+  const std::int32_t width = call.Source.Width, height = call.Source.Height;
+  const bool mapped = call.Source.IsMapping;
+  const std::int32_t band = mapped ? std::min(128, height) : height;
+  const Pixels part(mapped ? rows : 0, mapped ? band : 0, call.In), composed(height, rows, call.Out);
+  if (!part || !composed) return false;
+  for (std::int32_t x = 0; x < width; x += rows) {
+    Tile tile{call, way, {x, 0, std::min(rows, width - x), 0}};
+    const auto turn = [&](const RowRun& from, const PlaneList& in) {
+      const RowRun into = Tile::AtColumn(composed.Rows(), tile.FirstDestColumn(), composed.Planes());
+      Transpose(tile.Between(from, into), in, composed.Planes());
+    };
+    for (std::int32_t y = 0; y < height; y += band) {
+      tile.Source.Y = y;
+      tile.Source.Height = std::min(band, height - y);
+      if (!mapped) {
+        if (!WithRows({call.Source, 0, height},
+                      [&](const RowRun& from) { turn(Tile::AtColumn(from, x, call.In), call.In); }))
+          return false;
+      } else {
+        if (!ReadPixels(call.Source, tile.Source, part.Rows().First, part.Rows().Stride)) return false;
+        turn(part.Rows(), part.Planes());
+      }
+    }
+    const Rectangle written{0, tile.FirstDestRow(), height, tile.Source.Width};
+    if (!WritePixels(call.Dest, written, composed.Rows().First, composed.Rows().Stride)) return false;
+  }
+  return true;
+}
 
 constexpr TileSize OnePixel{1, 1};
 
@@ -72,11 +139,14 @@ TileSize LargestTiles(const FilterCall& call) {
   return edge < 1 ? OnePixel : TileSize{edge, edge};
 }
 
-template <class SizeOfTiles>
-PictureZOR* Turn(PictureZOR* self, PictureZOR* dest, Direction way, SizeOfTiles&& sizeOfTiles) {
+enum class Form { Fast, Slow };
+
+PictureZOR* Turn(PictureZOR* self, PictureZOR* dest, Direction way, Form form) {
   return RunFilter(self, dest, {.InPlace = false, .Turned = true}, [&](const FilterCall& call) {
+    const std::int32_t composed = form == Form::Fast ? RowsComposed(call) : 0;
+    if (composed > 0) return TurnComposed(call, way, composed);
     const std::int32_t width = call.Source.Width, height = call.Source.Height;
-    const TileSize most = sizeOfTiles(call);
+    const TileSize most = form == Form::Fast ? LargestTiles(call) : OnePixel;
     const auto turn = [&](std::int64_t x, std::int64_t y) {
       const std::int32_t left = std::int32_t(x), top = std::int32_t(y);
       return Tile{
@@ -97,21 +167,19 @@ PictureZOR* Turn(PictureZOR* self, PictureZOR* dest, Direction way, SizeOfTiles&
   });
 }
 
-TileSize NoTiles(const FilterCall&) { return OnePixel; }
-
 }
 
 PictureZOR* Rotate90(PictureZOR* self, PictureZOR* dest) {
-  return Turn(self, dest, Direction::CounterClockwise, LargestTiles);
+  return Turn(self, dest, Direction::CounterClockwise, Form::Fast);
 }
 PictureZOR* Rotate270(PictureZOR* self, PictureZOR* dest) {
-  return Turn(self, dest, Direction::Clockwise, LargestTiles);
+  return Turn(self, dest, Direction::Clockwise, Form::Fast);
 }
 PictureZOR* Rotate90slow(PictureZOR* self, PictureZOR* dest) {
-  return Turn(self, dest, Direction::CounterClockwise, NoTiles);
+  return Turn(self, dest, Direction::CounterClockwise, Form::Slow);
 }
 PictureZOR* Rotate270slow(PictureZOR* self, PictureZOR* dest) {
-  return Turn(self, dest, Direction::Clockwise, NoTiles);
+  return Turn(self, dest, Direction::Clockwise, Form::Slow);
 }
 
 }

@@ -62,11 +62,12 @@ Rectangle FilterRect(const PictureData& picture, Rectangle r) {
   return Clipped(ClipAxis(r.X, r.Width, picture.Width), ClipAxis(r.Y, r.Height, picture.Height));
 }
 
-Block CopyRect(const PictureData& dest, const PictureData& source, Block block) {
+CopyBlock CopyRect(const PictureData& dest, const PictureData& source, CopyBlock block) {
   return CopyRect(dest, source.Width, source.Height, block);
 }
 
-Block CopyRect(const PictureData& dest, std::int32_t sourceWidth, std::int32_t sourceHeight, Block block) {
+CopyBlock CopyRect(const PictureData& dest, std::int32_t sourceWidth, std::int32_t sourceHeight,
+                   CopyBlock block) {
   const Span columns = ClipAxes(block.Dest.X, block.Dest.Width, block.SourceX, dest.Width, sourceWidth);
   const Span rows = ClipAxes(block.Dest.Y, block.Dest.Height, block.SourceY, dest.Height, sourceHeight);
   const Rectangle clipped = Clipped(columns, rows);

@@ -14,7 +14,7 @@ struct Rectangle {
 Rectangle FilterRect(const PictureData& picture, Rectangle rectangle);
 
 /// A block that goes from one picture into another: where it lands, and where it comes from.
-struct Block {
+struct CopyBlock {
   Rectangle Dest;
   std::int32_t SourceX, SourceY;
 };
@@ -22,7 +22,8 @@ struct Block {
 /// The part of a block that lies in both pictures; its rectangle is empty when there is none. A negative
 /// source origin moves the destination's origin left or up by as much and shortens the block; then a
 /// negative width or height means to the left or upwards of the destination's origin.
-Block CopyRect(const PictureData& dest, const PictureData& source, Block block);
-Block CopyRect(const PictureData& dest, std::int32_t sourceWidth, std::int32_t sourceHeight, Block block);
+CopyBlock CopyRect(const PictureData& dest, const PictureData& source, CopyBlock block);
+CopyBlock CopyRect(const PictureData& dest, std::int32_t sourceWidth, std::int32_t sourceHeight,
+                   CopyBlock block);
 
 }

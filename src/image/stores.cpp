@@ -189,6 +189,25 @@ struct PixelRuns {
   }
 };
 
+/// Calls move(row, byte in it, bytes, place in the file), as pread and pwrite are called, for each row of a
+/// rectangle until all its bytes are moved. False when the system moves none.
+template <class Move>
+bool MovePixels(const PictureData& picture, const Rectangle& pixels, Move&& move) {
+  const std::int64_t left = picture.LeftEdge + std::int64_t{pixels.X} * picture.PixelSize;
+  const std::ptrdiff_t bytes = std::ptrdiff_t{pixels.Width} * picture.PixelSize;
+  for (std::int32_t y = 0; y < pixels.Height; ++y) {
+    const std::int64_t place = StoreRowOf(picture, pixels.Y + y) * picture.RowSize + left;
+    for (std::ptrdiff_t done = 0; done < bytes;) {
+      const ssize_t moved = move(y, done, std::size_t(bytes - done), off_t(place + done));
+      if (moved > 0)
+        done += moved;
+      else if (moved == 0 || errno != EINTR)
+        return false;
+    }
+  }
+  return true;
+}
+
 Sample* PlainRow(PictureData* data, std::int32_t row) {
   return data->PixelBase + std::ptrdiff_t(StoreRow(*data, row)) * data->RowSize;
 }
@@ -233,6 +252,23 @@ Sample* RowsTogether(PictureData& data, std::int32_t first, std::int32_t last) {
                    ? nullptr
                    : BytesBeside(data, top * size, (bottom + 1) * size);
   return at && mirrored ? at + (bottom - top) * size : at;
+}
+
+bool ReadPixels(const PictureData& picture, const Rectangle& pixels, Sample* into, std::ptrdiff_t stride) {
+  const int file = picture.Samples->FileDescriptor;
+  return MovePixels(picture, pixels,
+                    [&](std::int32_t y, std::ptrdiff_t done, std::size_t bytes, off_t place) {
+                      return pread(file, into + y * stride + done, bytes, place);
+                    });
+}
+
+bool WritePixels(const PictureData& picture, const Rectangle& pixels, const Sample* from,
+                 std::ptrdiff_t stride) {
+  const int file = picture.Samples->FileDescriptor;
+  return MovePixels(picture, pixels,
+                    [&](std::int32_t y, std::ptrdiff_t done, std::size_t bytes, off_t place) {
+                      return pwrite(file, from + y * stride + done, bytes, place);
+                    });
 }
 
 std::int32_t RoundedRowSize(const PictureData& data, std::int32_t unit) {

@@ -1,6 +1,7 @@
 #pragma once
 #include <atomic>
 
+#include "image/clip.h"
 #include "image/picture_data.h"
 
 namespace zor {
@@ -73,6 +74,13 @@ std::int32_t MostRowsTogether(const PictureData& data);
 /// The address of row `first` with all rows to `last` in the address space, on a mapped store until the next
 /// row is asked for. Null where they can't be, and on a closed picture.
 Sample* RowsTogether(PictureData& data, std::int32_t first, std::int32_t last);
+
+/// Copies a rectangle of a mapped picture into memory, `stride` bytes from row to row, or from there, without
+/// mapping it: for less than the page faults take where each of its pages is used once. What is mapped of the
+/// same file shows it. False when the file gives or takes less.
+bool ReadPixels(const PictureData& picture, const Rectangle& pixels, Sample* into, std::ptrdiff_t stride);
+bool WritePixels(const PictureData& picture, const Rectangle& pixels, const Sample* from,
+                 std::ptrdiff_t stride);
 
 /// Whether a byte from the first to the last pixel of a row of one picture is one of such a row of the other,
 /// so that a write to one can show in the other.

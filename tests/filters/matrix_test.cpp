@@ -102,7 +102,7 @@ TEST(ApplyMatrix, TruncatesWhatTheFactorGives) {
   const Picture picture(256, 1, Format::G);
   SetPacked(picture, Ramp());
   for (const double scale :
-       {1.0 / 3, 1.0 / 9, 0.1, 0.7, 1.0 / 273, 0.999999999, 3.3, 1e-9, 1e-6, 1.1e-6, 9.9e5, 1e6})
+       {1.0 / 3, 1.0 / 9, 0.1, 0.5, 0.7, 1.0 / 273, 0.999999999, 3.3, 1e-9, 1e-6, 1.1e-6, 9.9e5, 1e6})
     for (int delta = 0; delta < 1280; delta += 256) {
       const Samples out = Packed(picture.ApplyMatrix({}, 1, IntegerArray({1}), delta, scale));
       for (int x = 0; x < 256; ++x)

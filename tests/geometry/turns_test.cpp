@@ -120,6 +120,29 @@ TEST(Turns, TakeMoreRowsThanAWindow) {
   EXPECT_EQ(pixels(tall), pixels(plain));
 }
 
+// Catches rows that are composed outside the mapping and then written to the wrong place of the file: by more
+// than one group of rows, and into the middle of a larger picture.
+TEST(Turns, WriteMoreRowsThanAreComposedTogether) {
+  if (sizeof(void*) == 4) GTEST_SKIP() << "all rows are mapped";
+  constexpr int width = 8100, height = 26000;
+  const Picture plain = NoisePicture(width, height, Format::G, 62);
+  const TemporaryFile from, into;
+  const Picture source = Picture::Mapped(from.Path(), width, height, Format::G);
+  const Picture dest = Picture::Mapped(into.Path(), height + 20, width + 9, Format::G);
+  ASSERT_TRUE(source.CopyPixels(plain));
+  dest.FillRect(77);
+  const Picture part = dest.ClipImage({11, 5, height, width});
+  EXPECT_TRUE(plain.Rotate90(part));
+  EXPECT_EQ(part.CompareImages(plain.Rotate90()), 0);
+  EXPECT_TRUE(source.Rotate270(part));
+  EXPECT_EQ(part.CompareImages(plain.Rotate270()), 0);
+  // The frame keeps what it held.
+  dest.FillRect({11, 5, height, width}, 77);
+  const Picture filled(height + 20, width + 9, Format::G);
+  filled.FillRect(77);
+  EXPECT_EQ(dest.CompareImages(filled), 0);
+}
+
 TEST(Turns, WriteOtherOrdersAndLargerPictures) {
   for (const Way& way : Ways())
     for (const Format format : {Format::BGRA, Format::XRGB, Format::BGR, Format::RGB}) {

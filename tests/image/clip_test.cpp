@@ -51,7 +51,7 @@ TEST(Clip, GivesTheLinesThatLieInside) {
            Tried(asked.Y, asked.Height, 0, 4, 1000));
     const Lines columns = Tried(asked.X, asked.Width, sx, 5, 6),
                 rows = Tried(asked.Y, asked.Height, sy, 4, 3);
-    const zor::Block block = zor::CopyRect(DataOf(picture), DataOf(source), {asked, sx, sy});
+    const zor::CopyBlock block = zor::CopyRect(DataOf(picture), DataOf(source), {asked, sx, sy});
     Expect(block.Dest, columns, rows);
     if (!block.Dest.Empty()) {
       EXPECT_EQ(block.SourceX, columns.Source);
