@@ -5,6 +5,7 @@
 #include <numeric>
 
 #include "composition/composition.h"
+#include "image/byte_blocks.h"
 #include "image/clip.h"
 #include "image/formats.h"
 #include "image/groups.h"
@@ -31,14 +32,42 @@ Rectangle WholeOf(PictureZOR* self) { return {0, 0, DataOf(self).Width, DataOf(s
 /// A value for each plane of a group.
 using Values = std::array<Sample, 5>;
 
-/// Repeats the pixel at the start of a run over it, in copies that double.
-void Repeat(Sample* run, std::size_t pixel, std::size_t bytes) {
-  for (std::size_t done = pixel; done < bytes;) {
-    const std::size_t more = std::min(done, bytes - done);
-    std::memcpy(run + done, run, more);
-    done += more;
+/// A pixel of N bytes, as often as there is room.
+template <int N>
+class RepeatedPixel {
+ public:
+  RepeatedPixel(const PlaneList& planes, const Values& values) {
+    Sample pixel[N];
+    for (std::size_t c = 0; c < N; ++c) pixel[planes.Offset[c] - LeftOf(planes)] = values[c];
+    for (std::size_t i = 0; i < sizeof Pixels; ++i) Pixels[i] = pixel[i % N];
   }
-}
+
+  /// `streamed` where the run is one of many that don't fit in the caches together.
+  void Fill(Sample* run, std::ptrdiff_t bytes, bool streamed) const {
+    const std::ptrdiff_t head = streamed ? std::min(-InCacheLine(run) & (CacheLine - 1), bytes) : 0;
+    std::memcpy(run, Pixels, std::size_t(head));
+    const Sample* pixels = Pixels + head % N;
+    const std::ptrdiff_t periods = (bytes - head) / Period;
+    streamed ? FillPeriods(run + head, periods, pixels, StreamBlock)
+             : FillPeriods(run + head, periods, pixels, StoreBlock);
+    const std::ptrdiff_t done = head + periods * Period;
+    std::memcpy(run + done, pixels, std::size_t(bytes - done));
+  }
+
+ private:
+  /// After so many bytes blocks begin with the same byte of the pixel again.
+  static constexpr std::ptrdiff_t Period = N * BlockBytes;
+
+  template <class Store>
+  static void FillPeriods(Sample* into, std::ptrdiff_t count, const Sample* pixels, Store&& store) {
+    Block blocks[N];
+    for (int i = 0; i < N; ++i) blocks[i] = LoadBlock(pixels + i * BlockBytes);
+    for (; count > 0; --count, into += Period)
+      for (int i = 0; i < N; ++i) store(into + i * BlockBytes, blocks[i]);
+  }
+
+  Sample Pixels[std::max(Period, CacheLine) + N];
+};
 
 template <int N>
 void FillPlanes(Sample* row, const PlaneList& planes, const Values& values, std::int32_t width) {
@@ -49,20 +78,27 @@ void FillPlanes(Sample* row, const PlaneList& planes, const Values& values, std:
 
 void Fill(PictureData& picture, const Rectangle& asked, Group group, const Values& values) {
   const PlaneList planes = PlanesOf(group, picture);
-  const auto pixel = std::size_t(planes.Step);
+  const auto pixel = std::ptrdiff_t{planes.Step};
   const std::int32_t left = picture.LeftEdge;
+  if (!FillPixels(planes))
+    return ForPlaneCount(planes.Count, [&](auto n) {
+      ForRectangle(picture, asked,
+                   [&](Sample* row, std::int32_t width) { FillPlanes<n>(row, planes, values, width); });
+    });
   const bool alike = std::all_of(values.begin(), values.begin() + planes.Count,
                                  [&](Sample value) { return value == values[0]; });
-  if (FillPixels(planes) && alike)
+  if (alike)
     return ForRectangle(picture, asked, [&](Sample* row, std::int32_t width) {
-      std::memset(row + left, values[0], std::size_t(width) * pixel);
+      std::memset(row + left, values[0], std::size_t(width * pixel));
     });
+  const Rectangle filled = FilterRect(picture, asked);
+  const bool streamed = !filled.Empty() && std::int64_t{filled.Width} * pixel * filled.Height >= Streamed;
   ForPlaneCount(planes.Count, [&](auto n) {
-    ForRectangle(picture, asked, [&](Sample* row, std::int32_t width) {
-      FillPlanes<n>(row, planes, values, FillPixels(planes) ? 1 : width);
-      if (FillPixels(planes)) Repeat(row + left, pixel, std::size_t(width) * pixel);
-    });
+    const RepeatedPixel<n> pixels(planes, values);
+    ForRectangle(picture, asked,
+                 [&](Sample* row, std::int32_t width) { pixels.Fill(row + left, width * pixel, streamed); });
   });
+  if (streamed) EndStream();
 }
 
 void FillColour(PictureZOR* self, const Rectangle& asked, Integer red, Integer green, Integer blue) {

@@ -19,8 +19,6 @@ constexpr int Band = 64;
 constexpr std::ptrdiff_t Strip = 1024;
 /// Bytes that a source row is asked for ahead.
 constexpr std::ptrdiff_t Ahead = 128;
-/// A result of so many bytes leaves no room in the caches for itself and its source.
-constexpr std::ptrdiff_t Streamed = 8 << 20;
 
 /// Three bytes a pixel to lanes of four, and four pixels of lanes back to 48 bytes without gaps.
 constexpr int Spread(int j) { return j % 4 == 3 ? 0 : j / 4 * 3 + j % 4; }

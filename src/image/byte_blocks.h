@@ -46,6 +46,8 @@ inline void StreamBlock(Sample* into, Block block) {
   StoreBlock(into, block);
 #endif
 }
+/// A result of so many bytes leaves no room in the caches for itself and its source: it is streamed.
+constexpr std::ptrdiff_t Streamed = 8 << 20;
 /// Lets other threads see what was streamed.
 inline void EndStream() {
 #ifdef __SSE2__

@@ -57,6 +57,22 @@ TEST(FillRectRGB, SetsTheColourAndAlphaIfAsked) {
   });
 }
 
+// Catches a pixel cut in two where blocks of them begin or end, within the caches and past them.
+TEST(FillRectRGB, FillsLongRows) {
+  constexpr int width = 3000, height = 1000;
+  for (const Format format : {Format::BGR, Format::RGBA})
+    for (const Rect& rect : {Rect{1, 1, 2990, 990}, {5, 3, 40, 3}, {2, 0, 61, 2}}) {
+      const Picture picture(width, height, format);
+      PlainPicture plain(picture);
+      ForPixels(plain, rect, [&](int x, int y) {
+        for (int i = 0; i < 3; ++i) plain.At(x, y, "RGB"[i]) = std::uint8_t(i + 1);
+        if (plain.Has('A')) plain.At(x, y, 'A') = 4;
+      });
+      picture.FillRectRGB(rect, 1, 2, 3, 4);
+      EXPECT_TRUE(Packed(picture) == plain.Pixels) << int(format) << " " << rect.Width;
+    }
+}
+
 // The forms without a rectangle take the same way over the whole picture.
 TEST(FillRect, TakesTheWholePicture) {
   const Picture picture(2, 1, Format::ABGR);
