@@ -27,6 +27,15 @@ void Unmap(FileRegion& region) {
   region = {};
 }
 
+/// Maps all pages of a window in one go that would cost a fault each. For reading, since a page that isn't
+/// written stays clean.
+void Populate([[maybe_unused]] const FileRegion& region) {
+#ifdef MADV_POPULATE_READ
+  // Not every system can, and what it leaves out comes with a fault.
+  if (madvise(region.Start, std::size_t(region.End - region.First), MADV_POPULATE_READ) != 0) errno = 0;
+#endif
+}
+
 /// Maps the bytes in the place of a region.
 Sample* Map(const PictureData& data, FileRegion& region, std::int64_t first, std::int64_t end) {
   Unmap(region);
@@ -64,7 +73,11 @@ Sample* WindowBytes(PictureData& data, std::int64_t first, std::int64_t end, std
   if (!IsRoomy(data)) Unmap(other);
   if (IsRoomy(data) && above > 0 && Map(data, window, std::max<std::int64_t>(first - above, 0), end))
     return AddressIn(window, first, end);
-  return Map(data, window, first, end);
+  const bool follows = other.Start && first >= other.First && first <= other.End;
+  Sample* at = Map(data, window, first, end);
+  // Where windows follow one another all of their rows are needed, elsewhere a few may be.
+  if (at && follows) Populate(window);
+  return at;
 }
 
 Sample* BytesBeside(PictureData& data, std::int64_t first, std::int64_t end) {
