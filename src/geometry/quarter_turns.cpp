@@ -89,11 +89,11 @@ class Pixels {
 };
 
 /// How many rows of the destination are composed in memory and then written to its file; 0 where they are
-/// mapped instead. They take what the regions of both pictures would.
+/// mapped instead. They take as much memory as a region beside the window may.
 std::int32_t RowsComposed(const FilterCall& call) {
   if (!call.Dest.IsMapping || call.SharesPixels || !FillPixels(call.Out)) return 0;
   const std::int64_t row = Pixels::Padded(std::int64_t{call.Source.Height} * call.Out.Step);
-  return std::int32_t(std::min<std::int64_t>(2 * MostBytesBeside(call.Dest) / row, call.Source.Width));
+  return std::int32_t(std::min<std::int64_t>(MostBytesBeside(call.Dest) / row, call.Source.Width));
 }
 
 /// Composes so many rows of the destination at a time. By way of mappings each page that is written costs a

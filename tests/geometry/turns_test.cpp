@@ -124,7 +124,7 @@ TEST(Turns, TakeMoreRowsThanAWindow) {
 // than one group of rows, and into the middle of a larger picture.
 TEST(Turns, WriteMoreRowsThanAreComposedTogether) {
   if (sizeof(void*) == 4) GTEST_SKIP() << "all rows are mapped";
-  constexpr int width = 8100, height = 26000;
+  constexpr int width = 4050, height = 26000;
   const Picture plain = NoisePicture(width, height, Format::G, 62);
   const TemporaryFile from, into;
   const Picture source = Picture::Mapped(from.Path(), width, height, Format::G);
