@@ -72,7 +72,7 @@ struct Tile {
 /// Pixels in memory of their own, as they stand in a picture.
 class Pixels {
  public:
-  Pixels(std::int32_t width, std::int32_t height, PlaneList planes)
+  Pixels(std::int32_t width, std::int32_t height, const PlaneList& planes)
       : Stride(Padded(std::int64_t{width} * planes.Step)), Memory(NewBuffer(height, Stride)), Of(planes) {
     for (std::int32_t& offset : Of.Offset) offset -= LeftOf(planes);
   }
