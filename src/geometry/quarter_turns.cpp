@@ -105,15 +105,16 @@ bool TurnComposed(const FilterCall& call, Direction way, std::int32_t rows) {
   const std::int32_t band = mapped ? std::min(128, height) : height;
   const Pixels part(mapped ? rows : 0, mapped ? band : 0, call.In), composed(height, rows, call.Out);
   if (!part || !composed) return false;
-  for (std::int32_t x = 0; x < width; x += rows) {
+  for (std::int64_t left = 0; left < width; left += rows) {
+    const auto x = std::int32_t(left);
     Tile tile{call, way, {x, 0, std::min(rows, width - x), 0}};
     const auto turn = [&](const RowRun& from, const PlaneList& in) {
       const RowRun into = Tile::AtColumn(composed.Rows(), tile.FirstDestColumn(), composed.Planes());
       Transpose(tile.Between(from, into), in, composed.Planes());
     };
-    for (std::int32_t y = 0; y < height; y += band) {
-      tile.Source.Y = y;
-      tile.Source.Height = std::min(band, height - y);
+    for (std::int64_t top = 0; top < height; top += band) {
+      tile.Source.Y = std::int32_t(top);
+      tile.Source.Height = std::min(band, height - tile.Source.Y);
       if (!mapped) {
         if (!WithRows({call.Source, 0, height},
                       [&](const RowRun& from) { turn(Tile::AtColumn(from, x, call.In), call.In); }))
