@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cmath>
 
 #include "geometry/geometry.h"
 #include "geometry/transposition.h"
@@ -88,45 +89,59 @@ class Pixels {
   PlaneList Of;
 };
 
-/// How many rows of the destination are composed in memory and then written to its file; 0 where they are
-/// mapped instead. They take as much memory as a region beside the window may.
-std::int32_t RowsComposed(const FilterCall& call) {
-  if (!call.Dest.IsMapping || call.SharesPixels || !FillPixels(call.Out)) return 0;
-  const std::int64_t row = Pixels::Padded(std::int64_t{call.Source.Height} * call.Out.Step);
-  return std::int32_t(std::min<std::int64_t>(MostBytesBeside(call.Dest) / row, call.Source.Width));
+/// The part of the source that is composed in memory, as rows of the destination, and then written to its
+/// file; empty where those are mapped instead. It takes as much memory as a region beside the window may.
+/// Whole rows of the destination need the fewest writes; where the source is read from a file too, pieces as
+/// long on one side as on the other make the fewest calls.
+TileSize LargestComposed(const FilterCall& call) {
+  if (!call.Dest.IsMapping || call.SharesPixels || !FillPixels(call.Out)) return {0, 0};
+  const std::int64_t most = MostBytesBeside(call.Dest);
+  const double edge = std::sqrt(double(most / call.Out.Step));
+  const std::int32_t rows =
+      call.Source.IsMapping ? std::int32_t(std::min<double>(edge, call.Source.Height)) : call.Source.Height;
+  if (rows == 0) return {0, 0};
+  const std::int64_t columns = most / Pixels::Padded(std::int64_t{rows} * call.Out.Step);
+  return {rows, std::int32_t(std::min<std::int64_t>(columns, call.Source.Width))};
 }
 
-/// Composes so many rows of the destination at a time. By way of mappings each page that is written costs a
-/// fault and is cleared first, and one that is read costs a fault for each time that it is needed again;
-/// where the system has the file in small pages that takes many times as long as the copies do.
-bool TurnComposed(const FilterCall& call, Direction way, std::int32_t rows) {
+/// Composes so large a part at a time. By way of mappings each page that is written costs a fault and is
+/// cleared first, and one that is read costs a fault for each time that it is needed again; where the system
+/// has the file in small pages that takes many times as long as the copies do.
+bool TurnComposed(const FilterCall& call, Direction way, const TileSize& most) {
   const std::int32_t width = call.Source.Width, height = call.Source.Height;
   const bool mapped = call.Source.IsMapping;
-  const std::int32_t band = mapped ? std::min(128, height) : height;
-  const Pixels part(mapped ? rows : 0, mapped ? band : 0, call.In), composed(height, rows, call.Out);
+  const std::int32_t band = mapped ? std::min(128, most.Rows) : most.Rows;
+  const Pixels part(mapped ? most.Columns : 0, mapped ? band : 0, call.In),
+      composed(most.Rows, most.Columns, call.Out);
   if (!part || !composed) return false;
-  for (std::int64_t left = 0; left < width; left += rows) {
-    const auto x = std::int32_t(left);
-    Tile tile{call, way, {x, 0, std::min(rows, width - x), 0}};
-    const auto turn = [&](const RowRun& from, const PlaneList& in) {
-      const RowRun into = Tile::AtColumn(composed.Rows(), tile.FirstDestColumn(), composed.Planes());
-      Transpose(tile.Between(from, into), in, composed.Planes());
-    };
-    for (std::int64_t top = 0; top < height; top += band) {
-      tile.Source.Y = std::int32_t(top);
-      tile.Source.Height = std::min(band, height - tile.Source.Y);
+  const auto turn = [&](const Rectangle& whole) {
+    const Tile all{call, way, whole};
+    for (std::int32_t done = 0; done < whole.Height; done += band) {
+      const Tile tile{call, way, {whole.X, whole.Y + done, whole.Width, std::min(band, whole.Height - done)}};
+      const auto transpose = [&](const RowRun& from, const PlaneList& in) {
+        const RowRun into = Tile::AtColumn(composed.Rows(), tile.FirstDestColumn() - all.FirstDestColumn(),
+                                           composed.Planes());
+        Transpose(tile.Between(from, into), in, composed.Planes());
+      };
       if (!mapped) {
-        if (!WithRows({call.Source, 0, height},
-                      [&](const RowRun& from) { turn(Tile::AtColumn(from, x, call.In), call.In); }))
+        if (!WithRows({call.Source, tile.Source.Y, tile.Source.Height}, [&](const RowRun& from) {
+              transpose(Tile::AtColumn(from, whole.X, call.In), call.In);
+            }))
           return false;
       } else {
         if (!ReadPixels(call.Source, tile.Source, part.Rows().First, part.Rows().Stride)) return false;
-        turn(part.Rows(), part.Planes());
+        transpose(part.Rows(), part.Planes());
       }
     }
-    const Rectangle written{0, tile.FirstDestRow(), height, tile.Source.Width};
-    if (!WritePixels(call.Dest, written, composed.Rows().First, composed.Rows().Stride)) return false;
-  }
+    const Rectangle written{all.FirstDestColumn(), all.FirstDestRow(), whole.Height, whole.Width};
+    return WritePixels(call.Dest, written, composed.Rows().First, composed.Rows().Stride);
+  };
+  for (std::int64_t x = 0; x < width; x += most.Columns)
+    for (std::int64_t y = 0; y < height; y += most.Rows) {
+      const auto left = std::int32_t(x), top = std::int32_t(y);
+      if (!turn({left, top, std::min(most.Columns, width - left), std::min(most.Rows, height - top)}))
+        return false;
+    }
   return true;
 }
 
@@ -144,8 +159,8 @@ enum class Form { Fast, Slow };
 
 PictureZOR* Turn(PictureZOR* self, PictureZOR* dest, Direction way, Form form) {
   return RunFilter(self, dest, {.InPlace = false, .Turned = true}, [&](const FilterCall& call) {
-    const std::int32_t composed = form == Form::Fast ? RowsComposed(call) : 0;
-    if (composed > 0) return TurnComposed(call, way, composed);
+    const TileSize composed = form == Form::Fast ? LargestComposed(call) : TileSize{0, 0};
+    if (composed.Columns > 0) return TurnComposed(call, way, composed);
     const std::int32_t width = call.Source.Width, height = call.Source.Height;
     const TileSize most = form == Form::Fast ? LargestTiles(call) : OnePixel;
     const auto turn = [&](std::int64_t x, std::int64_t y) {

@@ -15,6 +15,7 @@
 #include <utility>
 
 #include "frame/host_services.h"
+#include "image/buffers.h"
 #include "image/file_regions.h"
 #include "image/formats.h"
 
@@ -54,19 +55,6 @@ bool MayBeOverwritten(int fileDescriptor) {
     if (used.st_dev == file.st_dev && used.st_ino == file.st_ino) return false;
   }
   return true;
-}
-
-/// Asks for large pages under memory that nobody has touched yet. The system hands out memory a page at a
-/// time, and with small pages that takes several times as long as filling it. Where it has no large ones,
-/// small ones do.
-void WantLargePages([[maybe_unused]] Sample* memory, [[maybe_unused]] std::size_t bytes) {
-#ifdef MADV_HUGEPAGE
-  constexpr std::size_t few = 4 << 20;
-  if (bytes < few) return;
-  const std::size_t toPage = std::size_t(-reinterpret_cast<Word>(memory)) % std::size_t(PageSize);
-  const std::size_t pages = (bytes - toPage) / std::size_t(PageSize) * std::size_t(PageSize);
-  if (madvise(memory + toPage, pages, MADV_HUGEPAGE) != 0) errno = 0;
-#endif
 }
 
 /// Opens the file for the store. False, and the file left as it was, where no picture may be put on it.
