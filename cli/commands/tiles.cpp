@@ -11,7 +11,7 @@ namespace {
 
 using tiles::Layout;
 
-struct Options {
+struct TilesOptions {
   std::filesystem::path In, Out;
   tiles::TilesOptions Making;
   std::string Background;
@@ -34,7 +34,7 @@ void SetPart(tiles::TilesOptions& making, const std::string& text) {
     throw UsageFailure("--part: " + text + " isn't a part like 2/5");
 }
 
-int Tiles(Session& session, Options options) {
+int Tiles(Session& session, TilesOptions options) {
   tiles::TilesOptions& making = options.Making;
   if (!options.Background.empty()) {
     const steps::Option colour{.Name = "background", .Of = steps::Kind::Colour, .Help = ""};
@@ -61,7 +61,7 @@ void AddTiles(CLI::App& app, Session& session) {
       "  picturezor tiles scan.tif --tile 254 --overlap 1 -o scan.szi\n"
       "  for part in 1 2 3; do picturezor tiles scan.tif -o scan --part $part/3; done\n"
       "  picturezor tiles scan.tif -o scan --join 3");
-  auto options = std::make_shared<Options>();
+  auto options = std::make_shared<TilesOptions>();
   command->add_option("IN", options->In, "Image to read")->required()->type_name("");
   command
       ->add_option("-o,--output", options->Out,

@@ -11,7 +11,7 @@ namespace picturezor::cli {
 
 namespace {
 
-struct Options {
+struct ViewOptions {
   tiles::ViewOptions Viewing;
   bool NoOpen = false;
 };
@@ -24,7 +24,7 @@ void OpenInBrowser(const std::string& address) {
   _exit(Failed);
 }
 
-int View(Session& session, Options options) {
+int View(Session& session, ViewOptions options) {
   options.Viewing.Stores = session.Stores;
   tiles::ViewServer server(options.Viewing);
   std::printf("%s\n", server.Address().c_str());
@@ -45,7 +45,7 @@ void AddView(CLI::App& app, Session& session) {
       "Examples:\n"
       "  picturezor view scan.tif\n"
       "  picturezor view --no-open photos/*.jpg");
-  auto options = std::make_shared<Options>();
+  auto options = std::make_shared<ViewOptions>();
   command->add_option("FILE", options->Viewing.Files, "Images to show")->required()->type_name("");
   command->add_flag("--no-open", options->NoOpen, "Print the address, but don't open it");
   command
