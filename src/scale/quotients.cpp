@@ -222,9 +222,11 @@ bool Fits(double size, int bits) {
   return Times2To(bits, (size + 0.1) * 255.0) + ofThird < 0x1p31;
 }
 
-/// What the third digits of a line cost, and its doubts with so many bits, by and large: in cycles a vector.
+/// What a slot's third digits cost, by and large: in cycles a vector.
+constexpr double CostOfTop = 3.0;
+/// The same of all that a line has, and of its doubts with so many bits.
 double CostOf(const LineDigits& digits, int bits) {
-  return 5.0 * digits.Made.TopCount + Times2To(-bits, 2000.0 * 64.0 * digits.Line.Count);
+  return CostOfTop * digits.Made.TopCount + Times2To(-bits, 2000.0 * 64.0 * digits.Line.Count);
 }
 
 /// The number of bits from `least` to `most` that costs least; with third digits where a few shares are much
@@ -313,7 +315,7 @@ void MakeDigits(const Contribution& line, SlotLine::Digits* digits, SlotLine& ma
   if (MakeOnLattice(of, lattice, least)) return;
   const int best = BestBits(of, least, most);
   const double cost = CostOf(of, best);
-  if (of.SetTops(most) && 5.0 * made.TopCount < cost && MakeOnLattice(of, lattice, most)) return;
+  if (of.SetTops(most) && CostOfTop * made.TopCount < cost && MakeOnLattice(of, lattice, most)) return;
   of.SetTops(best);
   made.OfFlat = OfFlatRun(line);
   made.Plain = AlwaysInDoubt(line) || !MakeAllDigits(of, best, size);
