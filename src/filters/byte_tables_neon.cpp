@@ -45,8 +45,7 @@ std::ptrdiff_t MapPixels(const ByteTables& tables, const Sample* in, Sample* out
     const auto pixels = LoadPixels<Step>(in + i);
     auto made = LoadPixels<Step>(out + i);
     for (int c = 0; c < Step; ++c)
-      if (const int t = tables.At[std::size_t(c)]; t >= 0)
-        made.val[c] = LookedUp(quarters[t], pixels.val[c]);
+      if (const int t = tables.At[std::size_t(c)]; t >= 0) made.val[c] = LookedUp(quarters[t], pixels.val[c]);
     StorePixels(out + i, made);
   }
   return i;
@@ -63,8 +62,7 @@ std::ptrdiff_t MapBytesNEON(const ByteTables& tables, const Sample* in, Sample* 
   LoadQuarters(*tables.Table[0], table);
   constexpr std::ptrdiff_t together = 16;
   std::ptrdiff_t i = 0;
-  for (; i + together <= tables.Bytes; i += together)
-    vst1q_u8(out + i, LookedUp(table, vld1q_u8(in + i)));
+  for (; i + together <= tables.Bytes; i += together) vst1q_u8(out + i, LookedUp(table, vld1q_u8(in + i)));
   return i;
 }
 

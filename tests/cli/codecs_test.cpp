@@ -97,7 +97,8 @@ TEST_F(Codecs, APartIsThatOfTheWhole) {
   WriteTIFF(At("tiles.tif"), picture, {.Compression = 5, .Tile = 16});
   WriteTIFF(At("planes.tif"), picture, {.Compression = 5, .Tile = 16, .Planar = true});
   Write("a.jpg", picture, {.Quality = 75});
-  for (const char* name : {"a.png", "a.jpg", "plain.tif", "strips.tif", "strip.tif", "tiles.tif", "planes.tif"})
+  for (const char* name :
+       {"a.png", "a.jpg", "plain.tif", "strips.tif", "strip.tif", "tiles.tif", "planes.tif"})
     for (const Rect& part :
          {Rect{0, 0, 53, 47}, Rect{0, 40, 53, 7}, Rect{17, 15, 20, 18}, Rect{52, 46, 1, 1}}) {
       SCOPED_TRACE(testing::Message() << name << ' ' << part.X << ' ' << part.Y);

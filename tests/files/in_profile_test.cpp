@@ -25,7 +25,8 @@ class FourPixels final : public ImageReader {
 };
 
 // The numbers are those of sRGB's primaries in Adobe RGB (1998) and of their luminance, after IEC 61966-2-1
-// and the publication of that space. Catches channels in another order, alpha that is converted, a lost profile.
+// and the publication of that space. Catches channels in another order, alpha that is converted, a lost
+// profile.
 TEST(Profiles, CarryColoursOver) {
   const struct {
     const char* Name;
