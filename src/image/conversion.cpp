@@ -17,9 +17,9 @@ bool InOnePixel(const PlaneList& planes, int count) {
                      [&](std::int32_t offset) { return offset >= left && offset - left < planes.Step; });
 }
 
-/// The bytes that this processor shuffles at once.
+/// The bytes that this processor shuffles at once; with plain instructions, those of a pixel.
 std::int32_t BytesOfShuffle() {
-  if (!ShufflesBytes()) return 0;
+  if (!ShufflesBytes()) return ByteShuffle::Least;
   return CurrentTarget == Target::AVX512VBMI ? ByteShuffle::Most : 16;
 }
 
@@ -93,9 +93,9 @@ std::int32_t RowConversion::FastPart(const Sample* from, Sample* into, std::int3
     std::memcpy(into, from, std::size_t(width) * std::size_t(In.Step));
     return width;
   }
-  if (IsLuma && ShufflesBytes())
-    return LumaRow(from, In.Step, {In.Offset[0] - left, In.Offset[1] - left, In.Offset[2] - left}, into,
-                   width);
+  if (IsLuma)
+    return (ShufflesBytes() ? LumaRow : LumaOfQuads)(
+        from, In.Step, {In.Offset[0] - left, In.Offset[1] - left, In.Offset[2] - left}, into, width);
   if (Shuffle.Pixels == 0) return 0;
   const bool whole = Shuffle.Whole || rest == Rest::IsZero;
   if (Shuffle.Size == ByteShuffle::Most) {
@@ -103,6 +103,8 @@ std::int32_t RowConversion::FastPart(const Sample* from, Sample* into, std::int3
     if (rest == Rest::IsZero) FetchNext(from, std::uintptr_t(width) * std::uintptr_t(In.Step));
     return width;
   }
+  if (Shuffle.Size == ByteShuffle::Least)
+    return ShuffleQuads(Shuffle, from, In.Step, into, Out.Step, width, whole);
   if (whole) return ShuffleRow(Shuffle, from, In.Step, into, Out.Step, width);
   return Shuffle.Full ? ShuffleInto(Shuffle, from, In.Step, into, Out.Step, width) : 0;
 }

@@ -95,7 +95,7 @@ constexpr FamilyPair Pair{From,
 /// A run of pixels whose samples are moved as a shuffle of a register's bytes: byte b of the result is byte
 /// From[b], 0 where From[b] is 128 or more, each bit turned that is set in Flip[b].
 struct ByteShuffle {
-  static constexpr std::int32_t Most = 64;
+  static constexpr std::int32_t Most = 64, Least = 4;
 
   /// Bytes and pixels of one shuffle; no pixels where there is none for these planes or this processor.
   std::int32_t Size = 0, Pixels = 0;
@@ -154,6 +154,11 @@ RowConversion Find(std::span<const FamilyPair> pairs, const PictureData& source,
 // The faster forms, of rows that don't overlap. None touches a byte beyond the row; where one gives a number,
 // that is how many pixels from the left it has done.
 
+/// How many pixels, from the left, may be the first of a run of `bytes` bytes.
+constexpr std::int32_t Starts(std::int32_t width, std::int32_t step, std::int32_t bytes) {
+  return width - (bytes + step - 1) / step + 1;
+}
+
 /// For a shuffle of 64 bytes. With `whole` the bytes that get no sample become 0, else they keep their
 /// values.
 void ShuffleWide(const ByteShuffle& shuffle, const Sample* from, std::int32_t fromStep, Sample* into,
@@ -165,8 +170,15 @@ std::int32_t ShuffleRow(const ByteShuffle& shuffle, const Sample* from, std::int
 /// the store before it, which stalls.
 std::int32_t ShuffleInto(const ByteShuffle& shuffle, const Sample* from, std::int32_t fromStep, Sample* into,
                          std::int32_t intoStep, std::int32_t width);
+/// For one of 4, a pixel, without shuffles; none is done where its bytes aren't those of the source turned,
+/// or turned and the other way round. With `whole` as for 64 bytes.
+std::int32_t ShuffleQuads(const ByteShuffle& shuffle, const Sample* from, std::int32_t fromStep, Sample* into,
+                          std::int32_t intoStep, std::int32_t width, bool whole);
 /// From the left edges of pixels of 3 or 4 bytes, with the planes' places in them, into packed gray.
 std::int32_t LumaRow(const Sample* from, std::int32_t step, const std::int32_t (&places)[3], Sample* into,
                      std::int32_t width);
+/// The same without shuffles.
+std::int32_t LumaOfQuads(const Sample* from, std::int32_t step, const std::int32_t (&places)[3], Sample* into,
+                         std::int32_t width);
 
 }

@@ -12,11 +12,6 @@
 namespace zor {
 namespace {
 
-/// How many pixels, from the left, may be the first of a run of `bytes` bytes.
-[[maybe_unused]] std::int32_t Starts(std::int32_t width, std::int32_t step, std::int32_t bytes) {
-  return width - (bytes + step - 1) / step + 1;
-}
-
 /// Byte b of the result is byte order[b], 0 where that is 128 or more. Fast where `ShufflesBytes`.
 ZOR_FOR("avx2")
 inline Block Moved(Block bytes, Block order) {
